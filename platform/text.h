@@ -1,0 +1,46 @@
+// UTF-16 text: case folding, formatting of numbers, conversion to and from UTF-8.
+//
+// Pure functions, callable from every thread. Functions that return text may throw std::bad_alloc.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+#include "platform/guid.h"
+
+namespace platform {
+
+// One code unit as the system's character lowering and raising maps it: one to one, without regard
+// to language or context. Surrogates and letters without such a partner map to themselves.
+char16_t ToLower(char16_t unit) noexcept;
+char16_t ToUpper(char16_t unit) noexcept;
+
+std::u16string ToLower(std::u16string_view text);
+std::u16string ToUpper(std::u16string_view text);
+
+// Equal when both sides are lowered.
+bool EqualIgnoringCase(std::u16string_view a, std::u16string_view b) noexcept;
+
+// The text with every `from` replaced by `to`.
+std::u16string Replaced(std::u16string text, char16_t from, char16_t to);
+
+// The characters before the first zero, or all of `buffer` where it holds none.
+std::u16string_view UpToZero(std::u16string_view buffer) noexcept;
+
+// Upper-case hexadecimal digits, padded with zeros to `width`; no prefix ("%X", "%04X").
+std::u16string Hex(std::uint32_t value, unsigned width = 0);
+// The same with lower-case digits ("%x").
+std::u16string HexLower(std::uint32_t value, unsigned width = 0);
+// Signed decimal, padded with blanks on the left to `width` ("%d", "%2d").
+std::u16string Decimal(std::int32_t value, unsigned width = 0);
+
+// "{8-4-4-4-12}" with upper-case digits, 38 characters, as the system prints a GUID.
+std::u16string GuidText(const Guid& guid);
+
+// UTF-8 with U+FFFD for each unpaired surrogate or malformed byte.
+std::string ToUtf8(std::u16string_view text);
+std::u16string FromUtf8(std::string_view bytes);
+
+}  // namespace platform
