@@ -1,0 +1,43 @@
+#include "devinfo/device_set.h"
+
+#include <algorithm>
+#include <cstring>
+
+#include "platform/text.h"
+
+namespace KelvoUHW {
+
+std::u16string InterfaceDetail::DevicePath() const {
+  if (m_bytes.size() <= platform::kInterfaceDetailPathOffset) return {};
+  const std::size_t bytes = m_bytes.size() - platform::kInterfaceDetailPathOffset;
+  std::u16string path(bytes / sizeof(char16_t), u'\0');
+  std::memcpy(path.data(), m_bytes.data() + platform::kInterfaceDetailPathOffset,
+              path.size() * sizeof(char16_t));
+  return std::u16string(platform::UpToZero(path));
+}
+
+InterfaceDetail GetInterfaceDetail(platform::DeviceSets& sets, platform::DebugOutput& debug,
+                                   platform::DeviceSetHandle set,
+                                   const platform::SP_DEVICE_INTERFACE_DATA* data,
+                                   platform::SP_DEVINFO_DATA* device) {
+  if (set == 0 || data == nullptr || device == nullptr) return {};
+  std::uint32_t required = 0;
+  sets.GetDeviceInterfaceDetail(set, *data, nullptr, 0, &required, nullptr);
+  if (required == 0) return {};
+
+  std::vector<std::uint8_t> bytes(
+      std::max<std::size_t>(required, platform::kInterfaceDetailPathOffset));
+  const std::uint32_t fixedPart = platform::kInterfaceDetailSize;
+  std::memcpy(bytes.data(), &fixedPart, sizeof fixedPart);
+  *device = {};
+  device->cbSize = sizeof(platform::SP_DEVINFO_DATA);
+  const platform::Status status =
+      sets.GetDeviceInterfaceDetail(set, *data, bytes.data(), required, nullptr, device);
+  if (status) return InterfaceDetail(std::move(bytes));
+  if (status.error == platform::kERROR_INVALID_USER_BUFFER) {
+    debug.WriteDebugText(u"ERROR_INVALID_USER_BUFFER\r\n");
+  }
+  return {};
+}
+
+}  // namespace KelvoUHW

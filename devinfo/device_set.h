@@ -1,0 +1,87 @@
+// Owners of the system's device-information handles.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/host.h"
+
+namespace KelvoUHW {
+
+// A device-information set, destroyed with its owner unless it is let go.
+class DeviceSet {
+ public:
+  explicit DeviceSet(platform::DeviceSets& sets) noexcept : m_sets(sets) {}
+  ~DeviceSet() { Reset(); }
+  DeviceSet(const DeviceSet&) = delete;
+  DeviceSet& operator=(const DeviceSet&) = delete;
+
+  // Replaces the set by that of a class (null: all classes).
+  platform::Status Open(const platform::Guid* classGuid, std::uint32_t flags) noexcept {
+    Reset();
+    return m_sets.GetClassDevs(classGuid, flags, m_handle);
+  }
+  platform::DeviceSetHandle Get() const noexcept { return m_handle; }
+  // Gives the handle up without destroying the set.
+  platform::DeviceSetHandle Release() noexcept {
+    return std::exchange(m_handle, platform::kInvalidHandle);
+  }
+  void Reset() noexcept {
+    if (m_handle != platform::kInvalidHandle) m_sets.DestroyDeviceInfoList(Release());
+  }
+
+ private:
+  platform::DeviceSets& m_sets;
+  platform::DeviceSetHandle m_handle = platform::kInvalidHandle;
+};
+
+// An opened device path, closed with its owner.
+class DeviceFile {
+ public:
+  explicit DeviceFile(platform::DeviceIo& io) noexcept : m_io(io) {}
+  ~DeviceFile() { Close(); }
+  DeviceFile(const DeviceFile&) = delete;
+  DeviceFile& operator=(const DeviceFile&) = delete;
+
+  platform::Status Open(const std::u16string& path, std::uint32_t access,
+                        std::uint32_t share) noexcept {
+    Close();
+    return m_io.OpenDevice(path.c_str(), access, share, m_handle);
+  }
+  platform::FileHandle Get() const noexcept { return m_handle; }
+  void Close() noexcept {
+    if (m_handle != platform::kInvalidHandle) {
+      m_io.CloseDevice(std::exchange(m_handle, platform::kInvalidHandle));
+    }
+  }
+
+ private:
+  platform::DeviceIo& m_io;
+  platform::FileHandle m_handle = platform::kInvalidHandle;
+};
+
+// The detail record of a device interface: a size field and the device path.
+class InterfaceDetail {
+ public:
+  InterfaceDetail() = default;
+  explicit InterfaceDetail(std::vector<std::uint8_t> bytes) noexcept : m_bytes(std::move(bytes)) {}
+
+  // The path, or an empty text where there is no detail.
+  std::u16string DevicePath() const;
+  explicit operator bool() const noexcept { return !m_bytes.empty(); }
+
+ private:
+  std::vector<std::uint8_t> m_bytes;
+};
+
+// Reads the detail of an interface in two steps, size first. `device` is filled with the element the
+// interface belongs to. Empty when an argument is null, the size is 0 or a call fails; when the system
+// refuses the buffer itself, a line is written to the debugger first.
+InterfaceDetail GetInterfaceDetail(platform::DeviceSets& sets, platform::DebugOutput& debug,
+                                   platform::DeviceSetHandle set,
+                                   const platform::SP_DEVICE_INTERFACE_DATA* data,
+                                   platform::SP_DEVINFO_DATA* device);
+
+}  // namespace KelvoUHW

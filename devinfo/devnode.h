@@ -1,0 +1,41 @@
+// Device-manager nodes by their handle: description, id, parent; and the search by driver key.
+#pragma once
+
+#include <string>
+#include <unordered_map>
+
+#include "devinfo/identifiers.h"
+#include "platform/host.h"
+
+namespace KelvoUHW {
+
+// The description (at most 199 characters), or empty when the handle is 0 or the call fails.
+std::u16string GetDeviceDescription(platform::DeviceManager& manager, platform::DevInst node);
+
+// The device id (at most 199 characters) with / turned into \, or empty as above.
+std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst node);
+
+// Fills m_devInstHandleParent and m_strDevInstIdParent from m_devInstHandle. The parent's handle stays
+// as it was where the call fails; its id is read either way. A volume below the volume manager
+// (ROOT\VOLMGR\) gets its disk's id instead, taken from its own id.
+void ResolveParentInstanceId(platform::DeviceManager& manager, NodeIdentity& node);
+
+// The first node, depth first from the root, whose driver key equals `driverKey` ignoring case; 0 when
+// none does.
+platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
+                                         const std::u16string& driverKey);
+
+// The same answers from one walk over all nodes, made at the first question. One object serves one
+// build: it does not notice what changes afterwards.
+class DriverKeyIndex {
+ public:
+  explicit DriverKeyIndex(platform::DeviceManager& manager) noexcept : m_manager(manager) {}
+  platform::DevInst Find(const std::u16string& driverKey);
+
+ private:
+  platform::DeviceManager& m_manager;
+  std::unordered_map<std::u16string, platform::DevInst> m_nodes;  // by lower-cased driver key
+  bool m_filled = false;
+};
+
+}  // namespace KelvoUHW

@@ -1,0 +1,87 @@
+// The base of all records: one node of the topology snapshot.
+//
+// Records are plain data, filled by one thread and read by many once published. They carry no lock.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "devinfo/identifiers.h"
+#include "platform/host.h"
+#include "tree/ring_ptr.h"
+
+namespace KelvoUHW {
+
+enum TUsbDeviceType : std::int32_t {
+  KUDTUnknown = 0,
+  KUDTRoot = 1,
+  KUDTHostController = 2,
+  KUDTHub = 3,
+  KUDTHubPort = 4,
+  KUDTPortDevice = 5,
+  KUDTInfoDevice = 6,
+  KUDTInterfaceDevice = 7,
+};
+
+class CZKUMUsbTreeNodeImpl;
+using NodePtr = RingPtr<CZKUMUsbTreeNodeImpl>;
+
+// What is added to the indent of a child's dump.
+inline constexpr char16_t kChildIndent[] = u"- ";
+
+class CZKUMUsbTreeNodeImpl : public NodeIdentity {
+ public:
+  CZKUMUsbTreeNodeImpl() = default;
+  CZKUMUsbTreeNodeImpl(const CZKUMUsbTreeNodeImpl&) = delete;
+  CZKUMUsbTreeNodeImpl& operator=(const CZKUMUsbTreeNodeImpl&) = delete;
+
+  // The virtual operations, in this order in every class.
+
+  // Sets the parent link of each child that still names this record to null: device records are shared
+  // between successive trees, and a climb must end at null and not in freed memory.
+  virtual ~CZKUMUsbTreeNodeImpl();
+  // Whether the node is kept when a replaced tree is pruned. Every class answers true.
+  virtual bool AcceptNode(NodePtr node);
+  // Appends the text dump of the node and its subtree. Each line starts with `indent` and ends with
+  // "\r\n".
+  virtual void ToString(std::u16string& out, std::u16string indent) const;
+
+  // Deletes a record that no RingPtr holds any more. Records that die with it are deleted one after the
+  // other and not inside each other, so a chain of any depth needs no more stack than one record.
+  static void Destroy(CZKUMUsbTreeNodeImpl* record) noexcept;
+
+  // Whether a child has this driver key, ignoring case.
+  bool HasChildWithDriverKey(const std::u16string& driverKey) const;
+  // Same instance id, product id, product text, serial number and description, compared exactly. The
+  // vendor id is deliberately not compared.
+  bool IsSameNode(const CZKUMUsbTreeNodeImpl& other) const noexcept;
+
+  const TUsbDeviceType m_nType = KUDTUnknown;
+  // The non-owning link upwards; null for a root and for a node that hangs nowhere.
+  CZKUMUsbTreeNodeImpl* m_pParent = nullptr;
+  std::vector<NodePtr> m_childs;
+  std::u16string m_strDeviceDescr;
+  std::u16string m_strDriverKeyName;
+
+ protected:
+  explicit CZKUMUsbTreeNodeImpl(TUsbDeviceType type) noexcept : m_nType(type) {}
+
+  // The lines every kind of node shares.
+  void BaseToString(std::u16string& out, const std::u16string& indent) const;
+  void ChildsToString(std::u16string& out, const std::u16string& indent) const;
+};
+
+// Hangs a node below a parent, unless one of the parent's children is the same node: then nothing
+// changes. Without a parent nothing happens.
+void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent);
+
+// The first node with this instance id (compared exactly), a node before its children and children in
+// their order; empty when there is none.
+NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId);
+
+// Appends indent + label + value + "\r\n", the shape of most lines of a dump.
+void AppendLine(std::u16string& out, const std::u16string& indent, std::u16string_view label,
+                std::u16string_view value = {});
+
+}  // namespace KelvoUHW
