@@ -76,9 +76,15 @@ class InterfaceDetail {
   std::vector<std::uint8_t> m_bytes;
 };
 
-// Reads the detail of an interface in two steps, size first. `device` is filled with the element the
-// interface belongs to. Empty when an argument is null, the size is 0 or a call fails; when the system
-// refuses the buffer itself, a line is written to the debugger first.
+// Reads the detail of an interface in two steps, size first, into a buffer of exactly that size.
+// `device` (may be null) is filled with the element the interface belongs to. Empty when the size
+// is 0 or the second call fails; `status` is that of the last call.
+InterfaceDetail ReadInterfaceDetail(platform::DeviceSets& sets, platform::DeviceSetHandle set,
+                                    const platform::SP_DEVICE_INTERFACE_DATA& data,
+                                    platform::SP_DEVINFO_DATA* device, platform::Status& status);
+
+// The same for the storage passes: empty without any call when an argument is null; and when the
+// system refuses the buffer itself, a line is written to the debugger.
 InterfaceDetail GetInterfaceDetail(platform::DeviceSets& sets, platform::DebugOutput& debug,
                                    platform::DeviceSetHandle set,
                                    const platform::SP_DEVICE_INTERFACE_DATA* data,

@@ -14,8 +14,8 @@ namespace platform {
 // A device-manager node. 0 stands for none in the component's records.
 using DevInst = std::uint32_t;
 
-// Pointer-sized fields that only the system reads. Away from Windows the records keep their layout in
-// 32-bit programs, so that sizes (28 and 6) are those of the component that ships.
+// Pointer-sized fields that only the system reads. Away from Windows the records keep their layout
+// in 32-bit programs, so that sizes (28 and 6) are those of the component that ships.
 #ifdef _WIN32
 using SystemWord = std::uintptr_t;
 #else
@@ -36,8 +36,8 @@ struct SP_DEVICE_INTERFACE_DATA {
   SystemWord Reserved = 0;
 };
 
-// SP_DEVICE_INTERFACE_DETAIL_DATA_W is a 32-bit size field and the path's characters right behind it.
-// The size field holds the size of the fixed part: 6, or 8 where the system aligns it.
+// SP_DEVICE_INTERFACE_DETAIL_DATA_W is a 32-bit size field and the path's characters right behind
+// it. The size field holds the size of the fixed part: 6, or 8 where the system aligns it.
 inline constexpr std::size_t kInterfaceDetailPathOffset = 4;
 #if defined(_WIN64)
 inline constexpr std::uint32_t kInterfaceDetailSize = 8;

@@ -1,8 +1,8 @@
 // Requests to USB host controllers and hubs: codes and records.
 //
 // Public source: the published driver-kit headers usbioctl.h, usbiodef.h and usb100.h, and
-// chapter 9 of the USB 2.0 standard for the descriptors. All records are byte-packed and little-endian;
-// their layout is the same in 32-bit and 64-bit programs.
+// chapter 9 of the USB 2.0 standard for the descriptors. All records are byte-packed and
+// little-endian; their layout is the same in 32-bit and 64-bit programs.
 #pragma once
 
 #include <array>
@@ -146,8 +146,8 @@ struct USB_NODE_INFORMATION {
   std::uint8_t HubIsBusPowered;
 };
 
-// The heads of the name records, without the text that follows. ActualLength counts the whole record
-// in bytes, head and terminating zero included.
+// The heads of the name records, without the text that follows. ActualLength counts the whole
+// record in bytes, head and terminating zero included.
 struct UsbNameHead {  // USB_HCD_DRIVERKEY_NAME, USB_ROOT_HUB_NAME
   std::uint32_t ActualLength;
 };

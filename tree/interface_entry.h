@@ -12,8 +12,8 @@
 
 namespace KelvoUHW {
 
-// One descriptor: its bytes as received. Shorter than its own bLength where the data ended early; at
-// least two bytes (length and type).
+// One descriptor: its bytes as received. Shorter than its own bLength where the data ended early;
+// at least two bytes (length and type).
 using RawDescriptor = std::span<const std::uint8_t>;
 
 // Every descriptor of a configuration in order, up to wTotalLength or the end of what was received,

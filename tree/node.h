@@ -3,6 +3,7 @@
 // Records are plain data, filled by one thread and read by many once published. They carry no lock.
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -27,6 +28,27 @@ enum TUsbDeviceType : std::int32_t {
 class CZKUMUsbTreeNodeImpl;
 using NodePtr = RingPtr<CZKUMUsbTreeNodeImpl>;
 
+// A non-owning link to a parent. Reading and writing are atomic: while one thread builds, another
+// may release the last reference to an older tree, whose records clear the links that still name
+// them.
+class ParentLink {
+ public:
+  operator CZKUMUsbTreeNodeImpl*() const noexcept {
+    return m_pNode.load(std::memory_order_acquire);
+  }
+  CZKUMUsbTreeNodeImpl* operator->() const noexcept { return *this; }
+  ParentLink& operator=(CZKUMUsbTreeNodeImpl* node) noexcept {
+    m_pNode.store(node, std::memory_order_release);
+    return *this;
+  }
+  void ClearIfNaming(CZKUMUsbTreeNodeImpl* node) noexcept {
+    m_pNode.compare_exchange_strong(node, nullptr);
+  }
+
+ private:
+  std::atomic<CZKUMUsbTreeNodeImpl*> m_pNode = nullptr;
+};
+
 // What is added to the indent of a child's dump.
 inline constexpr char16_t kChildIndent[] = u"- ";
 
@@ -38,8 +60,8 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
 
   // The virtual operations, in this order in every class.
 
-  // Sets the parent link of each child that still names this record to null: device records are shared
-  // between successive trees, and a climb must end at null and not in freed memory.
+  // Sets the parent link of each child that still names this record to null: device records are
+  // shared between successive trees, and a climb must end at null and not in freed memory.
   virtual ~CZKUMUsbTreeNodeImpl();
   // Whether the node is kept when a replaced tree is pruned. Every class answers true.
   virtual bool AcceptNode(NodePtr node);
@@ -47,19 +69,20 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
   // "\r\n".
   virtual void ToString(std::u16string& out, std::u16string indent) const;
 
-  // Deletes a record that no RingPtr holds any more. Records that die with it are deleted one after the
-  // other and not inside each other, so a chain of any depth needs no more stack than one record.
+  // Deletes a record that no RingPtr holds any more. Records that die with it are deleted one after
+  // the other and not inside each other, so a chain of any depth needs no more stack than one
+  // record.
   static void Destroy(CZKUMUsbTreeNodeImpl* record) noexcept;
 
   // Whether a child has this driver key, ignoring case.
   bool HasChildWithDriverKey(const std::u16string& driverKey) const;
-  // Same instance id, product id, product text, serial number and description, compared exactly. The
-  // vendor id is deliberately not compared.
+  // Same instance id, product id, product text, serial number and description, compared exactly.
+  // The vendor id is deliberately not compared.
   bool IsSameNode(const CZKUMUsbTreeNodeImpl& other) const noexcept;
 
   const TUsbDeviceType m_nType = KUDTUnknown;
   // The non-owning link upwards; null for a root and for a node that hangs nowhere.
-  CZKUMUsbTreeNodeImpl* m_pParent = nullptr;
+  ParentLink m_pParent;
   std::vector<NodePtr> m_childs;
   std::u16string m_strDeviceDescr;
   std::u16string m_strDriverKeyName;
@@ -76,12 +99,12 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
 // changes. Without a parent nothing happens.
 void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent);
 
-// The first node with this instance id (compared exactly), a node before its children and children in
-// their order; empty when there is none.
+// The first node with this instance id (compared exactly), a node before its children and children
+// in their order; empty when there is none.
 NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId);
 
 // Appends indent + label + value + "\r\n", the shape of most lines of a dump.
-void AppendLine(std::u16string& out, const std::u16string& indent, std::u16string_view label,
+void AppendLine(std::u16string& out, std::u16string_view indent, std::u16string_view label,
                 std::u16string_view value = {});
 
 }  // namespace KelvoUHW

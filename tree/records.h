@@ -48,7 +48,8 @@ class CZKUMHubDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   void SetConnectionInfo(std::unique_ptr<ConnectionRecord> connectionInfo,
                          std::unique_ptr<DescriptorRequest> configDesc,
                          std::unique_ptr<StringDescriptorNode> stringDescs);
-  // Gives the connection record back, for a hub that did not build; it is then freed by who takes it.
+  // Gives the connection record back, for a hub that did not build; it is then freed by who takes
+  // it.
   std::unique_ptr<ConnectionRecord> TakeConnectionRecord() noexcept;
 
   std::uint8_t NumberOfPorts() const noexcept {

@@ -6,7 +6,8 @@ namespace KelvoUHW {
 
 namespace {
 
-// Constant-initialised and never destroyed in effect: pointers may be released by static destructors.
+// Constant-initialised and never destroyed in effect: pointers may be released by static
+// destructors.
 constinit std::mutex g_ringMutex;
 
 }  // namespace

@@ -1,7 +1,7 @@
 // RingPtr: the owning reference to a record, a shared pointer without a counter.
 //
-// All RingPtrs to one record form a circular, doubly linked ring; the one that finds itself alone when
-// it lets go deletes the record. Copies, moves and releases take constant time.
+// All RingPtrs to one record form a circular, doubly linked ring; the one that finds itself alone
+// when it lets go deletes the record. Copies, moves and releases take constant time.
 #pragma once
 
 #include <cstddef>
@@ -10,9 +10,9 @@
 
 namespace KelvoUHW {
 
-// The links of one ring member. Links of all rings change under one process-wide lock: clients release
-// node objects on threads of their own while an event thread builds, and nobody can serialise the two.
-// The lock is never held while a record is destroyed.
+// The links of one ring member. Links of all rings change under one process-wide lock: clients
+// release node objects on threads of their own while an event thread builds, and nobody can
+// serialise the two. The lock is never held while a record is destroyed.
 class RingLink {
  protected:
   class Lock {
@@ -42,8 +42,8 @@ class RingLink {
 };
 
 // One RingPtr object belongs to one thread at a time, except that several threads may copy from it
-// while one assigns to it. Pointers of different types (derived and base) to one record share a ring.
-// A record may state how it is deleted with a static member `Destroy(T*) noexcept`.
+// while one assigns to it. Pointers of different types (derived and base) to one record share a
+// ring. A record may state how it is deleted with a static member `Destroy(T*) noexcept`.
 template <class T>
 class RingPtr : private RingLink {
  public:
@@ -54,16 +54,12 @@ class RingPtr : private RingLink {
 
   RingPtr(const RingPtr& other) noexcept { Join(other); }
   template <class U>
-    requires std::is_convertible_v<U*, T*>
-  RingPtr(const RingPtr<U>& other) noexcept {
-    Join(other);
-  }
+  requires std::is_convertible_v<U*, T*> RingPtr(const RingPtr<U>& other)
+  noexcept { Join(other); }
   RingPtr(RingPtr&& other) noexcept { Take(other); }
   template <class U>
-    requires std::is_convertible_v<U*, T*>
-  RingPtr(RingPtr<U>&& other) noexcept {
-    Take(other);
-  }
+  requires std::is_convertible_v<U*, T*> RingPtr(RingPtr<U>&& other)
+  noexcept { Take(other); }
   ~RingPtr() { Reset(); }
 
   RingPtr& operator=(const RingPtr& other) noexcept {

@@ -31,8 +31,8 @@ class ConnectionRecord : public platform::ConnectionInformationEx {
   ConnectionRecord* m_pNextKept = nullptr;
 };
 
-// A configuration descriptor as it was asked for and received. `Data` holds the bytes received, which
-// may be fewer than the descriptor's own wTotalLength says.
+// A configuration descriptor as it was asked for and received. `Data` holds the bytes received,
+// which may be fewer than the descriptor's own wTotalLength says.
 struct DescriptorRequest {
   platform::USB_DESCRIPTOR_REQUEST_HEAD Head{};
   std::vector<std::uint8_t> Data;

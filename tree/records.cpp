@@ -1,0 +1,83 @@
+#include "tree/records.h"
+
+#include <utility>
+
+#include "com/usb_names.h"
+#include "devinfo/identifiers.h"
+#include "platform/text.h"
+
+namespace KelvoUHW {
+
+CZKUMUsbTreeRootImpl::CZKUMUsbTreeRootImpl() : CZKUMUsbTreeNodeImpl(KUDTRoot) {
+  SetInstanceId(u"Abstract root");
+}
+
+void CZKUMUsbTreeRootImpl::ToString(std::u16string& out, std::u16string indent) const {
+  ChildsToString(out, indent);
+}
+
+void CZKUMHostControllerImpl::ToString(std::u16string& out, std::u16string indent) const {
+  AppendLine(out, indent, u"HostController:");
+  BaseToString(out, indent);
+  AppendLine(out, indent, u"LeafName    : ", m_strLeafName);
+  AppendLine(out, indent, u"rootHubName : ", m_strRootHubName);
+  ChildsToString(out, indent);
+}
+
+CZKUMHubDeviceImpl::~CZKUMHubDeviceImpl() {
+  ConnectionRecord::KeepForProcessLife(TakeConnectionRecord());
+}
+
+void CZKUMHubDeviceImpl::ToString(std::u16string& out, std::u16string indent) const {
+  AppendLine(out, indent, u"Hub :");
+  BaseToString(out, indent);
+  AppendLine(out, indent, u"leafName       : ", LeafName());
+  AppendLine(out, indent, u"pathName       : ", m_strPathName);
+  AppendLine(out, indent, u"connectionName : ", m_strConnectionName);
+  AppendLine(out, indent, u"Port nb    : ", platform::Decimal(NumberOfPorts()));
+  ChildsToString(out, indent);
+}
+
+void CZKUMHubDeviceImpl::SetHubName(const std::u16string& name) {
+  m_strConnectionName = name;
+  m_strPathName = u"\\\\.\\" + name;
+  SetInstanceId(InterfacePathToInstanceId(name.c_str()));
+  const std::size_t brace = name.find(u'{');
+  if (brace != std::u16string::npos) m_guid = ParseGuidText(name.c_str() + brace);
+}
+
+void CZKUMHubDeviceImpl::SetConnectionInfo(std::unique_ptr<ConnectionRecord> connectionInfo,
+                                           std::unique_ptr<DescriptorRequest> configDesc,
+                                           std::unique_ptr<StringDescriptorNode> stringDescs) {
+  m_bHasConnectionInfo = true;
+  m_pPortInfo = std::make_unique<UsbPortInfo>(
+      UsbPortInfo{std::move(connectionInfo), std::move(configDesc), std::move(stringDescs)});
+}
+
+std::unique_ptr<ConnectionRecord> CZKUMHubDeviceImpl::TakeConnectionRecord() noexcept {
+  return m_pPortInfo ? std::move(m_pPortInfo->ConnectionInfo) : nullptr;
+}
+
+std::u16string CZKUMHubDeviceImpl::LeafName() const {
+  std::u16string name;
+  if (m_bHasConnectionInfo && m_pPortInfo->ConnectionInfo) {
+    const auto& info = m_pPortInfo->ConnectionInfo->Info;
+    name = u"[Port" + platform::Decimal(static_cast<std::int32_t>(info.ConnectionIndex)) + u"] ";
+    name += ConnectionStatusName(info.ConnectionStatus);
+    name += u" :  ";
+  }
+  return name + (m_strDeviceDescr.empty() ? m_strConnectionName : m_strDeviceDescr);
+}
+
+void CZKUMHubPortImpl::ToString(std::u16string& out, std::u16string indent) const {
+  AppendLine(out, indent,
+             u"HubPort " + platform::Decimal(static_cast<std::int32_t>(m_nPortIndex)) + u":");
+  // Everything but 0 and 1 is called bad, an unconfigured device too. This is meant.
+  AppendLine(out, indent, u"status : ",
+             m_nStatus == KPortEmpty       ? u"no device connected"
+             : m_nStatus == KPortConnected ? u"device connected"
+                                           : u"bad device");
+  ChildsToString(out, indent);
+}
+
+}  // namespace KelvoUHW
