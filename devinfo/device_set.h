@@ -1,4 +1,4 @@
-// Owners of the system's device-information handles.
+// Owners of the system's handles: device-information sets, opened devices, searches.
 #pragma once
 
 #include <cstdint>
@@ -60,6 +60,59 @@ class DeviceFile {
  private:
   platform::DeviceIo& m_io;
   platform::FileHandle m_handle = platform::kInvalidHandle;
+};
+
+// A search over all volumes, closed with its owner. Names as platform::VolumeManager gives them.
+class VolumeSearch {
+ public:
+  explicit VolumeSearch(platform::VolumeManager& volumes) noexcept : m_volumes(volumes) {}
+  ~VolumeSearch() { Close(); }
+  VolumeSearch(const VolumeSearch&) = delete;
+  VolumeSearch& operator=(const VolumeSearch&) = delete;
+
+  platform::Status First(char16_t* name, std::uint32_t nameChars) noexcept {
+    Close();
+    return m_volumes.FirstVolume(name, nameChars, m_handle);
+  }
+  platform::Status Next(char16_t* name, std::uint32_t nameChars) noexcept {
+    return m_volumes.NextVolume(m_handle, name, nameChars);
+  }
+  void Close() noexcept {
+    if (m_handle != platform::kInvalidHandle) {
+      m_volumes.CloseVolumeSearch(std::exchange(m_handle, platform::kInvalidHandle));
+    }
+  }
+
+ private:
+  platform::VolumeManager& m_volumes;
+  platform::FindHandle m_handle = platform::kInvalidHandle;
+};
+
+// A search over the folders of one volume in which others are mounted, closed with its owner.
+class MountPointSearch {
+ public:
+  explicit MountPointSearch(platform::VolumeManager& volumes) noexcept : m_volumes(volumes) {}
+  ~MountPointSearch() { Close(); }
+  MountPointSearch(const MountPointSearch&) = delete;
+  MountPointSearch& operator=(const MountPointSearch&) = delete;
+
+  platform::Status First(const std::u16string& volumeName, char16_t* folder,
+                         std::uint32_t folderChars) noexcept {
+    Close();
+    return m_volumes.FirstMountPoint(volumeName.c_str(), folder, folderChars, m_handle);
+  }
+  platform::Status Next(char16_t* folder, std::uint32_t folderChars) noexcept {
+    return m_volumes.NextMountPoint(m_handle, folder, folderChars);
+  }
+  void Close() noexcept {
+    if (m_handle != platform::kInvalidHandle) {
+      m_volumes.CloseMountPointSearch(std::exchange(m_handle, platform::kInvalidHandle));
+    }
+  }
+
+ private:
+  platform::VolumeManager& m_volumes;
+  platform::FindHandle m_handle = platform::kInvalidHandle;
 };
 
 // The detail record of a device interface: a size field and the device path.

@@ -9,19 +9,25 @@
 
 namespace KelvoUHW {
 
+// Failures of the system are empty texts and 0; std::bad_alloc is the only exception.
+
 // The description (at most 199 characters), or empty when the handle is 0 or the call fails.
 std::u16string GetDeviceDescription(platform::DeviceManager& manager, platform::DevInst node);
 
-// The device id (at most 199 characters) with / turned into \, or empty as above.
+// What a freshly reset device record holds in place of a handle.
+inline constexpr platform::DevInst kUnknownDevInst = 0xFFFFFFFF;
+
+// The device id (at most 199 characters) with / turned into \, or empty when the handle is 0 or
+// unknown or the call fails.
 std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst node);
 
-// Fills m_devInstHandleParent and m_strDevInstIdParent from m_devInstHandle. The parent's handle stays
-// as it was where the call fails; its id is read either way. A volume below the volume manager
-// (ROOT\VOLMGR\) gets its disk's id instead, taken from its own id.
+// Fills m_devInstHandleParent and m_strDevInstIdParent from m_devInstHandle. The parent's handle
+// stays as it was where the call fails; its id is read either way. A volume below the volume
+// manager (ROOT\VOLMGR\) gets its disk's id instead, taken from its own id.
 void ResolveParentInstanceId(platform::DeviceManager& manager, NodeIdentity& node);
 
-// The first node, depth first from the root, whose driver key equals `driverKey` ignoring case; 0 when
-// none does.
+// The first node, depth first from the root, whose driver key equals `driverKey` ignoring case; 0
+// when none does.
 platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
                                          const std::u16string& driverKey);
 
@@ -33,6 +39,8 @@ class DriverKeyIndex {
   platform::DevInst Find(const std::u16string& driverKey);
 
  private:
+  void Fill();
+
   platform::DeviceManager& m_manager;
   std::unordered_map<std::u16string, platform::DevInst> m_nodes;  // by lower-cased driver key
   bool m_filled = false;

@@ -1,11 +1,12 @@
 // Texts that identify devices: instance ids, GUIDs, interface paths, PCI hardware ids.
 //
-// Nothing here fails loudly: a text that does not match leaves the unknown value. All functions may be
-// called from every thread and throw std::bad_alloc only.
+// Nothing here fails loudly: a text that does not match leaves the unknown value. All functions may
+// be called from every thread and throw std::bad_alloc only.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -18,12 +19,8 @@ namespace KelvoUHW {
 // An id that is not known; the interfaces show it as -1.
 inline constexpr std::uint32_t kUnknownId = 0xFFFFFFFF;
 
-// How many characters of a text a readability check looks at.
-inline constexpr std::size_t kReadabilityLimit = 512;
-
-// Whether `text` may be read as a string: the one check before any pointer into a text is used. It
-// looks at no more than kReadabilityLimit characters and so sets no limit to the length; every pointer
-// into a valid string passes, a null one does not.
+// Whether `text` may be read as a string: the one check before a pointer into a text is used. Null
+// may not; every pointer into a string that ends with a zero may, however long the string is.
 bool IsReadableText(const char16_t* text) noexcept;
 
 // The identity of a record: what names its device, and what its instance id tells about it.
@@ -42,30 +39,31 @@ struct NodeIdentity {
   // Stores the id and takes it apart.
   void SetInstanceId(std::u16string id);
   // Takes m_strDevInstId apart: VID_ and PID_, or VEN_ and PROD_, and the last component as serial
-  // number. Writes only what it comes to: a part whose marker is missing ends the work, and what lies
-  // behind keeps its earlier value.
+  // number. Writes only what it comes to: a part whose marker is missing ends the work, and what
+  // lies behind keeps its earlier value.
   void ParseInstanceId();
   // An empty text keeps the serial number that is there: once known, it is not forgotten.
   void SetSerialNumber(std::u16string serialNumber);
   void SetParentInstanceId(std::u16string id) { m_strDevInstIdParent = std::move(id); }
 };
 
-// The hexadecimal number at the start of a text of `count` characters, scanned as "%x" scans: leading
-// blanks, a sign and "0x" are taken, the scan ends at the first other character, digits beyond 32 bits
-// push the upper ones out. kUnknownId when there is no digit.
+// The hexadecimal number at the start of a text of `count` characters, scanned as "%x" scans:
+// leading blanks, a sign and "0x" are taken, the scan ends at the first other character, digits
+// beyond 32 bits push the upper ones out. kUnknownId when there is no digit.
 std::uint32_t ParseHexField(const char16_t* text, std::size_t count) noexcept;
 
-// A GUID in registry form. The first character, expected to be a brace, is skipped unseen. A text that
-// is broken after its first groups gives those groups and zeros: it is meant so.
+// A GUID in registry form. The first character, expected to be a brace, is skipped unseen. A text
+// that is broken after its first groups gives those groups and zeros: it is meant so.
 platform::Guid ParseGuidText(const char16_t* text) noexcept;
 
 // "USB#ROOT_HUB20#4&2f5a2f0&0#{...}" becomes "USB\ROOT_HUB20\4&2F5A2F0&0": cut at the last #, the
 // other # turned into \, upper case. A \\?\ in front stays. Without # the result is empty.
 std::u16string InterfacePathToInstanceId(const char16_t* path);
 
-// The disk a volume of the volume manager lies on: the text between "_??_" and "#{" in the volume's id
-// with # turned into \. Empty when a marker is missing or they stand the other way round.
-std::u16string DiskIdOfVolumeId(std::u16string_view volumeId);
+// The disk a volume of the volume manager lies on: the text (it may be empty) between "_??_" and
+// "#{" in the volume's id with # turned into \. Nothing when a marker is missing or they stand the
+// other way round.
+std::optional<std::u16string> DiskIdOfVolumeId(std::u16string_view volumeId);
 
 struct PciHardwareId {
   std::uint32_t VendorId = 0;

@@ -2,9 +2,9 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdlib>
 #include <cstring>
 #include <memory>
-#include <new>
 
 #include "devinfo/devnode.h"
 #include "devinfo/identifiers.h"
@@ -14,13 +14,13 @@ namespace KelvoUHW {
 
 namespace {
 
-// A second buffer for a name, of the size the driver asked for. The size is the driver's word
-// alone, so the memory is not touched beyond the head, and none at all is an empty name rather than
-// an error.
+// A second buffer for a name, zeroed, of the size the driver asked for. The size is the driver's
+// word alone: the system zeroes a large buffer page by page as it is used, and no memory at all is
+// an empty name rather than an error.
 class NameBuffer {
  public:
   explicit NameBuffer(std::uint32_t size) noexcept
-      : m_bytes(new (std::nothrow) std::uint8_t[size]), m_size(size) {}
+      : m_bytes(static_cast<std::uint8_t*>(std::calloc(size, 1))), m_size(size) {}
 
   explicit operator bool() const noexcept { return m_bytes != nullptr; }
   std::uint8_t* Data() noexcept { return m_bytes.get(); }
@@ -38,7 +38,11 @@ class NameBuffer {
   }
 
  private:
-  std::unique_ptr<std::uint8_t[]> m_bytes;
+  struct Free {
+    void operator()(std::uint8_t* bytes) const noexcept { std::free(bytes); }
+  };
+
+  std::unique_ptr<std::uint8_t[], Free> m_bytes;
   std::uint32_t m_size;
 };
 

@@ -101,18 +101,13 @@ void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent) {
 }
 
 NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId) {
-  // Kept on the heap: how deep a tree goes is up to the hardware.
-  std::vector<const NodePtr*> waiting;
-  if (root) waiting.push_back(&root);
-  while (!waiting.empty()) {
-    const NodePtr& node = *waiting.back();
-    waiting.pop_back();
-    if (node->m_strDevInstId == instanceId) return node;
-    for (auto child = node->m_childs.rbegin(); child != node->m_childs.rend(); ++child) {
-      waiting.push_back(&*child);
-    }
-  }
-  return {};
+  NodePtr found;
+  VisitPreOrder(root, [&](const NodePtr& node) {
+    if (node->m_strDevInstId != instanceId) return true;
+    found = node;
+    return false;
+  });
+  return found;
 }
 
 void AppendLine(std::u16string& out, std::u16string_view indent, std::u16string_view label,

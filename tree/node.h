@@ -103,6 +103,23 @@ void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent);
 // in their order; empty when there is none.
 NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId);
 
+// Calls `visit` with every NodePtr of a tree, a node before its children and children in their
+// order. `visit` returns whether to go on. Nodes must not be added or removed meanwhile.
+template <class Visit>
+void VisitPreOrder(const NodePtr& root, Visit visit) {
+  // Kept on the heap: how deep a tree goes is up to the hardware.
+  std::vector<const NodePtr*> waiting;
+  if (root) waiting.push_back(&root);
+  while (!waiting.empty()) {
+    const NodePtr& node = *waiting.back();
+    waiting.pop_back();
+    if (!visit(node)) return;
+    for (auto child = node->m_childs.rbegin(); child != node->m_childs.rend(); ++child) {
+      waiting.push_back(&*child);
+    }
+  }
+}
+
 // Appends indent + label + value + "\r\n", the shape of most lines of a dump.
 void AppendLine(std::u16string& out, std::u16string_view indent, std::u16string_view label,
                 std::u16string_view value = {});

@@ -4,6 +4,7 @@
 
 #include "devinfo/device_set.h"
 #include "platform/text.h"
+#include "tree/device_forest.h"
 #include "tree/hub_queries.h"
 #include "tree/port_device.h"
 
@@ -42,6 +43,13 @@ void CZKUMTopologyWalker::StartWalk() {
   m_driverKeys.emplace(m_host);
   AddLegacyControllers();
   AddInterfaceControllers();
+  ReadDeviceManagerTree();
+}
+
+void CZKUMTopologyWalker::ReadDeviceManagerTree() {
+  m_deviceRecords.clear();
+  m_deviceRecords = LinkDeviceForest(ReadDeviceRecords(m_host));
+  AddForestNodes(m_deviceRecords, *m_building);
 }
 
 void CZKUMTopologyWalker::Commit() noexcept {

@@ -53,6 +53,8 @@ class CZKUMTopologyWalker {
   using HubPath = std::vector<std::unique_ptr<HubOnTheWay>>;
 
   void AddLegacyControllers();
+  // Fills m_deviceRecords and adds the nodes of its PCI devices.
+  void ReadDeviceManagerTree();
   void AddInterfaceControllers();
   void OpenController(const std::u16string& path);
   bool OpenHub(HubPath& path, const std::u16string& symbolicName,

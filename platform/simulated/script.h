@@ -17,16 +17,16 @@ struct PortChange {
   Port port;
 };
 
-// Everything a newcomer brings: its nodes, interfaces, hubs, storage, volumes and drive letters, and
-// the ports it is plugged into.
+// Everything a newcomer brings: its nodes, interfaces, hubs, storage, volumes and drive letters,
+// and the ports it is plugged into.
 struct Plug {
   Machine fragment;
   std::vector<PortChange> ports;
 };
 
 // A device goes, and everything below it in the device manager; with them what names them: their
-// interfaces, the ports whose driver key is theirs (which become empty), hubs, storage paths and drive
-// letters, and every volume whose device id holds `_??_`, a disk's id with # for \, and `#{`.
+// interfaces, the ports whose driver key is theirs (which become empty), hubs, storage paths and
+// drive letters, and every volume whose device id holds `_??_`, a disk's id with # for \, and `#{`.
 struct Unplug {
   Text device;
 };
@@ -43,8 +43,9 @@ struct Dismount {
 
 // A step with nothing in it is a pause: the PC stays as it is.
 struct Step {
-  std::uint32_t atMilliseconds = 0;  // since the script's start; never smaller than the step's before
-  Text name;                         // for people; may be empty
+  std::uint32_t atMilliseconds =
+      0;      // since the script's start; never smaller than the step's before
+  Text name;  // for people; may be empty
   std::variant<std::monostate, Plug, Unplug, Mount, Dismount> change;
 };
 

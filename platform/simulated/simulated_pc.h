@@ -23,9 +23,9 @@ struct OpenCounts {
   friend bool operator==(const OpenCounts&, const OpenCounts&) = default;
 };
 
-// Thread-safe: one lock guards the whole PC, so that a step is seen whole or not at all by each call.
-// Refuses what Windows refuses (a wrong handle, a buffer that is too small, a second close) with the
-// code Windows gives, and remembers each refused close as a misuse.
+// Thread-safe: one lock guards the whole PC, so that a step is seen whole or not at all by each
+// call. Refuses what Windows refuses (a wrong handle, a buffer that is too small, a second close)
+// with the code Windows gives, and remembers each refused close as a misuse.
 class SimulatedPc final : public Host {
  public:
   explicit SimulatedPc(Machine machine);
@@ -37,7 +37,8 @@ class SimulatedPc final : public Host {
 
   Machine Snapshot() const;
   OpenCounts Open() const;
-  // What is open and who opened it, one text each ("file \\.\HCD0"), and each misuse ("second close").
+  // What is open and who opened it, one text each ("file \\.\HCD0"), and each misuse ("second
+  // close").
   std::vector<std::u16string> OpenNames() const;
   std::vector<std::u16string> Misuses() const;
   std::u16string DebugText() const;
@@ -51,7 +52,8 @@ class SimulatedPc final : public Host {
   Status CloseDevice(FileHandle handle) noexcept override;
 
   // DeviceSets
-  Status GetClassDevs(const Guid* guid, std::uint32_t flags, DeviceSetHandle& set) noexcept override;
+  Status GetClassDevs(const Guid* guid, std::uint32_t flags,
+                      DeviceSetHandle& set) noexcept override;
   Status EnumDeviceInfo(DeviceSetHandle set, std::uint32_t index,
                         SP_DEVINFO_DATA& data) noexcept override;
   Status EnumDeviceInterfaces(DeviceSetHandle set, const Guid& interfaceClass, std::uint32_t index,

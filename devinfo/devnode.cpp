@@ -1,0 +1,113 @@
+#include "devinfo/devnode.h"
+
+#include <algorithm>
+#include <array>
+#include <optional>
+#include <string_view>
+#include <unordered_set>
+
+#include "devinfo/received_text.h"
+#include "platform/text.h"
+
+namespace KelvoUHW {
+
+namespace {
+
+constexpr std::size_t kTextChars = 200;
+using TextBuffer = std::array<char16_t, kTextChars>;
+
+// A text property of a node; nothing when the call fails.
+std::optional<std::u16string> ReadTextProperty(platform::DeviceManager& manager,
+                                               platform::DevInst node, std::uint32_t property) {
+  TextBuffer buffer{};
+  static_assert(sizeof buffer == 400);
+  std::uint32_t bytes = sizeof buffer;
+  std::uint32_t type = 0;
+  if (!manager.GetDevNodeRegistryProperty(node, property, &type, buffer.data(), bytes)) {
+    return std::nullopt;
+  }
+  const std::size_t received = std::min<std::size_t>(bytes / sizeof(char16_t), buffer.size());
+  std::fill(buffer.begin() + static_cast<std::ptrdiff_t>(received), buffer.end(), u'\0');
+  return ReceivedText(buffer);
+}
+
+// Calls `visit` with each node, depth first from the root, until it returns true. The way up asks
+// the system for the parent: a node without one ends the walk, as the root does. No two nodes are
+// visited or climbed to twice, so the walk ends on a system that answers in circles.
+template <class Visit>
+void WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
+  std::unordered_set<platform::DevInst> visited;
+  std::unordered_set<platform::DevInst> climbedTo;
+  platform::DevInst node = 0;
+  if (!manager.LocateRootDevNode(node) || node == 0) return;
+  while (visited.insert(node).second) {
+    if (visit(node)) return;
+    platform::DevInst next = 0;
+    // A handle of 0 is no node, whatever the result code says.
+    if (manager.GetChild(node, next) && next != 0) {
+      node = next;
+      continue;
+    }
+    while (next = 0, !manager.GetSibling(node, next) || next == 0) {
+      platform::DevInst parent = 0;
+      if (!manager.GetParent(node, parent) || parent == 0) return;
+      if (!climbedTo.insert(parent).second) return;
+      node = parent;
+    }
+    node = next;
+  }
+}
+
+}  // namespace
+
+std::u16string GetDeviceDescription(platform::DeviceManager& manager, platform::DevInst node) {
+  if (node == 0) return {};
+  return ReadTextProperty(manager, node, platform::kCM_DRP_DEVICEDESC).value_or(std::u16string());
+}
+
+std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst node) {
+  if (node == 0 || node == kUnknownDevInst) return {};
+  TextBuffer buffer{};
+  if (!manager.GetDeviceId(node, buffer.data(), static_cast<std::uint32_t>(buffer.size())))
+    return {};
+  return platform::Replaced(ReceivedText(buffer).value_or(std::u16string()), u'/', u'\\');
+}
+
+void ResolveParentInstanceId(platform::DeviceManager& manager, NodeIdentity& node) {
+  manager.GetParent(node.m_devInstHandle, node.m_devInstHandleParent);
+  node.m_strDevInstIdParent = GetDeviceId(manager, node.m_devInstHandleParent);
+  if (!node.m_strDevInstIdParent.starts_with(u"ROOT\\VOLMGR\\")) return;
+  if (auto diskId = DiskIdOfVolumeId(node.m_strDevInstId)) {
+    node.m_strDevInstIdParent = *std::move(diskId);
+  }
+}
+
+platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
+                                         const std::u16string& driverKey) {
+  platform::DevInst found = 0;
+  WalkDevNodes(manager, [&](platform::DevInst node) {
+    const auto key = ReadTextProperty(manager, node, platform::kCM_DRP_DRIVER);
+    if (!key || !platform::EqualIgnoringCase(*key, driverKey)) return false;
+    found = node;
+    return true;
+  });
+  return found;
+}
+
+platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
+  if (!m_filled) Fill();
+  const auto found = m_nodes.find(platform::ToLower(driverKey));
+  return found == m_nodes.end() ? 0 : found->second;
+}
+
+void DriverKeyIndex::Fill() {
+  WalkDevNodes(m_manager, [this](platform::DevInst node) {
+    if (const auto key = ReadTextProperty(m_manager, node, platform::kCM_DRP_DRIVER)) {
+      m_nodes.try_emplace(platform::ToLower(*key), node);  // the first node with a key has it
+    }
+    return false;
+  });
+  m_filled = true;
+}
+
+}  // namespace KelvoUHW

@@ -1,0 +1,276 @@
+#include "devinfo/info_device_cache.h"
+
+#include <algorithm>
+#include <array>
+#include <string>
+#include <unordered_set>
+#include <utility>
+
+#include "devinfo/device_set.h"
+#include "devinfo/devnode.h"
+#include "devinfo/info_device_linking.h"
+#include "devinfo/property_reader.h"
+#include "platform/text.h"
+
+namespace KelvoUHW {
+
+namespace {
+
+// Far beyond any PC; a system whose list has no end is left there.
+constexpr std::uint32_t kMostDevices = 200'000;
+
+// Parents by how their ids begin: a device below any other bus is not reported.
+bool HasAdmittedParent(const CZKUMInfoDeviceImpl& record) noexcept {
+  static constexpr std::array<std::u16string_view, 5> kPrefixes{u"USB", u"IUSB", u"SD", u"PCI",
+                                                                u"SCSI"};
+  return std::ranges::any_of(kPrefixes, [&](std::u16string_view prefix) {
+    return record.m_strDevInstIdParent.starts_with(prefix);
+  });
+}
+
+// Whether all records of a growing set name the same parent, ignoring case.
+class CommonParent {
+ public:
+  explicit CommonParent(const InfoDeviceSet& records) {
+    for (const InfoDevicePtr& record : records) {
+      Add(record->m_strDevInstIdParent);
+      if (m_differ) return;
+    }
+  }
+  void Add(std::u16string_view parentId) {
+    if (m_any) {
+      m_differ = m_differ || !platform::EqualIgnoringCase(parentId, m_parentId);
+    } else {
+      m_parentId = parentId;
+      m_any = true;
+    }
+  }
+  bool AllName(std::u16string_view parentId) const noexcept {
+    return !m_any || (!m_differ && platform::EqualIgnoringCase(parentId, m_parentId));
+  }
+
+ private:
+  bool m_any = false;
+  bool m_differ = false;
+  std::u16string m_parentId;
+};
+
+// The instance ids of a tree. The texts are the nodes' own.
+std::unordered_set<std::u16string_view> InstanceIdsOf(const NodePtr& root) {
+  std::unordered_set<std::u16string_view> ids;
+  std::vector<const CZKUMUsbTreeNodeImpl*> waiting;
+  if (root) waiting.push_back(root.Get());
+  while (!waiting.empty()) {
+    const CZKUMUsbTreeNodeImpl* node = waiting.back();
+    waiting.pop_back();
+    ids.insert(node->m_strDevInstId);
+    for (const NodePtr& child : node->m_childs) waiting.push_back(child.Get());
+  }
+  return ids;
+}
+
+}  // namespace
+
+const platform::Guid* DeviceClassByName(std::u16string_view name) noexcept {
+  static constexpr std::array<std::pair<std::u16string_view, const platform::Guid*>, 6> kClasses{
+      {{u"usb", &platform::GUID_DEVCLASS_USB},
+       {u"volume", &platform::GUID_DEVCLASS_VOLUME},
+       {u"image", &platform::GUID_DEVCLASS_IMAGE},
+       {u"wceusbs", &platform::GUID_DEVCLASS_WCEUSBS},
+       {u"unknown", &platform::GUID_DEVCLASS_UNKNOWN},
+       {u"diskdrive", &platform::GUID_DEVCLASS_DISKDRIVE}}};
+  for (const auto& [className, guid] : kClasses) {
+    if (className == name) return guid;
+  }
+  return nullptr;
+}
+
+void InfoDeviceCache::SetDiskDrives(std::vector<DeviceNodeRecord> diskDrives) {
+  m_diskDrives = std::move(diskDrives);
+}
+
+bool InfoDeviceCache::Collect(const NodePtr& treeRoot) {
+  m_nAddedCount = 0;
+  m_nRemovedCount = 0;
+  for (const InfoDevicePtr& record : m_held) record->m_pParent = nullptr;
+  if (EnumerateDeviceNodes({}) != 0) return false;
+  ReturnHeldParents();
+  FindRemoved();
+  HoldBack(AncestorsOfRemoved());
+  LinkToParents(m_current);
+  SortPending(treeRoot);
+  return m_nAddedCount > 0 || m_nRemovedCount > 0;
+}
+
+std::uint32_t InfoDeviceCache::EnumerateDeviceNodes(std::u16string_view className) {
+  const platform::Guid* classGuid = DeviceClassByName(className);
+  DeviceSet set(m_sets);
+  const platform::Status opened =
+      set.Open(classGuid, platform::kDIGCF_PRESENT | (classGuid ? 0 : platform::kDIGCF_ALLCLASSES));
+  if (!opened) {
+    const bool noReason = opened.error == 0 || opened.error == platform::kERROR_NO_MORE_ITEMS;
+    return noReason ? platform::kERROR_INVALID_FUNCTION : opened.error;
+  }
+
+  m_current.Clear();
+  PropertyBuffer buffer;
+  InfoDevicePtr record = MakeRecord<CZKUMInfoDeviceImpl>();
+  for (std::uint32_t index = 0; index < kMostDevices; ++index) {
+    platform::SP_DEVINFO_DATA element;
+    element.cbSize = sizeof element;
+    if (!m_sets.EnumDeviceInfo(set.Get(), index, element)) break;
+    // This is meant: an excluded node leaves its properties in the record, and the next node shows
+    // those that it does not have itself.
+    if (!ReadNode(set.Get(), element, buffer, *record)) continue;
+    if (!HasAdmittedParent(*record)) {
+      record->Reset();
+      continue;
+    }
+    Keep(record);
+    record = MakeRecord<CZKUMInfoDeviceImpl>();
+  }
+  CreateDiskDriveRecords();
+  return 0;
+}
+
+// False for an excluded node.
+bool InfoDeviceCache::ReadNode(platform::DeviceSetHandle set,
+                               const platform::SP_DEVINFO_DATA& element, PropertyBuffer& buffer,
+                               CZKUMInfoDeviceImpl& record) {
+  if (!ReadInfoDeviceProperties(m_sets, set, element, buffer, record)) return false;
+  record.SetInstanceId(GetInstanceId(m_sets, set, element));
+  record.m_devInstHandle = element.DevInst;
+  ResolveParentInstanceId(m_manager, record);
+  return true;
+}
+
+void InfoDeviceCache::Keep(const InfoDevicePtr& record) {
+  if (m_held.HasHandle(record->m_devInstHandle)) return;  // the held record may return later
+  if (const InfoDevicePtr known = m_previous.FindByHandle(record->m_devInstHandle)) {
+    m_current.Insert(known);
+    return;
+  }
+  KeepAsNewUnlessPrevious(record);
+}
+
+void InfoDeviceCache::KeepAsNewUnlessPrevious(const InfoDevicePtr& record) {
+  m_current.Insert(record);
+  if (m_previous.HasHandle(record->m_devInstHandle)) return;
+  m_added.Insert(record);
+  ++m_nAddedCount;
+}
+
+void InfoDeviceCache::CreateDiskDriveRecords() {
+  CommonParent common(m_current);
+  for (const DeviceNodeRecord& drive : m_diskDrives) {
+    // This is meant, though it reads the wrong way round: a drive gets a record of its own only
+    // when every current record lies below it (or there is none), not when it has no record yet.
+    if (!common.AllName(drive.InstanceId)) continue;
+    const InfoDevicePtr record = MakeRecord<CZKUMInfoDeviceImpl>();
+    record->SetInstanceId(drive.InstanceId);
+    record->SetParentInstanceId(drive.ParentInstanceId);
+    record->FriendlyName = drive.Name;
+    record->Location = drive.Location;
+    record->HardwareId = drive.HardwareId;
+    record->DevClass = drive.ClassName;
+    KeepAsNewUnlessPrevious(record);
+    common.Add(record->m_strDevInstIdParent);
+  }
+}
+
+// Held records return when the pass has a child of them. All are collected before the first
+// returns: a record that returns does not bring its own held parent along in the same pass.
+void InfoDeviceCache::ReturnHeldParents() {
+  InfoDeviceSet children;
+  for (const InfoDevicePtr& held : m_held) {
+    const InfoDevicePtr child = m_current.FindByParentId(held->m_strDevInstId, held.Get());
+    if (child) children.Insert(child);
+  }
+  InfoDeviceSet returning;
+  for (const InfoDevicePtr& child : children) {
+    if (m_held.HasRecord(child.Get())) returning.Insert(child);
+    for (const InfoDevicePtr& held : m_held.AllByInstanceId(child->m_strDevInstIdParent)) {
+      if (held != child) returning.Insert(held);
+    }
+  }
+  for (const InfoDevicePtr& record : returning) {
+    KeepAsNewUnlessPrevious(record);
+    m_held.Erase(record.Get());
+  }
+}
+
+void InfoDeviceCache::FindRemoved() {
+  m_removed.Clear();
+  for (const InfoDevicePtr& record : m_previous) {
+    if (m_current.HasHandle(record->m_devInstHandle)) continue;
+    m_removed.Insert(record);
+    ++m_nRemovedCount;
+  }
+}
+
+// Each text is looked up once however many records share it.
+InfoDeviceSet InfoDeviceCache::AncestorsOfRemoved() const {
+  InfoDeviceSet ancestors;
+  std::unordered_set<std::u16string_view> parentIds;
+  std::unordered_set<std::u16string_view> grandparentIds;
+  for (const InfoDevicePtr& removed : m_removed) {
+    if (!parentIds.insert(removed->m_strDevInstIdParent).second) continue;
+    for (const InfoDevicePtr& parent : m_current.AllByInstanceId(removed->m_strDevInstIdParent)) {
+      ancestors.Insert(parent);
+      if (!grandparentIds.insert(parent->m_strDevInstIdParent).second) continue;
+      for (const InfoDevicePtr& grandparent :
+           m_current.AllByInstanceId(parent->m_strDevInstIdParent)) {
+        ancestors.Insert(grandparent);
+      }
+    }
+  }
+  return ancestors;
+}
+
+// They count as removed too, but not in the count that decides whether something changed.
+void InfoDeviceCache::HoldBack(const InfoDeviceSet& ancestors) {
+  for (const InfoDevicePtr& record : ancestors) {
+    m_removed.Insert(record);
+    if (m_current.Erase(record.Get())) m_held.Insert(record);
+  }
+}
+
+// New records wait until the tree shows their device, and count as added from then on.
+void InfoDeviceCache::SortPending(const NodePtr& treeRoot) {
+  const std::unordered_set<std::u16string_view> shown = InstanceIdsOf(treeRoot);
+  InfoDeviceSet stillPending;
+  InfoDeviceSet nowShown;
+  for (const InfoDevicePtr& record : m_pending) {
+    if (!m_current.HasRecord(record.Get()) || m_added.HasRecord(record.Get())) continue;
+    (shown.contains(record->m_strDevInstId) ? nowShown : stillPending).Insert(record);
+  }
+  InfoDeviceSet added;
+  for (const InfoDevicePtr& record : m_added) {
+    if (shown.contains(record->m_strDevInstId)) {
+      added.Insert(record);
+    } else {
+      stillPending.Insert(record);
+      --m_nAddedCount;
+    }
+  }
+  for (const InfoDevicePtr& record : nowShown) {
+    added.Insert(record);
+    ++m_nAddedCount;
+  }
+  m_pending = std::move(stillPending);
+  m_added = std::move(added);
+}
+
+void InfoDeviceCache::Commit() {
+  m_previous = std::move(m_current);
+  m_current.Clear();
+  m_removed.Clear();
+  m_added.Clear();
+}
+
+void InfoDeviceCache::AttachToParentInfoDevice(const NodePtr& node) const {
+  const InfoDevicePtr parent = m_current.FindByInstanceId(node->m_strDevInstIdParent);
+  if (parent && parent != node) AddChild(node, parent.Get());
+}
+
+}  // namespace KelvoUHW

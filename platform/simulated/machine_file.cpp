@@ -1,0 +1,23 @@
+#include "platform/simulated/machine_file.h"
+
+#include "platform/simulated/json_reader.h"
+#include "platform/simulated/machine_check.h"
+#include "platform/simulated/machine_sections.h"
+
+namespace platform::simulated {
+
+Machine ParseMachine(std::string_view json, const std::string& file) {
+  const Json document = ParseJson(json, file);
+  JsonObject object(JsonValue(document, file, ""));
+  Machine machine;
+  object.Read("name", machine.name);
+  object.Read("notes", machine.notes);
+  ReadSections(object, machine);
+  object.Finish();
+  CheckMachine(Machine{}, machine, file, "");
+  return machine;
+}
+
+Machine LoadMachine(const std::string& path) { return ParseMachine(ReadFileBytes(path), path); }
+
+}  // namespace platform::simulated

@@ -1,0 +1,36 @@
+// What a simulated PC consists of; only its own sources include this.
+#pragma once
+
+#include <mutex>
+#include <vector>
+
+#include "platform/simulated/handle_table.h"
+#include "platform/simulated/machine.h"
+#include "platform/simulated/machine_index.h"
+#include "platform/simulated/simulated_pc.h"
+
+namespace platform::simulated {
+
+// One state of the machine with its index, which refers to it: neither moves nor changes.
+struct IndexedMachine {
+  IndexedMachine(Machine state, DeviceNumbers& numbers)
+      : machine(std::move(state)), index(machine, numbers) {}
+  IndexedMachine(const IndexedMachine&) = delete;
+  IndexedMachine& operator=(const IndexedMachine&) = delete;
+
+  const Machine machine;
+  const MachineIndex index;
+};
+
+struct SimulatedPc::State {
+  explicit State(Machine machine)
+      : now(std::make_unique<const IndexedMachine>(std::move(machine), numbers)) {}
+
+  std::mutex mutex;  // guards everything below
+  DeviceNumbers numbers;
+  std::unique_ptr<const IndexedMachine> now;
+  HandleTable handles;
+  Text debugText;
+};
+
+}  // namespace platform::simulated

@@ -1,0 +1,224 @@
+#include "platform/text.h"
+
+#include <algorithm>
+#include <array>
+
+namespace platform {
+namespace {
+
+// Upper-case letters whose lower-case partner stands `offset` further on. Step 1: every letter of
+// the range; step 2: every other one, from the first (the letters between are the partners).
+struct CaseRange {
+  char16_t first;
+  char16_t last;
+  std::int16_t offset;
+  std::uint8_t step;
+};
+
+// Ordered by upper-case letter. Left out because the system maps them to themselves: the signs
+// U+00D7 and U+00F7, and the letters without a single partner (U+00DF, U+0130, U+0131, U+0138,
+// U+0149, U+017F).
+constexpr std::array kCaseRanges = {
+    CaseRange{0x0041, 0x005A, 32, 1}, CaseRange{0x00C0, 0x00D6, 32, 1},
+    CaseRange{0x00D8, 0x00DE, 32, 1}, CaseRange{0x0100, 0x012E, 1, 2},
+    CaseRange{0x0132, 0x0136, 1, 2},  CaseRange{0x0139, 0x0147, 1, 2},
+    CaseRange{0x014A, 0x0176, 1, 2},  CaseRange{0x0178, 0x0178, -121, 1},
+    CaseRange{0x0179, 0x017D, 1, 2},  CaseRange{0x0386, 0x0386, 38, 1},
+    CaseRange{0x0388, 0x038A, 37, 1}, CaseRange{0x038C, 0x038C, 64, 1},
+    CaseRange{0x038E, 0x038F, 63, 1}, CaseRange{0x0391, 0x03A1, 32, 1},
+    CaseRange{0x03A3, 0x03AB, 32, 1}, CaseRange{0x03E2, 0x03EE, 1, 2},
+    CaseRange{0x0400, 0x040F, 80, 1}, CaseRange{0x0410, 0x042F, 32, 1},
+    CaseRange{0x0460, 0x0480, 1, 2},  CaseRange{0x048A, 0x04BE, 1, 2},
+    CaseRange{0x04C0, 0x04C0, 15, 1}, CaseRange{0x04C1, 0x04CD, 1, 2},
+    CaseRange{0x04D0, 0x0526, 1, 2},  CaseRange{0x0531, 0x0556, 48, 1},
+    CaseRange{0x1E00, 0x1E94, 1, 2},  CaseRange{0x1EA0, 0x1EFE, 1, 2},
+    CaseRange{0x2160, 0x216F, 16, 1}, CaseRange{0x24B6, 0x24CF, 26, 1},
+    CaseRange{0xFF21, 0xFF3A, 32, 1},
+};
+
+constexpr char16_t kReplacement = 0xFFFD;
+
+// Raised like its ordinary twin, whereas lowering never leads to it.
+constexpr char16_t kFinalSigma = 0x03C2;
+constexpr char16_t kCapitalSigma = 0x03A3;
+
+constexpr bool IsHighSurrogate(char16_t unit) { return unit >= 0xD800 && unit <= 0xDBFF; }
+constexpr bool IsLowSurrogate(char16_t unit) { return unit >= 0xDC00 && unit <= 0xDFFF; }
+
+std::u16string Digits(std::uint32_t value, unsigned base, unsigned width, char16_t pad,
+                      const char16_t* digits) {
+  std::u16string text;
+  do {
+    text += digits[value % base];
+    value /= base;
+  } while (value != 0);
+  if (text.size() < width) text.append(width - text.size(), pad);
+  std::reverse(text.begin(), text.end());
+  return text;
+}
+
+// Appends the low six bits of `point` >> `shift` as a continuation byte.
+void AppendContinuation(std::string& bytes, char32_t point, unsigned shift) {
+  bytes += static_cast<char>(0x80 | ((point >> shift) & 0x3F));
+}
+
+void AppendUtf8(std::string& bytes, char32_t point) {
+  if (point < 0x80) {
+    bytes += static_cast<char>(point);
+  } else if (point < 0x800) {
+    bytes += static_cast<char>(0xC0 | (point >> 6));
+    AppendContinuation(bytes, point, 0);
+  } else if (point < 0x10000) {
+    bytes += static_cast<char>(0xE0 | (point >> 12));
+    AppendContinuation(bytes, point, 6);
+    AppendContinuation(bytes, point, 0);
+  } else {
+    bytes += static_cast<char>(0xF0 | (point >> 18));
+    AppendContinuation(bytes, point, 12);
+    AppendContinuation(bytes, point, 6);
+    AppendContinuation(bytes, point, 0);
+  }
+}
+
+// The code point at the start of `bytes` (not empty) and its length; length 0 where it is
+// malformed: cut short, longer than needed, a surrogate or beyond U+10FFFF.
+struct Decoded {
+  char32_t point;
+  std::size_t length;
+};
+
+Decoded DecodeUtf8(std::string_view bytes) {
+  constexpr Decoded kMalformed{0, 0};
+  const auto byte = [&](std::size_t i) { return static_cast<unsigned char>(bytes[i]); };
+  const unsigned char lead = byte(0);
+  if (lead < 0x80) return {lead, 1};
+  const std::size_t length = lead >= 0xF0 ? 4 : lead >= 0xE0 ? 3 : 2;
+  if (lead < 0xC2 || lead > 0xF4 || bytes.size() < length) return kMalformed;
+  char32_t point = lead & (0x7Fu >> length);
+  for (std::size_t i = 1; i < length; ++i) {
+    if ((byte(i) & 0xC0) != 0x80) return kMalformed;
+    point = (point << 6) | (byte(i) & 0x3Fu);
+  }
+  constexpr std::array<char32_t, 5> kSmallest = {0, 0, 0x80, 0x800, 0x10000};
+  if (point < kSmallest[length] || point > 0x10FFFF) return kMalformed;
+  if (point >= 0xD800 && point <= 0xDFFF) return kMalformed;
+  return {point, length};
+}
+
+}  // namespace
+
+char16_t ToLower(char16_t unit) noexcept {
+  if (unit < 0x80) return unit >= u'A' && unit <= u'Z' ? static_cast<char16_t>(unit + 32) : unit;
+  for (const CaseRange& range : kCaseRanges) {
+    if (unit < range.first) break;
+    if (unit <= range.last && (unit - range.first) % range.step == 0) {
+      return static_cast<char16_t>(unit + range.offset);
+    }
+  }
+  return unit;
+}
+
+char16_t ToUpper(char16_t unit) noexcept {
+  if (unit < 0x80) return unit >= u'a' && unit <= u'z' ? static_cast<char16_t>(unit - 32) : unit;
+  if (unit == kFinalSigma) return kCapitalSigma;
+  for (const CaseRange& range : kCaseRanges) {
+    const int upper = unit - range.offset;
+    if (upper >= range.first && upper <= range.last && (upper - range.first) % range.step == 0) {
+      return static_cast<char16_t>(upper);
+    }
+  }
+  return unit;
+}
+
+std::u16string ToLower(std::u16string_view text) {
+  std::u16string lowered(text);
+  for (char16_t& unit : lowered) unit = ToLower(unit);
+  return lowered;
+}
+
+std::u16string ToUpper(std::u16string_view text) {
+  std::u16string raised(text);
+  for (char16_t& unit : raised) unit = ToUpper(unit);
+  return raised;
+}
+
+bool EqualIgnoringCase(std::u16string_view a, std::u16string_view b) noexcept {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(), [](char16_t left, char16_t right) {
+    return left == right || ToLower(left) == ToLower(right);
+  });
+}
+
+std::u16string Replaced(std::u16string text, char16_t from, char16_t to) {
+  std::replace(text.begin(), text.end(), from, to);
+  return text;
+}
+
+std::u16string_view UpToZero(std::u16string_view buffer) noexcept {
+  return buffer.substr(0, buffer.find(u'\0'));
+}
+
+std::u16string Hex(std::uint32_t value, unsigned width) {
+  return Digits(value, 16, width, u'0', u"0123456789ABCDEF");
+}
+
+std::u16string HexLower(std::uint32_t value, unsigned width) {
+  return Digits(value, 16, width, u'0', u"0123456789abcdef");
+}
+
+std::u16string Decimal(std::int32_t value, unsigned width) {
+  const bool negative = value < 0;
+  const auto magnitude =
+      negative ? 0u - static_cast<std::uint32_t>(value) : static_cast<std::uint32_t>(value);
+  std::u16string text = Digits(magnitude, 10, 0, u' ', u"0123456789");
+  if (negative) text.insert(text.begin(), u'-');
+  if (text.size() < width) text.insert(text.begin(), width - text.size(), u' ');
+  return text;
+}
+
+std::u16string GuidText(const Guid& guid) {
+  std::u16string text =
+      u"{" + Hex(guid.Data1, 8) + u"-" + Hex(guid.Data2, 4) + u"-" + Hex(guid.Data3, 4) + u"-";
+  for (std::size_t i = 0; i < guid.Data4.size(); ++i) {
+    if (i == 2) text += u'-';
+    text += Hex(guid.Data4[i], 2);
+  }
+  return text += u'}';
+}
+
+std::string ToUtf8(std::u16string_view text) {
+  std::string bytes;
+  bytes.reserve(text.size());
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    char32_t point = text[i];
+    if (IsHighSurrogate(text[i]) && i + 1 < text.size() && IsLowSurrogate(text[i + 1])) {
+      point = 0x10000 + ((point - 0xD800) << 10) + (text[++i] - 0xDC00u);
+    } else if (IsHighSurrogate(text[i]) || IsLowSurrogate(text[i])) {
+      point = kReplacement;
+    }
+    AppendUtf8(bytes, point);
+  }
+  return bytes;
+}
+
+std::u16string FromUtf8(std::string_view bytes) {
+  std::u16string text;
+  text.reserve(bytes.size());
+  while (!bytes.empty()) {
+    const Decoded decoded = DecodeUtf8(bytes);
+    if (decoded.length == 0) {
+      text += kReplacement;
+      bytes.remove_prefix(1);
+      continue;
+    }
+    if (decoded.point < 0x10000) {
+      text += static_cast<char16_t>(decoded.point);
+    } else {
+      text += static_cast<char16_t>(0xD800 + ((decoded.point - 0x10000) >> 10));
+      text += static_cast<char16_t>(0xDC00 + ((decoded.point - 0x10000) & 0x3FF));
+    }
+    bytes.remove_prefix(decoded.length);
+  }
+  return text;
+}
+
+}  // namespace platform

@@ -1,0 +1,206 @@
+#include "com/descriptor_dump.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <set>
+
+#include "platform/text.h"
+
+namespace KelvoUHW {
+namespace {
+
+using Bytes = std::vector<std::uint8_t>;
+
+constexpr char kUnknown[] = "\r\nUnknown Descriptor:\r\n";
+
+// The dump of a configuration and of its interfaces.
+std::string Dump(const Bytes& bytes, const StringDescriptorNode* strings = nullptr,
+                 std::u16string_view prefix = u"") {
+  const auto descriptors = SplitConfiguration(bytes);
+  std::u16string out;
+  DumpConfiguration(descriptors, strings, prefix, out);
+  for (const auto& entry : MakeInterfaceEntries(descriptors, strings)) {
+    DumpInterface(*entry, prefix, out);
+  }
+  return platform::ToUtf8(out);
+}
+
+// The dump of one descriptor, whatever its length byte says.
+std::string One(const Bytes& bytes) {
+  const RawDescriptor one = bytes;
+  std::u16string out;
+  DumpConfiguration({&one, 1}, nullptr, u"", out);
+  return platform::ToUtf8(out);
+}
+
+std::vector<std::string> Lines(std::string_view text) {
+  std::vector<std::string> lines;
+  for (std::size_t end; (end = text.find("\r\n")) != text.npos; text.remove_prefix(end + 2)) {
+    lines.emplace_back(text.substr(0, end));
+  }
+  EXPECT_EQ(text, "");
+  return lines;
+}
+
+// The prefix stands before a line end that begins a text, and inside the bmAttributes line.
+TEST(DescriptorDump, WritesEveryLineAndOfACutOneWhatWasReceived) {
+  const Bytes whole = {9,  2,    69,   0, 3, 1, 4,    0xE0, 50,                   //
+                       9,  4,    0,    2, 1, 8, 6,    0x50, 4,                    //
+                       11, 4,    1,    0, 0, 4, 0,    0,    0,    2,    1,        //
+                       12, 0x21, 0x11, 1, 9, 2, 0x22, 65,   0,    0x23, 7,    1,  //
+                       7,  5,    0x8A, 3, 8, 2, 10,                               //
+                       9,  5,    0x02, 1, 8, 0, 0x34, 0x12, 0x83,                 //
+                       12, 0x24, 1,    2, 3, 4, 5,    6,    7,    8,    0xAB, 0xCD};
+  StringDescriptorNode strings;
+  strings.DescriptorIndex = 4;
+  strings.LanguageID = 0x409;
+  strings.StringDescriptor = {6, 3, 'U', 0, 'S', 0};
+  const std::string full = Dump(whole, &strings, u"|");
+  EXPECT_EQ(
+      full,
+      "|ConfigDesc :::\r\n|\r\nConfiguration Descriptor:\r\n|wTotalLength:       0x0045\r\n"
+      "|bNumInterfaces:       0x03\r\n|bConfigurationValue:  0x01\r\n|iConfiguration:       "
+      "0x04\r\n"
+      "|(LanguageID=0x0409):    \"US\"\r\n"
+      "|bmAttributes:         0xE0 (|Bus Powered |Self Powered |Remote Wakeup)\r\n"
+      "|MaxPower:             0x32 (100 Ma)\r\n"
+      "|\r\nHID Descriptor:\r\n|bcdHID:             0x0111\r\n|bCountryCode:         0x09\r\n"
+      "|bNumDescriptors:      0x02\r\n|bDescriptorType:      0x22\r\n|wDescriptorLength:  "
+      "0x0041\r\n"
+      "|bDescriptorType:      0x23\r\n|wDescriptorLength:  0x0107\r\n"
+      "|\r\n|Endpoint Descriptor:\r\n|bEndpointAddress:     0x8A  IN\r\n"
+      "|Transfer Type:        Interrupt\r\n|wMaxPacketSize:       0x0208 (520)\r\n"
+      "|bInterval:            0x0A\r\n"
+      "|\r\n|Endpoint Descriptor:\r\n|bEndpointAddress:     0x02  OUT\r\n"
+      "|Transfer Type:        Isochronous\r\n|wMaxPacketSize:       0x0008 (8)\r\n"
+      "|wInterval:          0x1234\r\n|bSyncAddress:         0x83\r\n"
+      "|\r\nUnknown Descriptor:\r\n|bDescriptorType:      0x24\r\n|bLength:              0x0C\r\n"
+      "0C 24 01 02 03 04 05 06 07 08 AB CD \r\n|End ConfigDesc ...\r\n"
+      "|\r\nInterface Descriptor:\r\n|bInterfaceNumber:     0x00\r\n|bAlternateSetting:    0x02\r\n"
+      "|bNumEndpoints:        0x01\r\n|bInterfaceClass:      0x08 (Interface: Mass Storage)\r\n"
+      "|bInterfaceSubClass:   0x06 (SCSI transparent)\r\n"
+      "|bInterfaceProtocol:   0x50 (Bulk-Only Transport)\r\n|iInterface:           0x04\r\n"
+      "|(LanguageID=0x0409):    \"US\"\r\n"
+      "|\r\nInterface Descriptor:\r\n|bInterfaceNumber:     0x01\r\n|bAlternateSetting:    0x00\r\n"
+      "|bNumEndpoints:        0x00\r\n|bInterfaceClass:      0x04 (Unknown)\r\n"
+      "|bInterfaceSubClass:   0x00 ()\r\n|bInterfaceProtocol:   0x00 ()\r\n"
+      "|iInterface:           0x00\r\n|wNumClasses:        0x0102\r\n");
+
+  const std::vector<std::string> all = Lines(full);
+  const std::set<std::string> known(all.begin(), all.end());
+  std::size_t before = 2;
+  for (std::size_t n = 0; n <= whole.size(); ++n) {
+    // Memory of exactly n bytes, where the address sanitizer sees a read behind them.
+    const auto some =
+        Lines(Dump(Bytes(whole.begin(), whole.begin() + static_cast<int>(n)), &strings, u"|"));
+    EXPECT_GE(some.size(), before) << n;
+    before = some.size();
+    for (const std::string& line : some) {
+      // The bytes of an unknown descriptor are the only line that may end early.
+      EXPECT_TRUE(known.contains(line) || line.find_first_not_of("0123456789ABCDEF ") == line.npos)
+          << n << " " << line;
+    }
+  }
+  EXPECT_EQ(before, all.size());
+}
+
+TEST(DescriptorDump, BitsAndLengthsThatLie) {
+  struct {
+    Bytes Descriptor;
+    const char* Text;
+  } const cases[] = {
+      {{9, 2, 9, 0, 1, 1, 0, 0x00, 255}, "0x00 ()\r\nMaxPower:             0xFF (510 Ma)\r\n"},
+      {{9, 2, 9, 0, 1, 1, 0, 0xA0, 0}, "0xA0 (Bus Powered Remote Wakeup)\r\n"},
+      {{7, 5, 0x80, 0x3C, 8, 0, 1}, "0x80  IN\r\nTransfer Type:        Control\r\n"},
+      {{7, 5, 0x7F, 0x02, 8, 0, 1}, "0x7F  OUT\r\nTransfer Type:        Bulk\r\n"},
+      // Ends with the bytes, in the middle of the second of 255 entries.
+      {{10, 0x21, 0, 1, 0, 255, 0x22, 5, 0, 0x24},
+       "0xFF\r\nbDescriptorType:      0x22\r\nwDescriptorLength:  0x0005\r\n"
+       "bDescriptorType:      0x24\r\nEnd ConfigDesc"},
+      {{0, 5}, "bDescriptorType:      0x05\r\nbLength:              0x00\r\nEnd ConfigDesc"},
+      {{1, 5, 7}, "bLength:              0x01\r\n01 \r\nEnd ConfigDesc"},
+      {{5}, "ConfigDesc :::\r\nEnd ConfigDesc"},
+      {{}, "ConfigDesc :::\r\nEnd ConfigDesc"},
+  };
+  for (const auto& c : cases)
+    EXPECT_NE(One(c.Descriptor).find(c.Text), std::string::npos) << c.Text;
+
+  struct {
+    std::uint8_t Type;
+    std::set<unsigned> Known;
+  } const types[] = {{1, {}}, {2, {9}}, {4, {9, 11}}, {5, {7, 9}}, {0x21, {9, 10, 11, 12, 255}}};
+  for (const auto& type : types) {
+    for (const unsigned length : {0u, 1u, 2u, 6u, 7u, 8u, 9u, 10u, 11u, 12u, 255u}) {
+      const bool unknown =
+          One({static_cast<std::uint8_t>(length), type.Type}).find(kUnknown) != std::string::npos;
+      EXPECT_EQ(unknown, !type.Known.contains(length)) << unsigned{type.Type} << " " << length;
+    }
+  }
+}
+
+TEST(DescriptorDump, UnknownBytesStandSixteenToALine) {
+  for (const std::size_t received : {2u, 15u, 16u, 17u, 20u, 32u, 33u}) {
+    Bytes bytes(received, 0xEE);
+    bytes[0] = 255;
+    std::string expected = "bLength:              0xFF\r\nFF ";
+    for (std::size_t i = 1; i < received; ++i) expected += i % 16 == 0 ? "\r\nEE " : "EE ";
+    const std::string text = One(bytes);
+    EXPECT_NE(text.find(expected + "\r\nEnd ConfigDesc"), std::string::npos) << text;
+  }
+}
+
+std::string Connection(const platform::ConnectionInformationEx& record) {
+  std::u16string out;
+  DumpConnectionInformation(record, u"-", out);
+  return platform::ToUtf8(out);
+}
+
+TEST(ConnectionDump, WritesTheDeviceThePortAndTheOpenPipes) {
+  platform::ConnectionInformationEx record{};
+  EXPECT_EQ(Connection(record), "-ConnectionStatus: NoDeviceConnected\r\n");
+  record.Info = {
+      1, {18, 1, 0x0200, 9, 1, 2, 64, 0x46D, 0xC018, 0x4301, 1, 2, 3, 4}, 5, 2, 1, 0x107, 1, 1};
+  // It says 9 bytes: its last two come from the place behind the descriptor.
+  record.PipeList[0] = {{9, 5, 0x81, 3, 8, 10}, 0x0000BBAA};
+  EXPECT_EQ(Connection(record),
+            "-ConnectionInfo :::\r\n-Device Descriptor:\r\n-bcdUSB:                 0x0200\r\n"
+            "-bDeviceClass:           0x09\r\n-bDeviceSubClass:        0x01\r\n"
+            "-bDeviceProtocol:        0x02\r\n-bMaxPacketSize0:        0x40 (64)\r\n"
+            "-bcdDevice:              0x4301\r\n-bNumConfigurations:     0x04\r\n"
+            "-ConnectionStatus: DeviceConnected\r\n-Current Config Value: 0x05\r\n"
+            "-Device Bus Speed:     High\r\n-DeviceIsHub: yes\r\n-Device Address:       0x107\r\n"
+            "-Open Pipes:              1\r\n-\r\n-Endpoint Descriptor:\r\n"
+            "-bEndpointAddress:     0x81  IN\r\n-Transfer Type:        Interrupt\r\n"
+            "-wMaxPacketSize:       0x0008 (8)\r\n-wInterval:          0xAA0A\r\n"
+            "-bSyncAddress:         0xBB\r\n-End ConnectionInfo ---\r\n");
+}
+
+TEST(ConnectionDump, TakesNoNumberFromTheRecordAtItsWord) {
+  struct {
+    std::uint32_t Pipes, Status;
+    std::uint8_t Speed;
+    std::size_t Endpoints;
+    std::set<std::string> Lines;
+  } const cases[] = {
+      {0, 2, 0, 0, {"-ConnectionStatus: DeviceFailedEnumeration", "-Device Bus Speed:     Low"}},
+      {30, 5, 1, 30, {"-Open Pipes:             30", "-Device Bus Speed:     Full"}},
+      {31, 6, 3, 30, {"-ConnectionStatus: (unknown)", "-Device Bus Speed:     Unknown"}},
+      {~0u, ~0u, 255, 30, {"-Open Pipes:             -1", "-Device Bus Speed:     Unknown"}},
+  };
+  for (const auto& c : cases) {
+    // On the heap, where a read behind the 365 bytes is seen.
+    const auto record = std::make_unique<platform::ConnectionInformationEx>();
+    record->Info.NumberOfOpenPipes = c.Pipes;
+    record->Info.ConnectionStatus = c.Status;
+    record->Info.Speed = c.Speed;
+    record->PipeList.back().EndpointDescriptor.bLength = 9;
+    const auto lines = Lines(Connection(*record));
+    // With a bLength of 0, too, an endpoint is shown in the long form.
+    EXPECT_EQ(std::ranges::count(lines, "-bSyncAddress:         0x00"), c.Endpoints);
+    for (const std::string& line : c.Lines) EXPECT_EQ(std::ranges::count(lines, line), 1) << line;
+  }
+}
+
+}  // namespace
+}  // namespace KelvoUHW

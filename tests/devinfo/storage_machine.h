@@ -1,0 +1,110 @@
+// Parts of a simulated PC that tests of the storage side are built from.
+#pragma once
+
+#include <string>
+
+#include "platform/setup_api.h"
+#include "platform/simulated/machine.h"
+
+namespace KelvoUHW {
+
+using platform::simulated::Machine;
+
+inline std::u16string Numbered(const char16_t* text, unsigned number) {
+  const std::string digits = std::to_string(number);
+  return std::u16string(text).append(digits.begin(), digits.end());
+}
+
+inline void AddDevice(Machine& machine, const std::u16string& id, const std::u16string& parent) {
+  platform::simulated::Device device;
+  device.id = id;
+  device.parent = parent;
+  machine.devices.push_back(device);
+}
+
+// What the storage requests answer for a path; deviceType is 0, the number that of a disk.
+inline platform::simulated::Storage& AddStorage(Machine& machine, const std::u16string& path,
+                                                unsigned deviceNumber) {
+  platform::simulated::Storage storage;
+  storage.path = path;
+  storage.deviceType = 0;
+  storage.deviceNumber = platform::simulated::DeviceNumber{7, deviceNumber, 0};
+  machine.storage.push_back(storage);
+  return machine.storage.back();
+}
+
+inline void AddDrive(Machine& machine, char16_t letter, unsigned deviceNumber,
+                     std::uint32_t type = platform::kDRIVE_REMOVABLE) {
+  platform::simulated::Drive drive;
+  drive.letter = letter;
+  drive.type = type;
+  drive.dosDevice = Numbered(u"\\Device\\HarddiskVolume", deviceNumber);
+  machine.drives.push_back(drive);
+  AddStorage(machine, std::u16string(u"\\\\.\\") + letter + u":", deviceNumber);
+}
+
+inline platform::simulated::Volume& AddVolume(Machine& machine, unsigned number,
+                                              const std::vector<std::u16string>& paths,
+                                              std::uint32_t type = platform::kDRIVE_REMOVABLE) {
+  platform::simulated::Volume volume;
+  volume.name = Numbered(u"\\\\?\\Volume{", number) + u"}\\";
+  volume.paths = paths;
+  volume.driveType = type;
+  machine.volumes.push_back(volume);
+  return machine.volumes.back();
+}
+
+// A disk with its interface \\?\disk<number>.
+inline void AddDisk(Machine& machine, const std::u16string& id, const std::u16string& parent,
+                    unsigned number) {
+  AddDevice(machine, id, parent);
+  const std::u16string path = Numbered(u"\\\\?\\disk", number);
+  machine.interfaces.push_back({platform::GUID_DEVINTERFACE_DISK, path, id});
+  AddStorage(machine, path, number);
+}
+
+inline constexpr char16_t kVolumeManager[] = u"ROOT\\VOLMGR\\0000";
+
+// A volume device with its interface \\?\vol<number>; a volume of the machine may name it.
+inline platform::simulated::Storage& AddVolumeDevice(Machine& machine, const std::u16string& id,
+                                                     const std::u16string& parent,
+                                                     unsigned number) {
+  AddDevice(machine, id, parent);
+  const std::u16string path = Numbered(u"\\\\?\\vol", number);
+  machine.interfaces.push_back({platform::GUID_DEVINTERFACE_VOLUME, path, id});
+  return AddStorage(machine, path, number);
+}
+
+inline std::u16string StickDiskId(unsigned number) {
+  return Numbered(u"USBSTOR\\DISK&VEN_SANDISK&PROD_CRUZER&REV_1.00\\S", number) + u"&0";
+}
+inline std::u16string StickVolumeId(unsigned number) {
+  return Numbered(u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_SANDISK&PROD_CRUZER&REV_1.00#S", number) +
+         u"&0#{53f56307-b6bf-11d0-94f2-00a0c91efb8b}";
+}
+
+// A USB stick with one partition; letter 0: mounted nowhere.
+inline void AddStick(Machine& machine, unsigned number, char16_t letter) {
+  const std::u16string usb = Numbered(u"USB\\VID_0781&PID_5567\\S", number);
+  AddDevice(machine, usb, u"");
+  AddDisk(machine, StickDiskId(number), usb, number);
+  auto& storage = AddVolumeDevice(machine, StickVolumeId(number), kVolumeManager, number);
+  storage.removable = true;
+  storage.vendor = "SanDisk ";
+  storage.product = "Cruzer          ";
+  storage.revision = "1.00";
+  storage.serial = "4C53";
+  std::vector<std::u16string> paths;
+  if (letter != 0) paths.push_back(std::u16string(1, letter) + u":\\");
+  AddVolume(machine, number, paths).device = StickVolumeId(number);
+  if (letter != 0) AddDrive(machine, letter, number);
+}
+
+// A PC with a volume manager, and nothing else yet.
+inline Machine EmptyPc() {
+  Machine machine;
+  AddDevice(machine, kVolumeManager, u"");
+  return machine;
+}
+
+}  // namespace KelvoUHW

@@ -1,0 +1,137 @@
+#include <gmock/gmock.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+
+#include "platform/simulated/machine_file.h"
+#include "platform/simulated/simulated_pc.h"
+#include "platform/text.h"
+
+namespace platform::simulated {
+namespace {
+
+using testing::StartsWith;
+
+const char kScriptMachine[] = R"({
+  "devices": [{"id": "USB\\HUB\\1"}, {"id": "USB\\A\\1", "driver": "k1"}],
+  "hubs": [{"name": "USB#HUB#1", "ports": [{"driverKey": "k1"}, {}]}],
+  "volumes": [{"name": "\\\\?\\Volume{1}\\"}]})";
+
+std::string ScriptError(const std::string& steps) {
+  try {
+    ParseScript("{\"steps\": [" + steps + "]}", "s.json", ParseMachine(kScriptMachine, "pc.json"));
+  } catch (const MachineFileError& error) {
+    return error.what();
+  }
+  return "no error";
+}
+
+TEST(ScriptFile, ReadsEveryKindOfStep) {
+  const Script script = ParseScript(R"({"name": "n", "notes": ["x"], "steps": [
+    {"name": "in", "plug": {"devices": [{"id": "USB\\B\\1", "parent": "USB\\HUB\\1",
+     "driver": "k2"}],
+      "ports": [{"hub": "usb#hub#1", "index": 2, "driverKey": "k2", "speed": "high"}]}},
+    {"at": 5, "mount": {"volume": "\\\\?\\Volume{1}\\", "path": "E:\\"}},
+    {"at": 5, "dismount": {"volume": "\\\\?\\Volume{1}\\", "path": "E:\\"}},
+    {"at": 7, "wait": true},
+    {"at": "0x64", "unplug": "usb\\b\\1"}]})",
+                                    "s.json", ParseMachine(kScriptMachine, "pc.json"));
+  ASSERT_EQ(script.size(), 5u);
+  EXPECT_EQ(script[0].name, u"in");
+  const auto& plug = std::get<Plug>(script[0].change);
+  ASSERT_EQ(plug.ports.size(), 1u);
+  EXPECT_EQ(plug.ports[0].hub, u"usb#hub#1");
+  EXPECT_EQ(plug.ports[0].index, 2u);
+  EXPECT_EQ(plug.ports[0].port.status, 1u);
+  EXPECT_EQ(plug.ports[0].port.speed, Speed::High);
+  EXPECT_EQ(plug.fragment.devices.at(0).driver, u"k2");
+  EXPECT_EQ(script[1].atMilliseconds, 5u);
+  EXPECT_EQ(std::get<Mount>(script[1].change).path, u"E:\\");
+  EXPECT_EQ(std::get<Dismount>(script[2].change).volume, u"\\\\?\\Volume{1}\\");
+  EXPECT_TRUE(std::holds_alternative<std::monostate>(script[3].change));
+  EXPECT_EQ(script[4].atMilliseconds, 100u);
+  EXPECT_EQ(std::get<Unplug>(script[4].change).device, u"usb\\b\\1");
+}
+
+TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
+  const std::string wait = R"({"at": 9, "wait": true}, )";
+  const struct {
+    std::string steps;
+    std::string error;
+  } kCases[] = {
+      {R"({"at": 1})", R"(steps[0]: needs one of "plug", "unplug", "mount", "dismount", "wait")"},
+      {R"({"wait": true, "unplug": "A"})", R"(steps[0]: has both "unplug" and "wait")"},
+      {R"({"wait": false})", "steps[0].wait: must be true"},
+      {R"({"wait": true, "when": 1})", R"(steps[0]: unknown member "when")"},
+      {wait + R"({"at": 8, "wait": true})", "steps[1].at: 8 goes back (the step before is at 9)"},
+      {wait + R"({"wait": true})", "steps[1].at: 0 goes back (the step before is at 9)"},
+      {R"({"mount": {"volume": "V"}})", "steps[0].mount.path: is missing"},
+      {R"({"plug": {"name": "x"}})", R"(steps[0].plug: unknown member "name")"},
+      {R"({"plug": {"ports": [{"hub": "USB#HUB#1", "index": 0}]}})",
+       "steps[0].plug.ports[0].index: 0 does not fit (1 to 255)"},
+      {R"({"plug": {"ports": [{"hub": "USB#HUB#1", "speed": "low"}]}})",
+       "steps[0].plug.ports[0].index: is missing"},
+      {R"({"plug": {"devices": [{"id": "USB\\B", "parent": "USB\\C"}]}})",
+       R"(steps[0].plug.devices[0].parent: no device with the id "USB\C")"},
+      {R"({"plug": {"devices": [{"id": "usb\\a\\1"}]}})",
+       R"(steps[0].plug.devices[0].id: a second device with the id "usb\a\1" )"
+       "(the first is there already)"},
+  };
+  for (const auto& test : kCases) {
+    EXPECT_EQ(ScriptError(test.steps), "s.json: " + test.error) << test.steps;
+  }
+  // What a step needs of the PC is refused with the PC's own reason.
+  for (const std::string step :
+       {R"({"at": 9, "unplug": "USB\\C"})",
+        R"({"at": 9, "mount": {"volume": "V", "path": "E:\\"}})",
+        R"({"at": 9, "plug": {"ports": [{"hub": "USB#HUB#1", "index": 3, "driverKey": "k"}]}})",
+        R"({"at": 9, "plug": {"ports": [{"hub": "USB#HUB#2", "index": 1, "driverKey": "k"}]}})"}) {
+    EXPECT_THAT(ScriptError(wait + step), StartsWith("s.json: steps[1]: ")) << step;
+  }
+  // A device that a step took away can come back, and cannot go twice.
+  EXPECT_EQ(ScriptError(R"({"unplug": "USB\\A\\1"}, {"plug": {"devices": [{"id": "USB\\A\\1"}]}})"),
+            "no error");
+  EXPECT_THAT(ScriptError(R"({"unplug": "USB\\A\\1"}, {"unplug": "USB\\A\\1"})"),
+              StartsWith("s.json: steps[1]: "));
+}
+
+TEST(ScriptFile, ReadyMadeScriptsEndWhereTheyBegin) {
+  const std::filesystem::path folder = std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines";
+  const auto sizes = [](const Machine& pc) {
+    return std::vector{pc.devices.size(), pc.interfaces.size(), pc.hubs.size(),
+                       pc.storage.size(), pc.volumes.size(),    pc.drives.size()};
+  };
+  const auto load = [&](const char* machine, const char* script) {
+    const Machine start = LoadMachine((folder / machine).string());
+    const Script steps = LoadScript((folder / "scripts" / script).string(), start);
+    SimulatedPc pc(start);
+    std::size_t most = 0;
+    for (const Step& step : steps) {
+      EXPECT_EQ(ToUtf8(pc.Apply(step)), "") << script;
+      most = std::max(most, pc.Snapshot().devices.size());
+    }
+    EXPECT_GT(most, start.devices.size()) << script;
+    EXPECT_EQ(sizes(pc.Snapshot()), sizes(start)) << script;
+    return steps.size();
+  };
+  EXPECT_EQ(load("dell-precision.json", "stick-comes-and-goes.json"), 3u);
+  EXPECT_EQ(load("hp-cardreader.json", "card-in-slot.json"), 3u);
+  EXPECT_EQ(load("asus-b560.json", "hub-with-four-devices.json"), 3u);
+  EXPECT_EQ(load("dell-precision.json", "usb-hard-disk.json"), 6u);
+}
+
+TEST(ScriptFile, ReadsTheExampleOfItsDocumentation) {
+  const std::string path = ZKUSB_SOURCE_DIR "/docs/machine-file.md";
+  std::ifstream file(path);
+  const std::string text((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
+  const std::size_t start = text.find("```json\n");
+  ASSERT_NE(start, std::string::npos);
+  const std::string example = text.substr(start + 8, text.find("\n```", start) - start - 8);
+  const Machine dell = LoadMachine(ZKUSB_SOURCE_DIR "/machines/dell-precision.json");
+  EXPECT_EQ(ParseScript(example, path, dell).size(), 2u);
+}
+
+}  // namespace
+}  // namespace platform::simulated

@@ -1,0 +1,296 @@
+#include "tree/records.h"
+
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/text.h"
+#include "tree/port_device.h"
+
+namespace KelvoUHW {
+namespace {
+
+std::string Dump(const CZKUMUsbTreeNodeImpl& node, const char16_t* indent = u"") {
+  std::u16string out;
+  node.ToString(out, indent);
+  return platform::ToUtf8(out);
+}
+
+const std::string kNoChildren = "childvector size0\r\nChildsToString End\r\n";
+
+RingPtr<CZKUMUsbTreeNodeImpl> Node(const char16_t* id) {
+  auto node = MakeRecord<CZKUMUsbTreeNodeImpl>();
+  node->SetInstanceId(id);
+  return node;
+}
+
+TEST(Node, BaseLinesAppearOnlyWithTheirValues) {
+  struct Case {
+    const char* what;
+    void (*fill)(CZKUMUsbTreeNodeImpl&);
+    const char* lines;
+  };
+  const Case cases[] = {
+      {"nothing", [](auto&) {}, ""},
+      {"instance id", [](auto& n) { n.m_strDevInstId = u"A\\B"; },
+       "> DevInstId            : A\\B\r\n"},
+      {"driver key", [](auto& n) { n.m_strDriverKeyName = u"{k}\\0001"; },
+       "> driverKeyName : {k}\\0001\r\n"},
+      {"parent id", [](auto& n) { n.SetParentInstanceId(u"P"); }, "> m_strDevInstIdParent : P\r\n"},
+      {"description", [](auto& n) { n.m_strDeviceDescr = u"Maus \u00fc"; },
+       "> deviceDescr : Maus \xc3\xbc\r\n"},
+      {"serial number", [](auto& n) { n.SetSerialNumber(u"S1"); },
+       "> serial number        : S1\r\n"},
+      {"both ids", [](auto& n) { n.m_nVendorId = 0x46D, n.m_nProductId = 0xC52B; },
+       "> VendorId; productId: 0x46D; 0xC52B\r\n"},
+      {"one id known", [](auto& n) { n.m_nVendorId = 0x1234; },
+       "> VendorId; productId: 0x1234; 0xFFFFFFFF\r\n"},
+      {"the other one", [](auto& n) { n.m_nProductId = 0, n.m_strVendor = u"unseen"; },
+       "> VendorId; productId: 0xFFFFFFFF; 0x0\r\n"},
+      {"names", [](auto& n) { n.m_strVendor = u"SANDISK", n.m_strProduct = u"CRUZER"; },
+       "> Vendor; product: SANDISK;CRUZER\r\n"},
+      {"one name", [](auto& n) { n.m_strProduct = u"CRUZER"; }, "> Vendor; product: ;CRUZER\r\n"},
+      {"handles", [](auto& n) { n.m_devInstHandle = 7, n.m_devInstHandleParent = kUnknownId; },
+       "> devInstHandle        : 7\r\n> devInstHandleParent  : -1\r\n"},
+      {"everything, in order",
+       [](auto& n) {
+         n.m_devInstHandleParent = 2, n.m_devInstHandle = 1, n.m_nVendorId = 1, n.m_nProductId = 2;
+         n.SetSerialNumber(u"s"), n.m_strDeviceDescr = u"d", n.SetParentInstanceId(u"p");
+         n.m_strDriverKeyName = u"k", n.m_strDevInstId = u"i", n.m_strVendor = u"v";
+       },
+       "> DevInstId            : i\r\n> driverKeyName : k\r\n> m_strDevInstIdParent : p\r\n"
+       "> deviceDescr : d\r\n> serial number        : s\r\n> VendorId; productId: 0x1; 0x2\r\n"
+       "> devInstHandle        : 1\r\n> devInstHandleParent  : 2\r\n"},
+  };
+  for (const Case& c : cases) {
+    const auto node = MakeRecord<CZKUMUsbTreeNodeImpl>();
+    c.fill(*node);
+    EXPECT_EQ(Dump(*node, u"> "), c.lines + kNoChildren) << c.what;
+  }
+}
+
+TEST(Node, SetterRulesAndDefaults) {
+  CZKUMUsbTreeNodeImpl node;
+  EXPECT_EQ(node.m_nType, KUDTUnknown);
+  EXPECT_EQ(node.m_pParent, nullptr);
+  node.SetSerialNumber(u"first");
+  node.SetSerialNumber(u"");
+  EXPECT_EQ(node.m_strSerialNumber, u"first");
+  node.SetParentInstanceId(u"p");
+  node.SetParentInstanceId(u"");
+  EXPECT_EQ(node.m_strDevInstIdParent, u"");
+  EXPECT_TRUE(node.AcceptNode(nullptr));
+}
+
+TEST(Node, SameNodeComparesAllButTheVendorId) {
+  struct Case {
+    void (*change)(CZKUMUsbTreeNodeImpl&);
+    bool same;
+  };
+  const Case cases[] = {
+      {[](auto&) {}, true},
+      {[](auto& n) { n.m_nVendorId = 1; }, true},
+      {[](auto& n) { n.m_strVendor = u"x"; }, true},
+      {[](auto& n) { n.m_strDevInstId = u"a"; }, false},  // exact: "A" is another
+      {[](auto& n) { n.m_nProductId = 1; }, false},
+      {[](auto& n) { n.m_strProduct = u"x"; }, false},
+      {[](auto& n) { n.m_strSerialNumber = u"x"; }, false},
+      {[](auto& n) { n.m_strDeviceDescr = u"x"; }, false},
+  };
+  for (const Case& c : cases) {
+    const auto parent = Node(u"parent");
+    const auto first = Node(u"A");
+    const auto second = Node(u"A");
+    c.change(*second);
+    EXPECT_EQ(first->IsSameNode(*second), c.same);
+    AddChild(first, parent.Get());
+    AddChild(second, parent.Get());
+    EXPECT_EQ(parent->m_childs.size(), c.same ? 1u : 2u);
+    EXPECT_EQ(second->m_pParent, c.same ? nullptr : parent.Get());
+    EXPECT_EQ(first->m_pParent, parent.Get());
+  }
+  const auto orphan = Node(u"A");
+  AddChild(orphan, nullptr);
+  EXPECT_EQ(orphan->m_pParent, nullptr);
+}
+
+TEST(Node, DriverKeysOfChildrenCompareIgnoringCase) {
+  const auto parent = Node(u"parent");
+  const auto child = Node(u"child");
+  child->m_strDriverKeyName = u"{Key\u00c4}\\0001";
+  AddChild(child, parent.Get());
+  EXPECT_TRUE(parent->HasChildWithDriverKey(u"{kEY\u00e4}\\0001"));
+  EXPECT_FALSE(parent->HasChildWithDriverKey(u"{key\u00e4}\\0002"));
+  EXPECT_FALSE(parent->HasChildWithDriverKey(u""));
+}
+
+TEST(Node, FindsTheFirstInPreOrderExactly) {
+  const auto root = Node(u"root");
+  const auto a = Node(u"a");
+  const auto deep = Node(u"x");
+  const auto shallow = Node(u"x");
+  shallow->m_strDeviceDescr = u"second";
+  AddChild(a, root.Get());
+  AddChild(deep, a.Get());
+  AddChild(shallow, root.Get());
+  EXPECT_EQ(FindByInstanceId(root, u"x"), deep);
+  EXPECT_EQ(FindByInstanceId(root, u"root"), root);
+  EXPECT_EQ(FindByInstanceId(root, u"X"), nullptr);
+  EXPECT_EQ(FindByInstanceId(nullptr, u"x"), nullptr);
+}
+
+TEST(Node, ParentLinksOfADyingRecordGoToNull) {
+  const auto child = Node(u"child");
+  const auto info = Node(u"info");
+  const auto moved = Node(u"moved");
+  const auto other = Node(u"other");
+  {
+    const auto parent = Node(u"parent");
+    AddChild(child, parent.Get());
+    AddChild(moved, parent.Get());
+    moved->m_pParent = other.Get();  // a child that names another parent meanwhile
+    const auto device =
+        MakeRecord<CZKUMPortDeviceImpl>(1u, nullptr, nullptr, nullptr, u"", u"", u"");
+    device->m_infoDevice = info;
+    info->m_pParent = device.Get();
+  }
+  EXPECT_EQ(child->m_pParent, nullptr);
+  EXPECT_EQ(info->m_pParent, nullptr);
+  EXPECT_EQ(moved->m_pParent, other.Get());
+}
+
+TEST(Node, ADeepChainNeedsNoDeepStack) {
+  constexpr int kDepth = 10000;
+  auto root = Node(u"0");
+  CZKUMUsbTreeNodeImpl* last = root.Get();
+  for (int depth = 1; depth < kDepth; ++depth) {
+    auto next = Node(platform::Decimal(depth).c_str());
+    AddChild(next, last);
+    last = next.Get();
+  }
+  EXPECT_EQ(FindByInstanceId(root, platform::Decimal(kDepth - 1)).Get(), last);
+  NodePtr kept = FindByInstanceId(root, platform::Decimal(kDepth / 2));
+  root.Reset();
+  EXPECT_EQ(kept->m_pParent, nullptr);
+  EXPECT_NE(FindByInstanceId(kept, platform::Decimal(kDepth - 1)), nullptr);
+}
+
+TEST(Node, ADeepChainIsDumped) {
+  constexpr int kDepth = 500;
+  const auto root = Node(u"0");
+  CZKUMUsbTreeNodeImpl* last = root.Get();
+  for (int depth = 1; depth < kDepth; ++depth) {
+    auto next = Node(platform::Decimal(depth).c_str());
+    AddChild(next, last);
+    last = next.Get();
+  }
+  const std::string dump = Dump(*root);
+  std::string indent;
+  for (int depth = 1; depth < kDepth; ++depth) indent += "- ";
+  EXPECT_NE(dump.find("\r\n" + indent + "DevInstId            : 499\r\nchildvector size0\r\n"),
+            std::string::npos);
+}
+
+TEST(Records, DumpsByteForByte) {
+  const auto root = MakeRecord<CZKUMUsbTreeRootImpl>();
+  EXPECT_EQ(root->m_strDevInstId, u"Abstract root");
+  EXPECT_EQ(Dump(*root), kNoChildren);
+
+  const auto controller = MakeRecord<CZKUMHostControllerImpl>();
+  controller->SetInstanceId(u"PCI\\X\\1");
+  controller->SetLeafName(u"\\\\.\\HCD0");
+  controller->m_strRootHubName = u"USB#ROOT_HUB#1#{2}";
+  AddChild(controller, root.Get());
+  const auto hub = MakeRecord<CZKUMHubDeviceImpl>();
+  hub->SetHubName(u"USB#Root_Hub#1#{f18a0e88-c30c-11d0-8815-00a0c906bed8}");
+  hub->m_strDeviceDescr = u"RootHub";
+  hub->m_nodeInformation.HubDescriptor.bNumberOfPorts = 200;
+  AddChild(hub, controller.Get());
+  std::string ports;
+  for (std::uint32_t status = 0; status < 4; ++status) {
+    const auto port = MakeRecord<CZKUMHubPortImpl>(status + 1);
+    port->SetInstanceId(u"port " + platform::Decimal(static_cast<std::int32_t>(status)));
+    port->m_nStatus = status;
+    AddChild(port, hub.Get());
+  }
+  EXPECT_EQ(platform::GuidText(hub->m_guid), u"{F18A0E88-C30C-11D0-8815-00A0C906BED8}");
+  EXPECT_EQ(Dump(*root, u"+"),
+            "childvector size0\r\n"
+            "child 0\r\n"
+            "+- HostController:\r\n"
+            "+- DevInstId            : PCI\\X\\1\r\n"
+            "+- LeafName    : \\\\.\\HCD0\r\n"
+            "+- rootHubName : USB#ROOT_HUB#1#{2}\r\n"
+            "childvector size0\r\n"
+            "child 0\r\n"
+            "+- - Hub :\r\n"
+            "+- - DevInstId            : USB\\ROOT_HUB\\1\r\n"
+            "+- - deviceDescr : RootHub\r\n"
+            "+- - leafName       : RootHub\r\n"
+            "+- - pathName       : "
+            "\\\\.\\USB#Root_Hub#1#{f18a0e88-c30c-11d0-8815-00a0c906bed8}\r\n"
+            "+- - connectionName : USB#Root_Hub#1#{f18a0e88-c30c-11d0-8815-00a0c906bed8}\r\n"
+            "+- - Port nb    : 200\r\n"
+            "childvector size0\r\n"
+            "child 0\r\n"
+            "+- - - HubPort 1:\r\n+- - - status : no device connected\r\n" +
+                kNoChildren +
+                "child 1\r\n"
+                "+- - - HubPort 2:\r\n+- - - status : device connected\r\n" +
+                kNoChildren +
+                "child 2\r\n"
+                "+- - - HubPort 3:\r\n+- - - status : bad device\r\n" +
+                kNoChildren +
+                "child 3\r\n"
+                "+- - - HubPort 4:\r\n+- - - status : bad device\r\n" +
+                kNoChildren +
+                "ChildsToString End\r\n"
+                "ChildsToString End\r\n"
+                "ChildsToString End\r\n");
+}
+
+TEST(Records, HubNamesAndTheRecordThatIsKept) {
+  const std::size_t live = ConnectionRecord::LiveCount();
+  const std::size_t kept = ConnectionRecord::KeptCount();
+  struct Case {
+    std::uint32_t status;
+    const char16_t* description;
+    const char16_t* leafName;
+  };
+  const Case cases[] = {
+      {0, u"", u"[Port3] NoDeviceConnected :  HUB"},
+      {1, u"Generic USB Hub", u"[Port3] DeviceConnected :  Generic USB Hub"},
+      {5, u"", u"[Port3] DeviceNotEnoughPower :  HUB"},
+      {6, u"", u"[Port3] (unknown) :  HUB"},
+      {0xFFFFFFFF, u"", u"[Port3] (unknown) :  HUB"},
+  };
+  for (const Case& c : cases) {
+    const auto hub = MakeRecord<CZKUMHubDeviceImpl>();
+    hub->SetHubName(u"HUB");
+    EXPECT_EQ(hub->m_strDevInstId, u"");
+    EXPECT_EQ(hub->m_guid, platform::Guid{});
+    EXPECT_EQ(hub->LeafName(), u"HUB");
+    auto record = std::make_unique<ConnectionRecord>();
+    record->Info.ConnectionIndex = 3;
+    record->Info.ConnectionStatus = c.status;
+    hub->SetConnectionInfo(std::move(record), nullptr, nullptr);
+    hub->m_strDeviceDescr = c.description;
+    EXPECT_EQ(hub->LeafName(), c.leafName);
+  }
+  // A hub never frees its connection record; one that gives it back does not keep it either.
+  EXPECT_EQ(ConnectionRecord::LiveCount(), live + std::size(cases));
+  EXPECT_EQ(ConnectionRecord::KeptCount(), kept + std::size(cases));
+  {
+    const auto hub = MakeRecord<CZKUMHubDeviceImpl>();
+    hub->SetConnectionInfo(std::make_unique<ConnectionRecord>(), nullptr, nullptr);
+    EXPECT_NE(hub->TakeConnectionRecord(), nullptr);
+    EXPECT_EQ(hub->TakeConnectionRecord(), nullptr);
+  }
+  EXPECT_EQ(ConnectionRecord::LiveCount(), live + std::size(cases));
+}
+
+}  // namespace
+}  // namespace KelvoUHW

@@ -1,0 +1,17 @@
+#include "tools/zkusb/built_in_machine.h"
+
+namespace zkusb {
+
+namespace {
+
+constexpr unsigned char kBytes[] = {
+#include "built_in_machine_bytes.inc"
+};
+
+}  // namespace
+
+std::string_view BuiltInMachine() noexcept {
+  return {reinterpret_cast<const char*>(kBytes), sizeof kBytes};
+}
+
+}  // namespace zkusb

@@ -1,0 +1,193 @@
+#include "tools/zkusb/device_facts.h"
+
+#include <algorithm>
+
+#include "com/usb_names.h"
+#include "platform/text.h"
+#include "tools/zkusb/writer.h"
+
+namespace zkusb {
+
+namespace {
+
+void CollectDevices(const NodeView& node, std::size_t controller, std::vector<std::uint32_t>& ports,
+                    std::vector<PlacedDevice>& found) {
+  if (node.Type == NodeType::kPortDevice) {
+    found.push_back({&node, controller, ports});
+    return;
+  }
+  const bool isPort = node.Type == NodeType::kHubPort;
+  if (isPort) ports.push_back(node.PortIndex);
+  for (const NodeView& child : node.Childs) CollectDevices(child, controller, ports, found);
+  if (isPort) ports.pop_back();
+}
+
+constexpr std::size_t kNoDisk = static_cast<std::size_t>(-1);
+
+class DiskCollector {
+ public:
+  void Visit(const NodeView& node, std::size_t disk) {
+    for (const NodeView& child : node.Childs) {
+      if (child.Storage) {
+        AddStorage(child, *child.Storage, disk);
+        Visit(child, disk);
+      } else {
+        Visit(child, IsDisk(child) ? AddDisk(child) : disk);
+      }
+    }
+  }
+  std::vector<Disk> Take() {
+    for (Disk& disk : m_disks) {
+      if (disk.name.empty()) disk.name = u"without name";
+    }
+    return std::move(m_disks);
+  }
+
+ private:
+  static bool IsDisk(const NodeView& node) {
+    return node.Info && platform::EqualIgnoringCase(node.Info->DevClass, u"DiskDrive");
+  }
+
+  std::size_t FindOrAdd(const std::u16string& id) {
+    const auto found = std::find_if(m_disks.begin(), m_disks.end(),
+                                    [&](const Disk& disk) { return disk.id == id; });
+    if (found != m_disks.end()) return static_cast<std::size_t>(found - m_disks.begin());
+    m_disks.emplace_back().id = id;
+    return m_disks.size() - 1;
+  }
+
+  std::size_t AddDisk(const NodeView& node) {
+    const std::size_t disk = FindOrAdd(node.InstanceId);
+    m_disks[disk].name = Tidied(node.Info->FriendlyName);
+    if (m_disks[disk].name.empty()) m_disks[disk].name = Tidied(node.DeviceDescr);
+    return disk;
+  }
+
+  // An interface device is a disk under the disk's own id, or a volume below its disk.
+  void AddStorage(const NodeView& node, const StorageView& storage, std::size_t disk) {
+    const bool isVolume = !storage.VolumeName.empty();
+    if (!isVolume || disk == kNoDisk) disk = FindOrAdd(node.InstanceId);
+    Disk& entry = m_disks[disk];
+    entry.hasInterface = true;
+    if (entry.name.empty()) {
+      entry.name = Joined({Tidied(storage.VendorId), Tidied(storage.ProductId)}, u" ");
+    }
+    if (isVolume) {
+      entry.volumes.push_back(&storage);
+    } else {
+      entry.mountPoints.insert(entry.mountPoints.end(), storage.MountPoints.begin(),
+                               storage.MountPoints.end());
+    }
+  }
+
+  std::vector<Disk> m_disks;
+};
+
+}  // namespace
+
+std::vector<PlacedDevice> PortDevices(const NodeView& root) {
+  std::vector<PlacedDevice> found;
+  std::vector<std::uint32_t> ports;
+  std::size_t controller = 0;
+  for (const NodeView& child : root.Childs) CollectDevices(child, ++controller, ports, found);
+  return found;
+}
+
+bool IsUsbController(const NodeView& controller) {
+  // Only a controller that was opened has the name under which it was.
+  return controller.Type == NodeType::kHostController && !controller.LeafName.empty();
+}
+
+bool HasUsbController(const NodeView& root) {
+  return std::any_of(root.Childs.begin(), root.Childs.end(), [](const NodeView& controller) {
+    return IsUsbController(controller) && !controller.Childs.empty();
+  });
+}
+
+std::vector<Disk> DisksOf(const NodeView& device) {
+  DiskCollector collector;
+  collector.Visit(device, kNoDisk);
+  return collector.Take();
+}
+
+bool CarriesStorage(const NodeView& device) {
+  return std::any_of(device.Childs.begin(), device.Childs.end(),
+                     [](const NodeView& child) { return child.Storage || CarriesStorage(child); });
+}
+
+std::vector<std::u16string> MountPointsOf(const NodeView& device) {
+  std::vector<std::u16string> all;
+  for (const Disk& disk : DisksOf(device)) {
+    all.insert(all.end(), disk.mountPoints.begin(), disk.mountPoints.end());
+    for (const StorageView* volume : disk.volumes) {
+      all.insert(all.end(), volume->MountPoints.begin(), volume->MountPoints.end());
+    }
+  }
+  return all;
+}
+
+std::u16string IdText(const NodeView& node) {
+  if (node.VendorId < 0 || node.ProductId < 0) return {};
+  return platform::Hex(static_cast<std::uint32_t>(node.VendorId), 4) + u":" +
+         platform::Hex(static_cast<std::uint32_t>(node.ProductId), 4);
+}
+
+std::u16string VendorText(const NodeView& node) {
+  if (node.VendorId >= 0 && node.VendorId <= 0xFFFF) {
+    const auto name = KelvoUHW::VendorName(static_cast<std::uint16_t>(node.VendorId));
+    if (name) return Tidied(*name);
+  }
+  return Tidied(node.Manufacturer1);
+}
+
+std::u16string ProductText(const NodeView& device) {
+  // The friendly name comes late: where a device has none, the component may show that of the
+  // device-manager node it read before.
+  for (const std::u16string& text : {Tidied(device.Product), Tidied(device.DeviceDescr)}) {
+    if (!text.empty()) return text;
+  }
+  if (device.Info && !device.Info->FriendlyName.empty()) return Tidied(device.Info->FriendlyName);
+  const std::vector<Disk> disks = DisksOf(device);
+  return disks.empty() ? std::u16string() : disks.front().name;
+}
+
+std::u16string NamesText(const NodeView& device) {
+  return Joined({VendorText(device), ProductText(device)}, u", ");
+}
+
+std::u16string SerialText(const NodeView& device) {
+  // Windows numbers devices that have no serial number; only those numbers hold an ampersand.
+  const bool madeUp = device.SerialNumber.find(u'&') != std::u16string::npos;
+  return madeUp ? std::u16string() : Tidied(device.SerialNumber);
+}
+
+std::u16string PlaceText(const PlacedDevice& placed) {
+  std::u16string text =
+      u"controller " + platform::Decimal(static_cast<std::int32_t>(placed.controller));
+  for (const std::uint32_t port : placed.ports) {
+    // Port 0 is what the device manager's storage controllers have instead of ports.
+    if (port != 0) text += u", port " + platform::Decimal(static_cast<std::int32_t>(port));
+  }
+  return text;
+}
+
+std::u16string MountPointsText(const std::vector<std::u16string>& mountPoints) {
+  std::vector<std::u16string> texts;
+  for (std::u16string text : mountPoints) {
+    if (text.ends_with(u'\\')) text.pop_back();
+    texts.push_back(std::move(text));
+  }
+  return Joined(texts, u", ");
+}
+
+std::u16string Joined(const std::vector<std::u16string>& texts, std::u16string_view between) {
+  std::u16string result;
+  for (const std::u16string& text : texts) {
+    if (text.empty()) continue;
+    if (!result.empty()) result += between;
+    result += text;
+  }
+  return result;
+}
+
+}  // namespace zkusb

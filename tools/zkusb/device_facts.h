@@ -1,0 +1,58 @@
+// What the commands say about devices, worked out from their nodes.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "tools/zkusb/node_view.h"
+
+namespace zkusb {
+
+// A port device and the way to it. The node belongs to the tree that was searched.
+struct PlacedDevice {
+  const NodeView* device;
+  std::size_t controller;            // 1 is the first
+  std::vector<std::uint32_t> ports;  // from the root hub on
+};
+
+// All port devices below a root, in the order of the tree.
+std::vector<PlacedDevice> PortDevices(const NodeView& root);
+
+// Whether a host controller was opened and has a root hub. Storage controllers, which come from the
+// device manager, do not count.
+bool HasUsbController(const NodeView& root);
+bool IsUsbController(const NodeView& controller);
+
+// A disk below a device, with what lies on it.
+struct Disk {
+  std::u16string id;
+  std::u16string name;                      // tidied; never empty
+  std::vector<std::u16string> mountPoints;  // of the disk itself, where no volume names it
+  std::vector<const StorageView*> volumes;
+  bool hasInterface = false;  // false: the device manager alone knows of it
+};
+
+// The disks below a port device, in the order in which its subtree names them.
+std::vector<Disk> DisksOf(const NodeView& device);
+
+// Whether an interface device lies below.
+bool CarriesStorage(const NodeView& device);
+
+// All mount points below a device.
+std::vector<std::u16string> MountPointsOf(const NodeView& device);
+
+// For people; each is empty where nothing is known.
+std::u16string IdText(const NodeView& node);      // "0781:5580"
+std::u16string VendorText(const NodeView& node);  // by vendor id, or as the device says
+std::u16string ProductText(const NodeView& device);
+std::u16string NamesText(const NodeView& device);   // vendor, product
+std::u16string SerialText(const NodeView& device);  // the device's own, not one Windows made up
+std::u16string PlaceText(const PlacedDevice& placed);
+// "D:" for D:\, commas between several.
+std::u16string MountPointsText(const std::vector<std::u16string>& mountPoints);
+
+// The texts that are not empty, with `between` between them.
+std::u16string Joined(const std::vector<std::u16string>& texts, std::u16string_view between);
+
+}  // namespace zkusb

@@ -1,0 +1,85 @@
+#include "tools/zkusb/run.h"
+
+#include <exception>
+#include <optional>
+
+#include "platform/text.h"
+#include "tools/zkusb/command_line.h"
+#include "tools/zkusb/commands.h"
+#include "tools/zkusb/device_facts.h"
+#include "tools/zkusb/topology.h"
+#include "tools/zkusb/writer.h"
+
+namespace zkusb {
+
+namespace {
+
+void Complain(Writer& errors, std::u16string_view what) {
+  errors.Line(std::u16string(u"zkusb: ").append(what));
+}
+
+// Every command but watch looks at the PC once, after the whole script.
+int LookOnce(const Options& options, Topology& topology, Writer& out, Writer& errors) {
+  for (std::size_t step = 0; step < topology.Steps().size(); ++step) topology.Apply(step);
+  topology.Refresh();
+  const std::optional<NodeView> root = topology.Root();
+  if (!root || !HasUsbController(*root)) {
+    Complain(errors, u"no USB host controller found");
+    return kNothingFound;
+  }
+  switch (options.command) {
+    case Command::kTree:
+      PrintTree(*root, options.json, out);
+      return kDone;
+    case Command::kDump:
+      out.Verbatim(topology.Dump());
+      return kDone;
+    case Command::kFind:
+      if (PrintFound(*root, options.vendor, options.product, options.json, out)) return kDone;
+      Complain(errors, options.product
+                           ? u"no device " + platform::Hex(options.vendor, 4) + u":" +
+                                 platform::Hex(*options.product, 4)
+                           : u"no device of vendor " + platform::Hex(options.vendor, 4));
+      return kNothingFound;
+    case Command::kVolumes:
+      if (PrintVolumes(*root, options.json, out)) return kDone;
+      Complain(errors, u"no device carries a volume or a drive letter");
+      return kNothingFound;
+    case Command::kWatch:
+      break;
+  }
+  return kRefused;
+}
+
+int RunCommand(const std::vector<std::string>& args, Writer& out, Writer& errors) {
+  const CommandLine line = ParseCommandLine(args);
+  if (!line.options) {
+    out.Paragraph(platform::FromUtf8(line.information));
+    return kDone;
+  }
+  Topology topology(line.options->machineFile, line.options->scriptFile);
+  if (line.options->command == Command::kWatch) {
+    Watch(topology, line.options->json, out);
+    return kDone;
+  }
+  return LookOnce(*line.options, topology, out, errors);
+}
+
+}  // namespace
+
+int Run(const std::vector<std::string>& args, std::ostream& out, std::ostream& err) {
+  Writer output(out);
+  Writer errors(err);
+  try {
+    const int code = RunCommand(args, output, errors);
+    out.flush();
+    if (out) return code;
+    Complain(errors, u"the output cannot be written");
+  } catch (const std::exception& error) {
+    out.flush();
+    Complain(errors, platform::FromUtf8(error.what()));
+  }
+  return kRefused;
+}
+
+}  // namespace zkusb

@@ -1,0 +1,147 @@
+#include <utility>
+
+#include "platform/text.h"
+#include "platform/usb_ioctl.h"
+#include "tools/zkusb/commands.h"
+#include "tools/zkusb/device_facts.h"
+#include "tools/zkusb/json.h"
+#include "tools/zkusb/text_tree.h"
+
+namespace zkusb {
+
+namespace {
+
+std::u16string Number(std::uint32_t value) {
+  return platform::Decimal(static_cast<std::int32_t>(value));
+}
+
+// The text with a blank behind, or nothing.
+std::u16string WithBlank(std::u16string text) { return text.empty() ? text : text + u" "; }
+
+std::u16string SpeedText(std::uint32_t speed) {
+  switch (speed) {
+    case platform::UsbLowSpeed:
+      return u"low speed";
+    case platform::UsbFullSpeed:
+      return u"full speed";
+    case platform::UsbHighSpeed:
+      return u"high speed";
+    default:
+      return u"speed " + Number(speed);
+  }
+}
+
+std::u16string OnMountPoints(const std::vector<std::u16string>& mountPoints) {
+  return mountPoints.empty() ? std::u16string() : u" on " + MountPointsText(mountPoints);
+}
+
+TextTree DiskLine(const Disk& disk) {
+  TextTree line{u"Disk ", disk.name, OnMountPoints(disk.mountPoints), {}};
+  for (const StorageView* volume : disk.volumes) {
+    line.below.push_back({u"Volume ", volume->VolumeName, OnMountPoints(volume->MountPoints), {}});
+  }
+  return line;
+}
+
+// `head` says where the device is.
+TextTree DeviceLine(std::u16string head, const NodeView& device) {
+  TextTree line{head + WithBlank(IdText(device)), NamesText(device), {}, {}};
+  if (line.middle.empty()) line.middle = device.InstanceId;
+  const std::vector<std::u16string> mountPoints = MountPointsOf(device);
+  if (!mountPoints.empty()) line.tail = u"  [" + MountPointsText(mountPoints) + u"]";
+  for (const Disk& disk : DisksOf(device)) line.below.push_back(DiskLine(disk));
+  return line;
+}
+
+TextTree PortLine(const NodeView& port);
+
+void AddPortLines(const NodeView& hub, TextTree& line) {
+  std::vector<std::uint32_t> empty;
+  for (const NodeView& port : hub.Childs) {
+    if (port.Status == PortStatus::kEmpty && port.Childs.empty()) {
+      empty.push_back(port.PortIndex);
+    } else {
+      line.below.push_back(PortLine(port));
+    }
+  }
+  if (empty.empty()) return;
+  std::u16string ranges;
+  for (std::size_t first = 0; first < empty.size();) {
+    std::size_t last = first;
+    while (last + 1 < empty.size() && empty[last + 1] == empty[last] + 1) ++last;
+    if (first != 0) ranges += u", ";
+    ranges += Number(empty[first]);
+    if (last != first) ranges += u"-" + Number(empty[last]);
+    first = last + 1;
+  }
+  line.below.push_back({empty.size() == 1 ? u"Port " : u"Ports ", ranges, u": empty", {}});
+}
+
+TextTree HubLine(const std::u16string& head, const NodeView& hub) {
+  std::u16string name = VendorText(hub);
+  if (name.empty()) name = Tidied(hub.DeviceDescr);
+  TextTree line{head + u"hub " + WithBlank(IdText(hub)),
+                std::move(name),
+                u", " + Number(hub.NumberOfPorts) + u" ports",
+                {}};
+  AddPortLines(hub, line);
+  return line;
+}
+
+TextTree PortLine(const NodeView& port) {
+  std::u16string head = u"Port " + Number(port.PortIndex) + u": ";
+  if (port.Status == PortStatus::kUnconfigured) head += u"bad device  ";
+  if (port.Childs.empty()) return {std::move(head), {}, {}, {}};
+  const NodeView& child = port.Childs.front();
+  if (child.Type == NodeType::kHub) return HubLine(head, child);
+  return DeviceLine(head + SpeedText(child.Speed) + u"  ", child);
+}
+
+TextTree ControllerLine(const NodeView& controller) {
+  const std::u16string description = Tidied(controller.DeviceDescr);
+  TextTree line{{}, description.empty() ? controller.InstanceId : description, {}, {}};
+  for (const NodeView& hub : controller.Childs) {
+    TextTree& below = line.below.emplace_back();
+    below.head = u"Root hub, " + Number(hub.NumberOfPorts) + u" ports";
+    AddPortLines(hub, below);
+  }
+  return line;
+}
+
+// A storage controller of the device manager. It has neither hubs nor ports: what stands at their
+// places are levels of the device manager.
+TextTree StorageControllerLine(const NodeView& controller,
+                               const std::vector<PlacedDevice>& devices) {
+  TextTree line{{}, controller.InstanceId, u" (not USB)", {}};
+  for (const PlacedDevice& placed : devices) {
+    line.below.push_back(DeviceLine({}, *placed.device));
+  }
+  return line;
+}
+
+}  // namespace
+
+void PrintTree(const NodeView& root, bool json, Writer& out) {
+  if (json) {
+    out.Json(TreeJson(root), true);
+    return;
+  }
+  TextTree tree{u"USB tree", {}, {}, {}};
+  std::vector<TextTree> others;
+  for (const NodeView& controller : root.Childs) {
+    if (IsUsbController(controller)) {
+      tree.below.push_back(ControllerLine(controller));
+      continue;
+    }
+    // A storage controller is worth a line only for devices below it, which events may name as if
+    // they were on a port. The internal disks of most PCs are no such devices.
+    NodeView top;
+    top.Childs.push_back(controller);
+    const std::vector<PlacedDevice> devices = PortDevices(top);
+    if (!devices.empty()) others.push_back(StorageControllerLine(controller, devices));
+  }
+  for (TextTree& line : others) tree.below.push_back(std::move(line));
+  PrintTextTree(tree, out);
+}
+
+}  // namespace zkusb

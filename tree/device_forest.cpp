@@ -1,0 +1,267 @@
+#include "tree/device_forest.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <utility>
+
+#include "devinfo/device_set.h"
+#include "devinfo/devnode.h"
+#include "devinfo/property_reader.h"
+#include "platform/text.h"
+#include "tree/port_device.h"
+#include "tree/records.h"
+
+namespace KelvoUHW {
+
+namespace {
+
+constexpr std::uint32_t kClassNameBytes = 520;
+constexpr std::uint32_t kNameBytes = 126;
+constexpr std::uint32_t kClassDescriptionChars = 260;
+
+bool IsClass(const DeviceNodeRecord& record, std::u16string_view name) noexcept {
+  return platform::EqualIgnoringCase(record.ClassName, name);
+}
+
+class ClassImageList {
+ public:
+  explicit ClassImageList(platform::DeviceSets& sets) noexcept : m_sets(sets) {
+    m_sets.GetClassImageList(m_handle);
+  }
+  ~ClassImageList() {
+    if (m_handle != platform::kInvalidHandle) m_sets.DestroyClassImageList(m_handle);
+  }
+  ClassImageList(const ClassImageList&) = delete;
+  ClassImageList& operator=(const ClassImageList&) = delete;
+
+  bool HasImage(const platform::Guid& classGuid) noexcept {
+    std::int32_t index = 0;
+    return m_handle != platform::kInvalidHandle &&
+           m_sets.GetClassImageIndex(m_handle, classGuid, index).ok;
+  }
+
+ private:
+  platform::DeviceSets& m_sets;
+  platform::DeviceSetHandle m_handle = platform::kInvalidHandle;
+};
+
+// Reads the properties of one element into buffers of fixed size; a text that does not fit is not
+// read.
+class ElementReader {
+ public:
+  ElementReader(platform::DeviceSets& sets, platform::DeviceSetHandle set,
+                const platform::SP_DEVINFO_DATA& data) noexcept
+      : m_sets(sets), m_set(set), m_data(data) {}
+
+  std::optional<std::u16string> Text(std::uint32_t property, std::uint32_t bufferBytes) const {
+    std::u16string buffer(bufferBytes / sizeof(char16_t), u'\0');
+    if (!m_sets.GetDeviceRegistryProperty(m_set, m_data, property, nullptr, buffer.data(),
+                                          bufferBytes, nullptr)) {
+      return std::nullopt;
+    }
+    return std::u16string(platform::UpToZero(buffer));
+  }
+
+  std::optional<std::u16string> ClassDescription() const {
+    std::u16string buffer(kClassDescriptionChars, u'\0');
+    if (!m_sets.GetClassDescription(m_data.ClassGuid, buffer.data(), kClassDescriptionChars,
+                                    nullptr)) {
+      return std::nullopt;
+    }
+    return std::u16string(platform::UpToZero(buffer));
+  }
+
+ private:
+  platform::DeviceSets& m_sets;
+  platform::DeviceSetHandle m_set;
+  const platform::SP_DEVINFO_DATA& m_data;
+};
+
+}  // namespace
+
+std::vector<DeviceNodeRecord> ReadDeviceRecords(platform::Host& host) {
+  std::vector<DeviceNodeRecord> records;
+  ClassImageList images(host);
+  DeviceSet set(host);
+  set.Open(nullptr,
+           platform::kDIGCF_PRESENT | platform::kDIGCF_ALLCLASSES | platform::kDIGCF_PROFILE);
+  if (set.Get() == platform::kInvalidHandle) return records;
+
+  for (std::uint32_t index = 0;; ++index) {
+    platform::SP_DEVINFO_DATA data{.cbSize = sizeof data};
+    if (!host.EnumDeviceInfo(set.Get(), index, data)) break;
+    const ElementReader element(host, set.Get(), data);
+
+    std::optional<std::u16string> className = element.Text(platform::kSPDRP_CLASS, kClassNameBytes);
+    if (!className || !images.HasImage(data.ClassGuid)) continue;
+    std::optional<std::u16string> classDescription = element.ClassDescription();
+    if (!classDescription) continue;
+
+    DeviceNodeRecord record;
+    record.DevInst = data.DevInst;
+    record.InstanceId = GetInstanceId(host, set.Get(), data);
+    if (!host.GetParent(data.DevInst, record.ParentDevInst)) {
+      // Everything read so far is dropped and the set stays open. This is meant: a PC that shows a
+      // device without parent has no device-manager side at all.
+      set.Release();
+      return {};
+    }
+    record.ParentInstanceId = GetDeviceId(host, record.ParentDevInst);
+    std::optional<std::u16string> name = element.Text(platform::kSPDRP_FRIENDLYNAME, kNameBytes);
+    if (!name) name = element.Text(platform::kSPDRP_DEVICEDESC, kNameBytes);
+    record.Name = std::move(name).value_or(u"");
+    record.ClassDescription = std::move(*classDescription);
+    record.ClassName = std::move(*className);
+    record.Location =
+        element.Text(platform::kSPDRP_LOCATION_INFORMATION, kClassNameBytes).value_or(u"");
+    record.HardwareId = element.Text(platform::kSPDRP_HARDWAREID, kClassNameBytes).value_or(u"");
+    if (IsClass(record, u"Processor") || IsClass(record, u"Computer")) continue;
+    records.push_back(std::move(record));
+  }
+  return records;
+}
+
+namespace {
+
+// The forest as indexes into the records, so that linking takes one pass: a record that comes takes
+// the top-level records that wait for it, then goes below its own parent or waits at the top.
+class Forest {
+ public:
+  explicit Forest(std::vector<DeviceNodeRecord>& records) : m_records(records) {
+    m_places.resize(records.size());
+    for (std::size_t index = 0; index < records.size(); ++index) Link(index);
+    for (std::size_t index = 0; index < records.size(); ++index) {
+      if (IsClass(records[index], u"DiskDrive")) MarkWayTo(index);
+    }
+  }
+
+  std::vector<DeviceNodeRecord> TakePruned() {
+    std::vector<DeviceNodeRecord> top;
+    for (std::size_t index = 0; index < m_records.size(); ++index) {
+      if (m_places[index].parent == kNone && m_places[index].leadsToDisk) {
+        top.push_back(Take(index));
+      }
+    }
+    return top;
+  }
+
+ private:
+  static constexpr std::size_t kNone = static_cast<std::size_t>(-1);
+  struct Place {
+    std::size_t parent = kNone;
+    std::vector<std::size_t> children;
+    bool leadsToDisk = false;
+  };
+
+  void Link(std::size_t index) {
+    const DeviceNodeRecord& record = m_records[index];
+    if (const auto waiting = m_waiting.find(record.DevInst); waiting != m_waiting.end()) {
+      m_places[index].children = std::move(waiting->second);
+      m_waiting.erase(waiting);
+      for (const std::size_t child : m_places[index].children) m_places[child].parent = index;
+    }
+    const auto parent = m_byHandle.find(record.ParentDevInst);
+    if (parent != m_byHandle.end() && !IsBelow(parent->second, index)) {
+      m_places[index].parent = parent->second;
+      m_places[parent->second].children.push_back(index);
+    } else {
+      m_waiting[record.ParentDevInst].push_back(index);
+    }
+    m_byHandle.emplace(record.DevInst, index);
+  }
+
+  // Parents that form a circle leave the record that closes it at the top.
+  bool IsBelow(std::size_t index, std::size_t above) const {
+    while (index != kNone && index != above) index = m_places[index].parent;
+    return index == above;
+  }
+
+  void MarkWayTo(std::size_t index) {
+    while (index != kNone && !m_places[index].leadsToDisk) {
+      m_places[index].leadsToDisk = true;
+      index = m_places[index].parent;
+    }
+  }
+
+  DeviceNodeRecord Take(std::size_t index) {
+    DeviceNodeRecord record = std::move(m_records[index]);
+    for (const std::size_t child : m_places[index].children) {
+      if (m_places[child].leadsToDisk && !IsClass(m_records[child], u"USB")) {
+        record.Children.push_back(Take(child));
+      }
+    }
+    return record;
+  }
+
+  std::vector<DeviceNodeRecord>& m_records;
+  std::vector<Place> m_places;
+  std::unordered_map<platform::DevInst, std::size_t> m_byHandle;
+  // Top-level records by the parent they wait for.
+  std::unordered_map<platform::DevInst, std::vector<std::size_t>> m_waiting;
+};
+
+// A node of the tree with the two ids of a record.
+template <class Node>
+RingPtr<Node> NodeOf(RingPtr<Node> node, const DeviceNodeRecord& record) {
+  node->SetInstanceId(record.InstanceId);
+  node->SetParentInstanceId(record.ParentInstanceId);
+  return node;
+}
+
+void AddController(const DeviceNodeRecord& record, CZKUMUsbTreeNodeImpl& root) {
+  const auto controller = NodeOf(MakeRecord<CZKUMHostControllerImpl>(), record);
+  AddChild(controller, &root);
+  for (const DeviceNodeRecord& hubRecord : record.Children) {
+    const auto hub = NodeOf(MakeRecord<CZKUMHubDeviceImpl>(), hubRecord);
+    AddChild(hub, controller.Get());
+    for (const DeviceNodeRecord& deviceRecord : hubRecord.Children) {
+      const auto port = MakeRecord<CZKUMHubPortImpl>(0u);
+      port->SetInstanceId(deviceRecord.InstanceId + u" port 0");
+      port->SetParentInstanceId(deviceRecord.ParentInstanceId);
+      AddChild(port, hub.Get());
+      // The class name stands where a driver key belongs. This is meant.
+      AddChild(MakeRecord<CZKUMPortDeviceImpl>(deviceRecord.DevInst, nullptr, nullptr, nullptr,
+                                               deviceRecord.ClassName, deviceRecord.Name,
+                                               deviceRecord.InstanceId),
+               port.Get());
+    }
+  }
+}
+
+}  // namespace
+
+std::vector<DeviceNodeRecord> LinkDeviceForest(std::vector<DeviceNodeRecord> records) {
+  return Forest(records).TakePruned();
+}
+
+void AddForestNodes(const std::vector<DeviceNodeRecord>& forest, CZKUMUsbTreeNodeImpl& root) {
+  for (const DeviceNodeRecord& record : forest) {
+    if (record.InstanceId.find(u"PCI\\") != std::u16string::npos) {
+      AddController(record, root);
+    } else {
+      AddForestNodes(record.Children, root);
+    }
+  }
+}
+
+std::vector<DeviceNodeRecord> DiskDriveRecords(const std::vector<DeviceNodeRecord>& forest) {
+  std::vector<DeviceNodeRecord> disks;
+  const auto collect = [&disks](const auto& self,
+                                const std::vector<DeviceNodeRecord>& level) -> void {
+    for (const DeviceNodeRecord& record : level) {
+      if (IsClass(record, u"DiskDrive")) {
+        disks.push_back(record);
+      } else {
+        self(self, record.Children);
+      }
+    }
+  };
+  collect(collect, forest);
+  return disks;
+}
+
+}  // namespace KelvoUHW

@@ -1,0 +1,219 @@
+#include "tree/publication.h"
+
+#include <algorithm>
+#include <unordered_set>
+#include <utility>
+
+#include "devinfo/devnode.h"
+
+namespace KelvoUHW {
+
+namespace {
+
+using IdSet = std::unordered_set<std::u16string>;
+
+IdSet IdsOf(const DeviceList& list) {
+  IdSet ids;
+  for (const NodePtr& node : list) ids.insert(node->m_strDevInstId);
+  return ids;
+}
+
+}  // namespace
+
+Publication::Publication(platform::DeviceManager& manager, InfoDeviceCache& devices,
+                         const std::vector<NodePtr>& interfaceDevices, NodePtr building,
+                         NodePtr published)
+    : m_manager(manager),
+      m_devices(devices),
+      m_interfaceDevices(interfaceDevices),
+      m_building(std::move(building)),
+      m_published(std::move(published)) {}
+
+void Publication::Run(DeviceLists& lists) {
+  ForgetWhatLeft();
+  AttachInterfaceDevices();
+
+  TreeIndex index(m_building);
+  DeviceList connected = MatchAll(m_devices.Current(), index);
+  DeviceList attached = MatchAll(m_devices.Added(), index);
+
+  // Asked and not acted upon. This is meant: a record that hangs nowhere is published all the same.
+  bool rooted = true;
+  for (const InfoDevicePtr& entry : m_devices.Current()) rooted = ReachesRoot(*entry) && rooted;
+  static_cast<void>(rooted);
+
+  DeviceList removed;
+  if (m_published) {
+    // Neither changes anything, since every class of node keeps its nodes. This is meant.
+    PruneTree(m_published);
+    AcceptsAll(m_published);
+    removed = RemovedDevices();
+  }
+  DeviceList modified = ModifiedDevices(attached, index);
+  DeviceList connectedCopy = connected;
+
+  lists[kConnectedList].swap(connected);
+  lists[kAttachedList].swap(attached);
+  if (m_published) lists[kRemovedList].swap(removed);
+  lists[kModifiedList].swap(modified);
+  lists[kConnectedCopyList].swap(connectedCopy);
+}
+
+// Device records live on from build to build and only ever gain children. What is no longer there
+// has to go, or a swapped card would go on showing the first card's volume. Removed records are
+// left alone: they say what went with them.
+void Publication::ForgetWhatLeft() {
+  const InfoDeviceSet& current = m_devices.Current();
+  for (const InfoDevicePtr& record : current) {
+    std::erase_if(record->m_childs, [&](const NodePtr& child) {
+      const bool gone = child->m_nType == KUDTInterfaceDevice ||
+                        (child->m_nType == KUDTInfoDevice && !current.HasRecord(child.Get()));
+      if (gone) child->m_pParent.ClearIfNaming(record.Get());
+      return gone;
+    });
+  }
+}
+
+void Publication::AttachInterfaceDevices() {
+  for (const NodePtr& device : m_interfaceDevices) m_devices.AttachToParentInfoDevice(device);
+}
+
+DeviceList Publication::MatchAll(const InfoDeviceSet& entries, TreeIndex& index) {
+  DeviceList list;
+  for (const InfoDevicePtr& entry : entries) {
+    const NodePtr found = index.Find(entry->m_strDevInstId);
+    if (!found || found->m_nType != KUDTPortDevice) continue;
+    Merge(entry, static_cast<CZKUMPortDeviceImpl&>(*found), index);
+    list.push_back(found);
+  }
+  return list;
+}
+
+void Publication::Merge(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device, TreeIndex& index) {
+  device.m_infoDevice = entry;
+  // The entry's parent is the hub port and not the device it belongs to. This is meant.
+  entry->m_pParent = static_cast<CZKUMUsbTreeNodeImpl*>(device.m_pParent);
+  for (const NodePtr& child : entry->m_childs) {
+    const std::size_t before = device.m_childs.size();
+    AddChild(child, &device);
+    if (device.m_childs.size() != before) index.Added(child);
+  }
+  IdentifyHubs(entry, device, index);
+}
+
+// The hubs above the device take their device-manager identity from the parents of its entry, one
+// device-manager level for each hub, up to the first ancestor that is no hub.
+void Publication::IdentifyHubs(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device,
+                               TreeIndex& index) {
+  const auto twoAbove = [](const CZKUMUsbTreeNodeImpl& node) -> CZKUMUsbTreeNodeImpl* {
+    return node.m_pParent ? static_cast<CZKUMUsbTreeNodeImpl*>(node.m_pParent->m_pParent) : nullptr;
+  };
+  const CZKUMUsbTreeNodeImpl* node = entry.Get();
+  CZKUMUsbTreeNodeImpl* hub = twoAbove(device);
+  while (hub != nullptr && hub->m_nType == KUDTHub) {
+    const std::u16string earlierId = hub->m_strDevInstId;
+    hub->m_devInstHandle = node->m_devInstHandleParent;
+    hub->SetInstanceId(node->m_strDevInstIdParent);
+    ResolveParentInstanceId(m_manager, *hub);
+    index.Renamed(*hub, earlierId);
+    node = hub;
+    hub = twoAbove(*hub);
+  }
+}
+
+DeviceList Publication::RemovedDevices() {
+  TreeIndex index(m_published);
+  DeviceList removed = MatchAll(m_devices.Removed(), index);
+  IdSet known = IdsOf(removed);
+  IdSet present;
+  VisitPreOrder(m_building, [&](const NodePtr& node) {
+    if (node->m_nType == KUDTPortDevice) present.insert(node->m_strDevInstId);
+    return true;
+  });
+  VisitPreOrder(m_published, [&](const NodePtr& node) {
+    if (node->m_nType == KUDTPortDevice && !present.contains(node->m_strDevInstId) &&
+        known.insert(node->m_strDevInstId).second) {
+      removed.push_back(node);
+    }
+    return true;
+  });
+  return removed;
+}
+
+DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIndex& index) {
+  DeviceList modified;
+  const IdSet attachedIds = IdsOf(attached);
+  IdSet modifiedIds;
+  const auto append = [&](const std::u16string& instanceId) {
+    NodePtr node = index.Find(instanceId);
+    if (!node) return;
+    modifiedIds.insert(instanceId);
+    modified.push_back(std::move(node));
+  };
+  for (const InfoDevicePtr& entry : m_devices.Added()) {
+    const CZKUMUsbTreeNodeImpl* below = ClimbToHubPort(entry->m_pParent);
+    if (below == nullptr || below->m_nType != KUDTPortDevice) continue;
+    const std::u16string& id = below->m_strDevInstId;
+    if (!attachedIds.contains(id) && !modifiedIds.contains(id)) append(id);
+  }
+  // A device is appended here once for each of its volumes, however often it is listed already.
+  // This is meant.
+  for (const NodePtr& device : m_interfaceDevices) {
+    const CZKUMUsbTreeNodeImpl* below = ClimbToHubPort(device->m_pParent);
+    if (below != nullptr && !attachedIds.contains(below->m_strDevInstId)) {
+      append(below->m_strDevInstId);
+    }
+  }
+  return modified;
+}
+
+CZKUMUsbTreeNodeImpl* ClimbToHubPort(CZKUMUsbTreeNodeImpl* start) noexcept {
+  CZKUMUsbTreeNodeImpl* node = start;
+  while (node != nullptr) {
+    CZKUMUsbTreeNodeImpl* parent = node->m_pParent;
+    if (parent != nullptr && parent->m_nType == KUDTHubPort) return node;
+    node = parent;
+  }
+  return nullptr;
+}
+
+bool ReachesRoot(const CZKUMUsbTreeNodeImpl& record) noexcept {
+  const CZKUMUsbTreeNodeImpl* node = &record;
+  while (const CZKUMUsbTreeNodeImpl* parent = node->m_pParent) node = parent;
+  return node->m_nType == KUDTRoot;
+}
+
+bool PruneTree(const NodePtr& root) {
+  if (!root->AcceptNode(root)) return false;
+  struct Scan {
+    CZKUMUsbTreeNodeImpl* node;
+    std::size_t next;
+  };
+  std::vector<Scan> path{{root.Get(), 0}};
+  while (!path.empty()) {
+    auto& [node, next] = path.back();
+    if (next == node->m_childs.size()) {
+      path.pop_back();
+      continue;
+    }
+    const NodePtr& child = node->m_childs[next];
+    if (child->AcceptNode(child)) {
+      CZKUMUsbTreeNodeImpl* below = child.Get();
+      ++next;
+      path.push_back({below, 0});
+    } else {
+      // The scan of this list starts again, since whether a node is kept may depend on what went.
+      node->m_childs.erase(node->m_childs.begin() + static_cast<std::ptrdiff_t>(next));
+      next = 0;
+    }
+  }
+  return true;
+}
+
+bool AcceptsAll(const NodePtr& root) {
+  bool all = true;
+  VisitPreOrder(root, [&](const NodePtr& node) { return all = node->AcceptNode(node); });
+  return all;
+}
+
+}  // namespace KelvoUHW

@@ -1,0 +1,58 @@
+// The passes that turn a built tree into a published one.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "devinfo/caching_device_manager.h"
+#include "devinfo/info_device_cache.h"
+#include "platform/host.h"
+#include "tree/device_lists.h"
+#include "tree/node.h"
+#include "tree/port_device.h"
+#include "tree/tree_index.h"
+
+namespace KelvoUHW {
+
+// Joins one build's results, by one thread. Writes into the nodes of the building tree, of the
+// published one (list 2 only) and into the device records; the lists are handed out at the end, so
+// that a build that runs out of memory leaves the published ones as they were.
+class Publication {
+ public:
+  // `published` is the tree that is current, empty on the first build. `interfaceDevices` are the
+  // storage records of this build.
+  Publication(platform::DeviceManager& manager, InfoDeviceCache& devices,
+              const std::vector<NodePtr>& interfaceDevices, NodePtr building, NodePtr published);
+
+  // Runs the passes and refills `lists`; the list of removed devices stays as it is on a first
+  // build.
+  void Run(DeviceLists& lists);
+
+ private:
+  void ForgetWhatLeft();
+  void AttachInterfaceDevices();
+  DeviceList MatchAll(const InfoDeviceSet& entries, TreeIndex& index);
+  void Merge(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device, TreeIndex& index);
+  void IdentifyHubs(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device, TreeIndex& index);
+  DeviceList RemovedDevices();
+  DeviceList ModifiedDevices(const DeviceList& attached, const TreeIndex& index);
+
+  CachingDeviceManager m_manager;
+  InfoDeviceCache& m_devices;
+  const std::vector<NodePtr>& m_interfaceDevices;
+  const NodePtr m_building;
+  const NodePtr m_published;
+};
+
+// Asks every node of a tree, parents first, whether it is kept, and takes out of the child lists
+// what is not. Returns whether the root itself is kept.
+bool PruneTree(const NodePtr& root);
+// Whether every node of the tree is kept.
+bool AcceptsAll(const NodePtr& root);
+// Whether the parent links of a record end at a root.
+bool ReachesRoot(const CZKUMUsbTreeNodeImpl& record) noexcept;
+// The node directly below a hub port that one meets when climbing from `start`; null when there is
+// none on the way.
+CZKUMUsbTreeNodeImpl* ClimbToHubPort(CZKUMUsbTreeNodeImpl* start) noexcept;
+
+}  // namespace KelvoUHW

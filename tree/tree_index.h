@@ -1,0 +1,29 @@
+// Nodes of a tree by instance id, answered as the depth-first search would, but without searching.
+#pragma once
+
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "tree/node.h"
+
+namespace KelvoUHW {
+
+// Made for one publication, by one thread. It must be told of every change to the tree.
+class TreeIndex {
+ public:
+  explicit TreeIndex(NodePtr root);
+
+  // What FindByInstanceId gives for the tree as it is now.
+  NodePtr Find(const std::u16string& instanceId) const;
+  // A node was hung into the tree, with everything below it.
+  void Added(const NodePtr& node);
+  // A node of the tree has changed its instance id.
+  void Renamed(const CZKUMUsbTreeNodeImpl& node, const std::u16string& earlierId);
+
+ private:
+  NodePtr m_root;
+  std::unordered_map<std::u16string, std::vector<NodePtr>> m_nodes;
+};
+
+}  // namespace KelvoUHW
