@@ -19,8 +19,10 @@ namespace KelvoUHW {
 // An id that is not known; the interfaces show it as -1.
 inline constexpr std::uint32_t kUnknownId = 0xFFFFFFFF;
 
-// Whether `text` may be read as a string: the one check before a pointer into a text is used. Null
-// may not; every pointer into a string that ends with a zero may, however long the string is.
+// Whether `text` may be read as a string: the one check before a pointer into a text is used. It
+// stands for a check that looks at no more than 512 characters, which is no limit to the length:
+// null fails it, every pointer into a string that ends with a zero passes, however long the string
+// is.
 bool IsReadableText(const char16_t* text) noexcept;
 
 // The identity of a record: what names its device, and what its instance id tells about it.

@@ -9,8 +9,7 @@
 
 namespace KelvoUHW {
 
-// The first three lines of properties are the registry's: class, its GUID as text and parsed.
-// Fields without a value are empty, zero or -1.
+// Registry properties of the node; those it does not have are empty, zero or -1.
 class CZKUMInfoDeviceImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   CZKUMInfoDeviceImpl();

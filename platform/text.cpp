@@ -176,8 +176,8 @@ std::u16string Decimal(std::int32_t value, unsigned width) {
 }
 
 std::u16string GuidText(const Guid& guid) {
-  std::u16string text =
-      u"{" + Hex(guid.Data1, 8) + u"-" + Hex(guid.Data2, 4) + u"-" + Hex(guid.Data3, 4) + u"-";
+  std::u16string text = u"{";
+  text += Hex(guid.Data1, 8) + u"-" + Hex(guid.Data2, 4) + u"-" + Hex(guid.Data3, 4) + u"-";
   for (std::size_t i = 0; i < guid.Data4.size(); ++i) {
     if (i == 2) text += u'-';
     text += Hex(guid.Data4[i], 2);

@@ -81,8 +81,8 @@ void Publication::AttachInterfaceDevices() {
 DeviceList Publication::MatchAll(const InfoDeviceSet& entries, TreeIndex& index) {
   DeviceList list;
   for (const InfoDevicePtr& entry : entries) {
-    const NodePtr found = index.Find(entry->m_strDevInstId);
-    if (!found || found->m_nType != KUDTPortDevice) continue;
+    const NodePtr found = index.FindPortDevice(entry->m_strDevInstId);
+    if (!found) continue;
     Merge(entry, static_cast<CZKUMPortDeviceImpl&>(*found), index);
     list.push_back(found);
   }

@@ -15,6 +15,15 @@ NodePtr TreeIndex::Find(const std::u16string& instanceId) const {
   return FindByInstanceId(m_root, instanceId);
 }
 
+NodePtr TreeIndex::FindPortDevice(const std::u16string& instanceId) const {
+  const auto isPortDevice = [](const NodePtr& node) { return node->m_nType == KUDTPortDevice; };
+  const auto found = m_nodes.find(instanceId);
+  // A volume's device node and interface device carry one id: no need to search which comes first.
+  if (found == m_nodes.end() || std::ranges::none_of(found->second, isPortDevice)) return {};
+  NodePtr node = Find(instanceId);
+  return node && isPortDevice(node) ? node : NodePtr();
+}
+
 void TreeIndex::Added(const NodePtr& node) {
   VisitPreOrder(node, [this](const NodePtr& each) {
     m_nodes[each->m_strDevInstId].push_back(each);

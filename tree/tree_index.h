@@ -16,6 +16,8 @@ class TreeIndex {
 
   // What FindByInstanceId gives for the tree as it is now.
   NodePtr Find(const std::u16string& instanceId) const;
+  // The same where that node is a port device, else empty.
+  NodePtr FindPortDevice(const std::u16string& instanceId) const;
   // A node was hung into the tree, with everything below it.
   void Added(const NodePtr& node);
   // A node of the tree has changed its instance id.

@@ -57,7 +57,7 @@ Status SimulatedPc::GetClassDevs(const Guid* guid, std::uint32_t flags,
   const bool interfaces = (flags & kDIGCF_DEVICEINTERFACE) != 0;
   const Guid* wanted = (flags & kDIGCF_ALLCLASSES) != 0 ? nullptr : guid;
   Text name = interfaces ? u"interfaces" : u"devices";
-  if (wanted != nullptr) name += u" " + GuidText(*wanted);
+  if (wanted != nullptr) name.append(u" ").append(GuidText(*wanted));
   const MachineIndex& index = m_state->now->index;
   set = m_state->handles.Open(
       OpenSet{interfaces ? index.Interfaces(wanted) : index.Devices(wanted)}, name);

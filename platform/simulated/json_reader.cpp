@@ -196,7 +196,7 @@ void FailAt(const std::string& file, const std::string& place, const std::string
   throw MachineFileError(file + ": " + (place.empty() ? "(file)" : place) + ": " + reason);
 }
 
-std::string Quoted(std::string_view utf8) { return "\"" + Printable(utf8) + "\""; }
+std::string Quoted(std::string_view utf8) { return std::string("\"") += Printable(utf8) + "\""; }
 std::string Quoted(std::u16string_view text) { return Quoted(ToUtf8(text)); }
 
 JsonValue::JsonValue(const Json& json, const std::string& file, std::string place)

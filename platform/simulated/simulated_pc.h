@@ -29,7 +29,7 @@ struct OpenCounts {
 class SimulatedPc final : public Host {
  public:
   explicit SimulatedPc(Machine machine);
-  ~SimulatedPc();
+  ~SimulatedPc() override;
 
   // Carries out one change. A step that names what is not there changes nothing and returns the
   // reason; otherwise the result is empty.

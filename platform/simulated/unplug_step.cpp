@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <optional>
 #include <unordered_set>
+#include <utility>
 #include <vector>
 
 #include "platform/simulated/machine_index.h"
@@ -53,10 +54,13 @@ class Removal {
   // A hub's name is its device's id with # for \, and an interface class behind it.
   bool HasHub(const Text& name) const {
     const std::size_t end = name.rfind(u"#{");
-    return m_marks.contains(ToLower(name.substr(0, end)));
+    return m_marks.contains(Mark(ToLower(name.substr(0, end))));
   }
 
  private:
+  // An id as another id carries it: made from an interface path, where every separator is a #.
+  static Text Mark(Text id) { return Replaced(Replaced(std::move(id), u'\\', u'#'), u'/', u'#'); }
+
   void TakeSubtree(MachineIndex::Position top) {
     std::vector<MachineIndex::Position> pending{top};
     while (!pending.empty()) {
@@ -64,7 +68,7 @@ class Removal {
       pending.pop_back();
       const Text id = ToLower(m_machine.devices[device].id);
       if (!m_ids.insert(id).second) continue;
-      m_marks.insert(Replaced(id, u'\\', u'#'));
+      m_marks.insert(Mark(id));
       if (m_machine.devices[device].driver) m_drivers.Add(*m_machine.devices[device].driver);
       for (MachineIndex::Position child = m_index.FirstChild(device); child != kNone;
            child = m_index.NextSibling(child)) {

@@ -39,7 +39,7 @@ Status LoggingHost::BeforeCall(const HostCall&) noexcept { return Status::Succes
 
 std::u16string LoggingHost::HandleText(std::intptr_t handle) const {
   const auto known = m_numbers.find(handle);
-  if (known != m_numbers.end()) return u"#" + Decimal(known->second);
+  if (known != m_numbers.end()) return std::u16string(u"#") += Decimal(known->second);
   return Decimal(static_cast<std::int32_t>(handle));
 }
 

@@ -15,43 +15,24 @@ using platform::Guid;
 using platform::ToUtf8;
 
 TEST(HexField, ScansWithinTheCount) {
-  struct Case {
-    const char16_t* text;
-    std::size_t count;
-    std::uint32_t value;
-  };
   // Blanks use the count up as well; a 0x whose digit lies behind the count is no number, but a
   // count of 1 looks at the 0 alone; full-width digits are none.
-  const Case cases[] = {{u"046D", 4, 0x046D},
-                        {u"046D", 2, 0x04},
-                        {u"046D", 0, kUnknownId},
-                        {u"046D", 100, 0x046D},
-                        {u"c52B&MI_00", 10, 0xC52B},
-                        {u"", 5, kUnknownId},
-                        {u"G", 1, kUnknownId},
-                        {u" \t\r\n\v\f1F", 8, 0x1F},
-                        {u"   1F", 3, kUnknownId},
-                        {u"+1F", 3, 0x1F},
-                        {u"-1", 2, 0xFFFFFFFF},
-                        {u"-10", 3, 0xFFFFFFF0},
-                        {u"-", 1, kUnknownId},
-                        {u"+-1", 3, kUnknownId},
-                        {u"- 1", 3, kUnknownId},
-                        {u"0", 1, 0},
-                        {u"0x1F", 4, 0x1F},
-                        {u"-0X10", 5, 0xFFFFFFF0},
-                        {u"0x", 2, kUnknownId},
-                        {u"0xG", 3, kUnknownId},
-                        {u"0x1F", 2, kUnknownId},
-                        {u"0x1F", 1, 0},
-                        {u"00x1", 4, 0},
-                        {u"123456789", 9, 0x23456789},
-                        {u"FFFFFFFFFFFFFFFF1", 17, 0xFFFFFFF1},
-                        {u"\uFF11", 1, kUnknownId},
-                        {nullptr, 4, kUnknownId}};
-  for (const Case& c : cases) {
-    EXPECT_EQ(ParseHexField(c.text, c.count), c.value)
-        << (c.text ? ToUtf8(c.text) : "null") << " within " << c.count;
+  using Scan = std::pair<const char16_t*, std::size_t>;
+  const std::vector<std::pair<std::uint32_t, std::vector<Scan>>> cases = {
+      {0x046D, {{u"046D", 4}, {u"046D", 100}, {u"+46d&MI", 7}}},
+      {0x04, {{u"046D", 2}, {u" 46D", 2}, {u"00000000000004", 14}}},
+      {0x1F, {{u" \t\r\n\v\f1F", 8}, {u"+1F", 3}, {u"0x1F", 4}, {u"0X1Fg", 5}}},
+      {0, {{u"0", 1}, {u"0x1F", 1}, {u"00x1", 4}, {u"-0", 2}}},
+      {0xFFFFFFFF, {{u"-1", 2}, {u"FFFFFFFFFFF", 11}}},
+      {0xFFFFFFF0, {{u"-10", 3}, {u" -0X10", 6}, {u"FFFFFFFF0", 9}}},
+      {0x23456789, {{u"123456789", 9}}},
+      {kUnknownId, {{u"046D", 0}, {u"", 5}, {u"G", 1}, {u"   1F", 3}, {u"-", 1}, {u"+-1", 3}}},
+      {kUnknownId, {{u"- 1", 3}, {u"0x", 2}, {u"0xG", 3}, {u"0x1F", 2}, {u"\uFF11", 1}}},
+      {kUnknownId, {{nullptr, 4}}}};
+  for (const auto& [value, scans] : cases) {
+    for (const auto& [text, count] : scans) {
+      EXPECT_EQ(ParseHexField(text, count), value) << (text ? ToUtf8(text) : "null") << count;
+    }
   }
 }
 
@@ -62,8 +43,7 @@ TEST(HexField, ReadsNothingBehindTheCount) {
     text.copy(exact.get(), text.size());
     const std::u16string terminated(text);
     EXPECT_EQ(ParseHexField(exact.get(), text.size()),
-              ParseHexField(terminated.c_str(), terminated.size()))
-        << ToUtf8(text);
+              ParseHexField(terminated.c_str(), text.size()));
   }
 }
 
@@ -95,7 +75,6 @@ TEST(InstanceId, IsTakenApart) {
       {u"VEN_&PROD_\\X", kUnknownId, 8, u"", u"", u"X"},
   };
   for (const Case& c : cases) {
-    SCOPED_TRACE(ToUtf8(c.id));
     NodeIdentity node;
     node.m_nVendorId = 7;
     node.m_nProductId = 8;
@@ -104,11 +83,10 @@ TEST(InstanceId, IsTakenApart) {
     node.m_strSerialNumber = u"S";
     node.SetInstanceId(c.id);
     EXPECT_EQ(node.m_strDevInstId, c.id);
-    EXPECT_EQ(node.m_nVendorId, c.vendorId);
+    EXPECT_EQ(node.m_nVendorId, c.vendorId) << ToUtf8(c.id);
     EXPECT_EQ(node.m_nProductId, c.productId);
     EXPECT_EQ(node.m_strVendor, c.vendor);
     EXPECT_EQ(node.m_strProduct, c.product);
-    EXPECT_EQ(node.m_strSerialNumber, c.serial);
     node.SetSerialNumber(u"");
     EXPECT_EQ(node.m_strSerialNumber, c.serial);
   }
@@ -221,6 +199,20 @@ TEST(PciHardwareId, NeedsAllFourNumbers) {
     EXPECT_EQ(id.Complete, c.complete);
     EXPECT_THAT((std::array{id.VendorId, id.DeviceId, id.SubSysId, id.Revision}),
                 testing::ElementsAre(c.vendor, c.device, c.subSys, c.revision));
+  }
+}
+
+TEST(Identifiers, ReadabilitySetsNoLimitToTheLength) {
+  EXPECT_FALSE(IsReadableText(nullptr));
+  for (const std::size_t length : {0u, 511u, 512u, 513u, 100000u}) {
+    const std::u16string padding(length, u'A');
+    EXPECT_TRUE(IsReadableText(padding.c_str()));
+    NodeIdentity node;
+    node.SetInstanceId(padding + u"VID_046D&" + padding + u"PID_C52B\\" + padding + u"\\S1");
+    EXPECT_EQ(node.m_nVendorId, 0x46Du) << length;
+    EXPECT_EQ(node.m_nProductId, 0xC52Bu) << length;
+    EXPECT_EQ(node.m_strSerialNumber, u"S1") << length;
+    EXPECT_EQ(InterfacePathToInstanceId((padding + u"#b#{c}").c_str()), padding + u"\\B") << length;
   }
 }
 

@@ -3,8 +3,8 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <array>
 #include <memory>
-#include <optional>
 #include <random>
 #include <set>
 
@@ -12,7 +12,7 @@
 #include "devinfo/info_device_linking.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
-#include "tests/devinfo/device_sets_double.h"
+#include "platform/wrappers/failing_host.h"
 
 namespace KelvoUHW {
 namespace {
@@ -35,27 +35,11 @@ template <class Records>
 std::string Ids(const Records& records) {
   std::string ids;
   for (const auto& record : records) {
-    ids += (ids.empty() ? "" : " ") + platform::ToUtf8(record->m_strDevInstId);
+    if (!ids.empty()) ids += ' ';
+    ids += platform::ToUtf8(record->m_strDevInstId);
   }
   return ids;
 }
-
-// Can be told to give no list of devices.
-class SwitchedSets final : public DeviceSetsDouble {
- public:
-  using DeviceSetsDouble::DeviceSetsDouble;
-  std::optional<std::uint32_t> failure;
-  std::optional<platform::Guid> guid;  // of the last call, none for all classes
-  std::uint32_t flags = 0;
-
-  platform::Status GetClassDevs(const platform::Guid* classGuid, std::uint32_t classFlags,
-                                platform::DeviceSetHandle& set) noexcept override {
-    guid = classGuid ? std::optional(*classGuid) : std::nullopt;
-    flags = classFlags;
-    if (failure) return platform::Status::Failure(*failure);
-    return DeviceSetsDouble::GetClassDevs(classGuid, classFlags, set);
-  }
-};
 
 // A PC and a cache over it. Nothing may stay open.
 class InfoDeviceCacheTest : public testing::Test {
@@ -64,8 +48,8 @@ class InfoDeviceCacheTest : public testing::Test {
     Machine machine;
     machine.devices = std::move(devices);
     pc = std::make_unique<SimulatedPc>(machine);
-    sets = std::make_unique<SwitchedSets>(pc.get());
-    cache = std::make_unique<InfoDeviceCache>(*sets, *pc);
+    host = std::make_unique<platform::wrappers::FailingHost>(*pc);
+    cache = std::make_unique<InfoDeviceCache>(*host, *host);
   }
   void TearDown() override {
     EXPECT_EQ(pc->Open(), OpenCounts{});
@@ -107,7 +91,7 @@ class InfoDeviceCacheTest : public testing::Test {
   }
 
   std::unique_ptr<SimulatedPc> pc;
-  std::unique_ptr<SwitchedSets> sets;
+  std::unique_ptr<platform::wrappers::FailingHost> host;
   std::unique_ptr<InfoDeviceCache> cache;
 };
 
@@ -130,51 +114,33 @@ TEST_F(InfoDeviceCacheTest, AdmitsByTheStartOfTheParentId) {
 
 // This is meant: what an excluded or a rejected node leaves in the record, the next node shows.
 TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
-  Device parent = Node(u"USB\\P");
-  parent.service = u"USBHUB";
-  Device excluded = parent;
-  Device rejected = Node(u"ACPI\\VID_1&PID_2\\SERIAL");
-  for (Device* device : {&excluded, &rejected}) {
-    device->friendlyName = u"name of another";
-    device->manufacturer = u"maker of another";
-    device->location = u"place of another";
-    device->enumerator = u"enumerator of another";
-  }
+  Device excluded = Node(u"USB\\P");
+  excluded.friendlyName = excluded.location = excluded.enumerator = u"of another";
+  excluded.manufacturer = u"of another";
+  excluded.service = u"USBHUB";
+  Device rejected = excluded;
+  rejected.id = u"ACPI\\VID_1&PID_2\\SERIAL";
+  rejected.service.reset();
+  Device node = Node(u"USB\\A", u"USB\\P");
+  node.manufacturer = u"own";
+  Device second = Node(u"USB\\B", u"USB\\P");
+  Start({excluded, node, second, rejected, Node(u"USB\\C", u"USB\\P")});
+  ASSERT_TRUE(Collect());
   struct Case {
-    std::vector<Device> devices;
-    std::u16string friendlyName, manufacturer, location, enumName, serial;
+    const char16_t *id, *friendlyName, *manufacturer, *location, *enumName, *serial;
   };
-  Device node = Node(u"USB\\NODE", u"USB\\P");
-  node.manufacturer = u"own maker";
-  const Case cases[] = {
-      {{excluded, node},
-       u"name of another",
-       u"own maker",
-       u"place of another",
-       u"enumerator of another",
-       u""},
-      {{parent, rejected, node},
-       u"",
-       u"own maker",
-       u"place of another",
-       u"enumerator of another",
-       u"SERIAL"},
-      {{parent, node, node}, u"", u"own maker", u"", u"", u""},
-  };
+  const Case cases[] = {{u"USB\\A", u"of another", u"own", u"of another", u"of another", u""},
+                        {u"USB\\B", u"", u"", u"", u"", u""},
+                        {u"USB\\C", u"", u"", u"of another", u"of another", u"SERIAL"}};
   for (const Case& c : cases) {
-    std::vector<Device> devices = c.devices;
-    devices.back().id = u"USB\\LAST";
-    Start(devices);
-    ASSERT_TRUE(Collect());
-    const CZKUMInfoDeviceImpl* last = nullptr;
-    for (const InfoDevicePtr& record : cache->Current()) last = record.Get();
-    ASSERT_NE(last, nullptr);
-    EXPECT_EQ(last->FriendlyName, c.friendlyName);
-    EXPECT_EQ(last->Manufacturer, c.manufacturer);
-    EXPECT_EQ(last->Location, c.location);
-    EXPECT_EQ(last->EnumName, c.enumName);
-    EXPECT_EQ(last->m_strSerialNumber, c.serial);
-    EXPECT_EQ(last->Service, u"");
+    const InfoDevicePtr record = cache->Current().FindByInstanceId(c.id);
+    ASSERT_TRUE(record);
+    EXPECT_EQ(record->FriendlyName, c.friendlyName);
+    EXPECT_EQ(record->Manufacturer, c.manufacturer);
+    EXPECT_EQ(record->Location, c.location);
+    EXPECT_EQ(record->EnumName, c.enumName);
+    EXPECT_EQ(record->m_strSerialNumber, c.serial);
+    EXPECT_EQ(record->Service, u"");
   }
 }
 
@@ -307,11 +273,9 @@ TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
     const InfoDevicePtr record = *cache->Current().begin();
     EXPECT_EQ(record->m_devInstHandle, kUnknownDevInst);
     EXPECT_EQ(record->m_strSerialNumber, u"S");
-    EXPECT_EQ(record->m_strDevInstIdParent, u"PCI\\P");
-    EXPECT_EQ(record->FriendlyName, u"name");
-    EXPECT_EQ(record->DevClass, u"DiskDrive");
-    EXPECT_EQ(record->Location, u"location");
-    EXPECT_EQ(record->HardwareId, u"hardware");
+    EXPECT_THAT((std::array{record->m_strDevInstIdParent, record->FriendlyName, record->DevClass,
+                            record->Location, record->HardwareId}),
+                testing::ElementsAre(u"PCI\\P", u"name", u"DiskDrive", u"location", u"hardware"));
     cache->Commit();
   }
 }
@@ -323,7 +287,9 @@ TEST_F(InfoDeviceCacheTest, WithoutAListOfDevicesNothingChanges) {
   EXPECT_TRUE(Collect());
   const std::pair<std::uint32_t, std::uint32_t> codes[] = {{5, 5}, {0, 1}, {259, 1}};
   for (const auto& [code, reported] : codes) {
-    sets->failure = code;
+    platform::wrappers::FailurePlan plan{.call = 1, .onwards = true, .error = code};
+    plan.operation = platform::wrappers::Operation::GetClassDevs;
+    host->SetPlan(plan);
     EXPECT_EQ(cache->EnumerateDeviceNodes({}), reported);
     EXPECT_FALSE(Collect());
     EXPECT_EQ(cache->AddedCount(), 0);
@@ -334,21 +300,30 @@ TEST_F(InfoDeviceCacheTest, WithoutAListOfDevicesNothingChanges) {
 }
 
 TEST_F(InfoDeviceCacheTest, ClassesAreChosenByExactName) {
-  Start({});
-  const std::pair<std::u16string_view, const platform::Guid*> cases[] = {
+  const std::pair<std::u16string, const platform::Guid*> classes[] = {
       {u"usb", &platform::GUID_DEVCLASS_USB},
       {u"volume", &platform::GUID_DEVCLASS_VOLUME},
       {u"image", &platform::GUID_DEVCLASS_IMAGE},
       {u"wceusbs", &platform::GUID_DEVCLASS_WCEUSBS},
       {u"unknown", &platform::GUID_DEVCLASS_UNKNOWN},
-      {u"diskdrive", &platform::GUID_DEVCLASS_DISKDRIVE},
-      {u"USB", nullptr},
-      {u"", nullptr}};
-  for (const auto& [name, guid] : cases) {
-    EXPECT_EQ(cache->EnumerateDeviceNodes(name), 0u);
-    EXPECT_EQ(sets->guid, guid ? std::optional(*guid) : std::nullopt);
-    EXPECT_EQ(sets->flags, guid ? 2u : 6u);
+      {u"diskdrive", &platform::GUID_DEVCLASS_DISKDRIVE}};
+  std::vector<Device> devices{Node(u"USB\\P")};
+  for (const auto& [name, guid] : classes) {
+    devices.push_back(Node(name, u"USB\\P"));
+    devices.back().deviceClass = name;
+    devices.back().classGuid = platform::GuidText(*guid);
   }
+  Start(devices);
+  const auto count = [&](std::u16string_view name) {
+    EXPECT_EQ(cache->EnumerateDeviceNodes(name), 0u);
+    return cache->Current().size();
+  };
+  for (const auto& [name, guid] : classes) {
+    EXPECT_EQ(count(name), 1u);
+    EXPECT_EQ(Ids(cache->Current()), platform::ToUtf8(name));
+  }
+  EXPECT_EQ(count(u"USB"), 6u);
+  EXPECT_EQ(count(u""), 6u);
 }
 
 TEST_F(InfoDeviceCacheTest, NodesAreAttachedByTheirParentId) {

@@ -3,23 +3,10 @@
 
 #include <gtest/gtest.h>
 
-#include <cstring>
-
 #include "platform/text.h"
 
 namespace KelvoUHW {
 namespace {
-
-TEST(InterfaceDevice, StartsWithNothingKnown) {
-  const CZKUMInterfaceDeviceImpl record;
-  EXPECT_EQ(record.m_nType, KUDTInterfaceDevice);
-  EXPECT_EQ(record.m_devInstHandle, 0xFFFFFFFFu);
-  EXPECT_EQ(record.m_devInstHandleParent, 0xFFFFFFFFu);
-  EXPECT_EQ(record.InterfaceData.cbSize, 28u);
-  EXPECT_EQ(record.DeviceData.cbSize, 0u);
-  EXPECT_EQ(record.DescriptorLength, 0u);
-  EXPECT_EQ(record.MountPoint(), u"");
-}
 
 TEST(InterfaceDevice, NamesOfDeviceTypes) {
   std::u16string names;
@@ -49,6 +36,9 @@ std::string Lines(std::string_view text) {
 TEST(InterfaceDevice, DumpOfADiskWhoseDescriptorIsNeverReceived) {
   CZKUMInterfaceDeviceImpl record;
   record.m_strDevInstId = u"USBSTOR\\DISK\\1";
+  EXPECT_EQ(record.m_nType, KUDTInterfaceDevice);
+  EXPECT_EQ(record.InterfaceData.cbSize, 28u);
+  EXPECT_EQ(record.MountPoint(), u"");
   EXPECT_EQ(DumpOf(record), Lines(R"(before|
 >  Interface ++++++++++++++++++++++++++++
 > DevInstId            : USBSTOR\DISK\1
@@ -73,12 +63,7 @@ TEST(InterfaceDevice, DumpOfAVolume) {
   record.m_devInstHandle = record.m_devInstHandleParent = 0;
   record.m_strSerialNumber = u"4C53";
   record.MountPoints = {u"E:\\", u"C:\\Stick\\"};
-  std::vector<std::uint8_t> detail(platform::kInterfaceDetailPathOffset);
-  for (const char c : {'\\', '\\', '?', '\\', 's'}) {
-    detail.push_back(static_cast<std::uint8_t>(c));
-    detail.push_back(0);
-  }
-  record.Detail = InterfaceDetail(detail);
+  record.Detail = InterfaceDetail({6, 0, 0, 0, 0x5C, 0, 0x5C, 0, 0x3F, 0, 0x5C, 0, 0x73, 0});
   record.StorageVendorId = u"SanDisk ";
   record.StorageProductId = u"Cruzer";
   record.ProductRev = u"1.00";

@@ -54,50 +54,54 @@ inline platform::simulated::Volume& AddVolume(Machine& machine, unsigned number,
   return machine.volumes.back();
 }
 
-// A disk with its interface \\?\disk<number>.
-inline void AddDisk(Machine& machine, const std::u16string& id, const std::u16string& parent,
-                    unsigned number) {
+// A device with an interface of that path, and what storage requests to it answer.
+inline platform::simulated::Storage& AddStorageDevice(Machine& machine, const std::u16string& id,
+                                                      const std::u16string& parent,
+                                                      const platform::Guid& interfaceClass,
+                                                      const std::u16string& path,
+                                                      unsigned deviceNumber) {
   AddDevice(machine, id, parent);
-  const std::u16string path = Numbered(u"\\\\?\\disk", number);
-  machine.interfaces.push_back({platform::GUID_DEVINTERFACE_DISK, path, id});
-  AddStorage(machine, path, number);
+  machine.interfaces.push_back({interfaceClass, path, id});
+  return AddStorage(machine, path, deviceNumber);
+}
+inline platform::simulated::Storage& AddDisk(Machine& machine, const std::u16string& id,
+                                             const std::u16string& parent, unsigned number) {
+  return AddStorageDevice(machine, id, parent, platform::GUID_DEVINTERFACE_DISK,
+                          Numbered(u"\\\\?\\disk", number), number);
+}
+// A volume of the machine may name the device.
+inline platform::simulated::Storage& AddVolumeDevice(Machine& machine, const std::u16string& id,
+                                                     const std::u16string& parent,
+                                                     unsigned number) {
+  return AddStorageDevice(machine, id, parent, platform::GUID_DEVINTERFACE_VOLUME,
+                          Numbered(u"\\\\?\\vol", number), number);
 }
 
 inline constexpr char16_t kVolumeManager[] = u"ROOT\\VOLMGR\\0000";
 
-// A volume device with its interface \\?\vol<number>; a volume of the machine may name it.
-inline platform::simulated::Storage& AddVolumeDevice(Machine& machine, const std::u16string& id,
-                                                     const std::u16string& parent,
-                                                     unsigned number) {
-  AddDevice(machine, id, parent);
-  const std::u16string path = Numbered(u"\\\\?\\vol", number);
-  machine.interfaces.push_back({platform::GUID_DEVINTERFACE_VOLUME, path, id});
-  return AddStorage(machine, path, number);
+inline std::u16string StickId(unsigned number) {
+  return Numbered(u"USB\\VID_0781&PID_5567\\S", number);
 }
-
 inline std::u16string StickDiskId(unsigned number) {
-  return Numbered(u"USBSTOR\\DISK&VEN_SANDISK&PROD_CRUZER&REV_1.00\\S", number) + u"&0";
+  return Numbered(u"USBSTOR\\DISK&VEN_SANDISK\\S", number) + u"&0";
 }
 inline std::u16string StickVolumeId(unsigned number) {
-  return Numbered(u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_SANDISK&PROD_CRUZER&REV_1.00#S", number) +
+  return Numbered(u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_SANDISK#S", number) +
          u"&0#{53f56307-b6bf-11d0-94f2-00a0c91efb8b}";
 }
 
 // A USB stick with one partition; letter 0: mounted nowhere.
 inline void AddStick(Machine& machine, unsigned number, char16_t letter) {
-  const std::u16string usb = Numbered(u"USB\\VID_0781&PID_5567\\S", number);
-  AddDevice(machine, usb, u"");
-  AddDisk(machine, StickDiskId(number), usb, number);
+  AddDevice(machine, StickId(number), u"");
+  AddDisk(machine, StickDiskId(number), StickId(number), number);
   auto& storage = AddVolumeDevice(machine, StickVolumeId(number), kVolumeManager, number);
-  storage.removable = true;
   storage.vendor = "SanDisk ";
-  storage.product = "Cruzer          ";
-  storage.revision = "1.00";
   storage.serial = "4C53";
-  std::vector<std::u16string> paths;
-  if (letter != 0) paths.push_back(std::u16string(1, letter) + u":\\");
-  AddVolume(machine, number, paths).device = StickVolumeId(number);
-  if (letter != 0) AddDrive(machine, letter, number);
+  auto& volume = AddVolume(machine, number, {});
+  volume.device = StickVolumeId(number);
+  if (letter == 0) return;
+  volume.paths.push_back(std::u16string(1, letter) + u":\\");
+  AddDrive(machine, letter, number);
 }
 
 // A PC with a volume manager, and nothing else yet.

@@ -87,8 +87,8 @@ TEST_F(StorageQuery, TextsOfTheDescriptor) {
     std::u16string texts;
   };
   const std::vector<Case> cases = {
-      {"a stick", DescriptorAnswer(0, {36, 45, 49, 51}, "SanDisk \0Cru\0.1\0S1\0"sv, 55), 0,
-       u"SanDisk |Cru|.1|\x53\x31"},
+      {"a stick", DescriptorAnswer(0, {36, 45, 49, 52}, "SanDisk \0Cru\0.1\0S1\0"sv, 55), 0,
+       u"SanDisk |Cru|.1|S1"},
       {"no text", DescriptorAnswer(3, {}, ""sv, 36), 3, u"|||old"},
       {"empty texts", DescriptorAnswer(0, {36, 36, 36, 36}, "\0"sv, 37), 0, u"|||old"},
       {"one character a byte", DescriptorAnswer(14, {36}, "\xE9\xFF\x01\0"sv, 40), 14,

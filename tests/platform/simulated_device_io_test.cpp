@@ -146,11 +146,8 @@ TEST_F(DeviceIoTest, NameRequestsAtEverySize) {
         EXPECT_EQ(reply.returned, out < whole ? head + 2 : whole);
         if (head == 4) {
           EXPECT_EQ(+reply.As<UsbNameHead>().ActualLength, whole);
-        }
-        if (head == 8) {
+        } else {
           EXPECT_EQ(+reply.As<UsbConnectionNameHead>().ActualLength, whole);
-        }
-        if (head == 8) {
           EXPECT_EQ(+reply.As<UsbConnectionNameHead>().ConnectionIndex, port);
         }
         EXPECT_EQ(reply.TextAt(head), out < whole ? u"" : name);
@@ -168,6 +165,11 @@ TEST_F(DeviceIoTest, RefusedRequests) {
   const FileHandle bare = Open(u"\\\\.\\C:");
   const std::vector<std::uint8_t> query(12, 0);
   const std::vector<std::uint8_t> otherQuery = {1, 0, 0, 0, 0, 0, 0, 0};
+  constexpr std::uint32_t kConnection = kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION;
+  constexpr std::uint32_t kConnectionEx = kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX;
+  constexpr std::uint32_t kHubOnPort = kIOCTL_USB_GET_NODE_CONNECTION_NAME;
+  constexpr std::uint32_t kKeyOnPort = kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME;
+  using Bytes = std::vector<std::uint8_t>;
   const struct {
     FileHandle handle;
     std::uint32_t code;
@@ -175,33 +177,17 @@ TEST_F(DeviceIoTest, RefusedRequests) {
     std::uint32_t out;
     std::uint32_t error;
   } kCases[] = {
-      {controller, kIOCTL_USB_GET_NODE_CONNECTION_NAME, {1, 0, 0, 0}, 100, kERROR_INVALID_FUNCTION},
+      {controller, kHubOnPort, Bytes{1, 0, 0, 0}, 100, kERROR_INVALID_FUNCTION},
       {hub, kIOCTL_GET_HCD_DRIVERKEY_NAME, {}, 100, kERROR_INVALID_FUNCTION},
       {hub, 0, {}, 0, kERROR_INVALID_FUNCTION},
       {hub, kIOCTL_USB_GET_NODE_INFORMATION, {}, 75, kERROR_INSUFFICIENT_BUFFER},
-      {hub, kIOCTL_USB_GET_NODE_CONNECTION_NAME, {1, 0, 0}, 100, kERROR_INSUFFICIENT_BUFFER},
-      {hub, kIOCTL_USB_GET_NODE_CONNECTION_NAME, {0, 0, 0, 0}, 100, kERROR_INVALID_PARAMETER},
-      {hub,
-       kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION,
-       {4, 0, 0, 0},
-       365,
-       kERROR_INVALID_PARAMETER},
-      {hub,
-       kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION,
-       {1, 0, 0, 1},
-       365,
-       kERROR_INVALID_PARAMETER},
-      {hub,
-       kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX,
-       {1, 0, 0, 0},
-       34,
-       kERROR_INSUFFICIENT_BUFFER},
-      {hub,
-       kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME,
-       {3, 0, 0, 0},
-       100,
-       kERROR_INVALID_PARAMETER},
-      {disk, kIOCTL_STORAGE_QUERY_PROPERTY, {0, 0, 0, 0, 0, 0, 0}, 512, 24},
+      {hub, kHubOnPort, Bytes{1, 0, 0}, 100, kERROR_INSUFFICIENT_BUFFER},
+      {hub, kHubOnPort, Bytes{0, 0, 0, 0}, 100, kERROR_INVALID_PARAMETER},
+      {hub, kConnection, Bytes{4, 0, 0, 0}, 365, kERROR_INVALID_PARAMETER},
+      {hub, kConnection, Bytes{1, 0, 0, 1}, 365, kERROR_INVALID_PARAMETER},
+      {hub, kConnectionEx, Bytes{1, 0, 0, 0}, 34, kERROR_INSUFFICIENT_BUFFER},
+      {hub, kKeyOnPort, Bytes{3, 0, 0, 0}, 100, kERROR_INVALID_PARAMETER},
+      {disk, kIOCTL_STORAGE_QUERY_PROPERTY, Bytes{0, 0, 0, 0, 0, 0, 0}, 512, 24},
       {disk, kIOCTL_STORAGE_QUERY_PROPERTY, otherQuery, 512, kERROR_INVALID_PARAMETER},
       {disk, kIOCTL_STORAGE_QUERY_PROPERTY, query, 7, kERROR_INSUFFICIENT_BUFFER},
       {disk, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 11, kERROR_INSUFFICIENT_BUFFER},

@@ -9,7 +9,7 @@ namespace zkusb {
 namespace {
 
 [[noreturn]] void Refuse(const std::string& reason) {
-  throw UsageError(reason + " (zkusb --help lists what there is)");
+  throw UsageError(reason + " (see zkusb --help)");
 }
 
 std::uint16_t ParseId(const std::string& option, const std::string& text) {
@@ -32,14 +32,15 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
   std::string product;
 
   CLI::App app("Shows the USB topology of a PC, its devices and their volumes.", "zkusb");
-  app.require_subcommand(1);
+  // That there is one is checked below: here, a misspelt one would not be named.
+  app.require_subcommand(0, 1);
   app.set_version_flag("--version", "zkusb " ZKUSB_VERSION, "Print the version and exit");
   app.add_option("--machine", options.machineFile, "Machine file of the PC (default: built in)")
       ->type_name("FILE");
   app.add_option("--script", options.scriptFile,
-                 "What happens to the PC: played by watch, before everything else otherwise")
+                 "Steps for watch to play; the others look after all of them")
       ->type_name("FILE");
-  app.add_flag("--json", options.json, "Print JSON instead of text");
+  app.add_flag("--json", options.json, "Print JSON instead of text")->disable_flag_override();
 
   const auto command = [&](const char* name, const char* description, Command value) {
     CLI::App* sub = app.add_subcommand(name, description);
@@ -56,7 +57,8 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
   CLI::Option* productOption =
       find->add_option("--product", product, "Product id, 1 to 4 hexadecimal digits")
           ->type_name("HEX");
-  command("volumes", "The devices that carry volumes, with their mount points", Command::kVolumes);
+  command("volumes", "The devices that carry volumes, and where they are mounted",
+          Command::kVolumes);
   command("watch", "Play a script and tell what comes and goes", Command::kWatch);
 
   try {
@@ -68,6 +70,7 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
   } catch (const CLI::ParseError& error) {
     Refuse(error.what());
   }
+  if (app.get_subcommands().empty()) Refuse("a command is needed");
   if (options.command == Command::kFind) {
     options.vendor = ParseId("--vendor", vendor);
     if (!productOption->empty()) options.product = ParseId("--product", product);

@@ -1,6 +1,7 @@
 // The commands find and volumes.
 #include "tools/zkusb/commands.h"
 #include "tools/zkusb/device_facts.h"
+#include "tools/zkusb/device_texts.h"
 #include "tools/zkusb/json.h"
 
 namespace zkusb {

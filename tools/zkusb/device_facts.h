@@ -1,6 +1,7 @@
 // What the commands say about devices, worked out from their nodes.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -41,18 +42,5 @@ bool CarriesStorage(const NodeView& device);
 
 // All mount points below a device.
 std::vector<std::u16string> MountPointsOf(const NodeView& device);
-
-// For people; each is empty where nothing is known.
-std::u16string IdText(const NodeView& node);      // "0781:5580"
-std::u16string VendorText(const NodeView& node);  // by vendor id, or as the device says
-std::u16string ProductText(const NodeView& device);
-std::u16string NamesText(const NodeView& device);   // vendor, product
-std::u16string SerialText(const NodeView& device);  // the device's own, not one Windows made up
-std::u16string PlaceText(const PlacedDevice& placed);
-// "D:" for D:\, commas between several.
-std::u16string MountPointsText(const std::vector<std::u16string>& mountPoints);
-
-// The texts that are not empty, with `between` between them.
-std::u16string Joined(const std::vector<std::u16string>& texts, std::u16string_view between);
 
 }  // namespace zkusb

@@ -14,7 +14,7 @@ namespace {
 
 // Seven tiers of hubs and ports, and the device manager's levels below them, are far from it. Views
 // are read, shown and dropped level inside level.
-constexpr int kMostLevels = 200;
+constexpr int kMostLevels = 400;
 
 template <class Record>
 const Record& As(const KelvoUHW::NodePtr& node) {

@@ -4,6 +4,7 @@
 #include "platform/usb_ioctl.h"
 #include "tools/zkusb/commands.h"
 #include "tools/zkusb/device_facts.h"
+#include "tools/zkusb/device_texts.h"
 #include "tools/zkusb/json.h"
 #include "tools/zkusb/text_tree.h"
 
@@ -46,7 +47,7 @@ TextTree DiskLine(const Disk& disk) {
 // `head` says where the device is.
 TextTree DeviceLine(std::u16string head, const NodeView& device) {
   TextTree line{head + WithBlank(IdText(device)), NamesText(device), {}, {}};
-  if (line.middle.empty()) line.middle = device.InstanceId;
+  if (line.middle.empty()) line.middle = u"unknown device";
   const std::vector<std::u16string> mountPoints = MountPointsOf(device);
   if (!mountPoints.empty()) line.tail = u"  [" + MountPointsText(mountPoints) + u"]";
   for (const Disk& disk : DisksOf(device)) line.below.push_back(DiskLine(disk));
@@ -71,7 +72,7 @@ void AddPortLines(const NodeView& hub, TextTree& line) {
     while (last + 1 < empty.size() && empty[last + 1] == empty[last] + 1) ++last;
     if (first != 0) ranges += u", ";
     ranges += Number(empty[first]);
-    if (last != first) ranges += u"-" + Number(empty[last]);
+    if (last != first) ranges.append(u"-").append(Number(empty[last]));
     first = last + 1;
   }
   line.below.push_back({empty.size() == 1 ? u"Port " : u"Ports ", ranges, u": empty", {}});

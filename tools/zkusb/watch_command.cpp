@@ -4,6 +4,7 @@
 #include "platform/text.h"
 #include "tools/zkusb/commands.h"
 #include "tools/zkusb/device_facts.h"
+#include "tools/zkusb/device_texts.h"
 #include "tools/zkusb/json.h"
 
 namespace zkusb {
@@ -19,8 +20,9 @@ constexpr std::array<std::u16string_view, 4> kEventWords{u"connected", u"attache
 std::u16string Seconds(std::uint32_t milliseconds) {
   std::u16string fraction = platform::Decimal(static_cast<std::int32_t>(milliseconds % 1000));
   fraction.insert(0, 3 - fraction.size(), u'0');
-  return u"+" + platform::Decimal(static_cast<std::int32_t>(milliseconds / 1000)) + u"." +
-         fraction + u"s";
+  std::u16string text = u"+";
+  text += platform::Decimal(static_cast<std::int32_t>(milliseconds / 1000));
+  return text.append(u".").append(fraction).append(u"s");
 }
 
 std::u16string EventText(const Step& step, const DeviceEvent& event) {

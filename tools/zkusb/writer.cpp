@@ -7,7 +7,6 @@ namespace zkusb {
 namespace {
 
 constexpr char16_t kEllipsis[] = u"…";
-constexpr std::size_t kShortestMiddle = 8;  // fewer columns of a name tell nothing
 
 bool IsHarmful(char16_t unit) noexcept {
   const auto within = [unit](char16_t first, char16_t last) {
@@ -46,11 +45,13 @@ std::size_t Columns(std::u16string_view text) noexcept {
   return count;
 }
 
+// At most so many columns, the last one an ellipsis.
 std::u16string CutTo(std::u16string_view text, std::size_t columns) {
   std::size_t at = 0;
   for (std::size_t count = 0; count + 1 < columns && at < text.size(); ++count) {
     at = NextPoint(text, at);
   }
+  while (at > 0 && text[at - 1] == u' ') --at;
   return std::u16string(text.substr(0, at)) + kEllipsis;
 }
 
@@ -64,7 +65,7 @@ void Writer::FittedLine(std::u16string_view head, std::u16string_view middle,
   std::u16string name = Escaped(middle);
   const std::u16string end = Escaped(tail);
   const std::size_t around = Columns(start) + Columns(end);
-  if (around + Columns(name) > kColumns && around + kShortestMiddle <= kColumns) {
+  if (around + Columns(name) > kColumns && around < kColumns) {
     name = CutTo(name, kColumns - around);
   }
   std::u16string line = start + name + end;

@@ -22,7 +22,7 @@ class Writer {
   // One line, however long.
   void Line(std::u16string_view text);
   // One line of at most kColumns. What is too long loses the end of its middle, where an ellipsis
-  // shows it; where head and tail leave no room for that, the end of the line goes.
+  // shows it; where head and tail fill the line by themselves, its end goes.
   void FittedLine(std::u16string_view head, std::u16string_view middle, std::u16string_view tail);
   // Text of several lines of our own, ended with a line end.
   void Paragraph(std::u16string_view text);

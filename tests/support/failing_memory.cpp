@@ -1,0 +1,40 @@
+#include "tests/support/failing_memory.h"
+
+#include <cstdlib>
+#include <new>
+
+namespace {
+
+// Allocations until the one that fails; 0: none fails.
+thread_local std::uint64_t t_countdown = 0;
+thread_local bool t_paused = false;
+
+}  // namespace
+
+void* operator new(std::size_t bytes) {
+  if (t_countdown != 0 && !t_paused && --t_countdown == 0) throw std::bad_alloc();
+  void* memory = std::malloc(bytes == 0 ? 1 : bytes);
+  if (memory == nullptr) throw std::bad_alloc();
+  return memory;
+}
+void operator delete(void* memory) noexcept { std::free(memory); }
+void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+
+namespace testing_support {
+
+FailingAllocation::FailingAllocation(std::uint64_t allocation) noexcept {
+  t_countdown = allocation;
+}
+FailingAllocation::~FailingAllocation() { t_countdown = 0; }
+bool FailingAllocation::Failed() const noexcept { return t_countdown == 0; }
+
+platform::Status WellFedHost::BeforeCall(const platform::wrappers::HostCall&) noexcept {
+  t_paused = true;
+  return {};
+}
+void WellFedHost::AfterCall(const platform::wrappers::HostCall&, const platform::Status&,
+                            const std::intptr_t*) noexcept {
+  t_paused = false;
+}
+
+}  // namespace testing_support

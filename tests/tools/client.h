@@ -1,0 +1,108 @@
+// Runs the client inside of the test, over machine files as they are or changed by the test.
+#pragma once
+
+#include <gmock/gmock.h>
+
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <nlohmann/json.hpp>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "tools/zkusb/run.h"
+
+namespace zkusb {
+
+using Json = nlohmann::ordered_json;
+
+struct Result {
+  int code = 0;
+  std::string out;
+  std::string err;
+};
+
+inline Result RunClient(const std::vector<std::string>& args) {
+  std::ostringstream out;
+  std::ostringstream err;
+  const int code = Run(args, out, err);
+  return {code, out.str(), err.str()};
+}
+
+// What a run prints that is expected to do what it is asked.
+inline std::string Output(const std::vector<std::string>& args) {
+  const Result result = RunClient(args);
+  EXPECT_EQ(result.code, kDone) << result.err;
+  EXPECT_EQ(result.err, "");
+  return result.out;
+}
+
+inline Json JsonOutput(std::vector<std::string> args) {
+  args.push_back("--json");
+  const Json json = Json::parse(Output(args), nullptr, false);
+  EXPECT_FALSE(json.is_discarded());
+  return json;
+}
+
+inline std::vector<std::string> Lines(const std::string& text) {
+  std::vector<std::string> lines;
+  std::istringstream stream(text);
+  for (std::string line; std::getline(stream, line);) lines.push_back(line);
+  return lines;
+}
+
+inline std::filesystem::path MachinesFolder() {
+  return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines";
+}
+inline std::string MachineFile(const std::string& name) {
+  return (MachinesFolder() / (name + ".json")).string();
+}
+inline Json LoadJson(const std::filesystem::path& path) {
+  std::ifstream stream(path);
+  return Json::parse(stream);
+}
+
+// A file that is gone with its owner.
+class TemporaryFile {
+ public:
+  explicit TemporaryFile(const std::string& text) : m_path(FreePath()) {
+    std::ofstream(m_path) << text;
+  }
+  ~TemporaryFile() { std::filesystem::remove(m_path); }
+  TemporaryFile(const TemporaryFile&) = delete;
+  TemporaryFile& operator=(const TemporaryFile&) = delete;
+
+  std::string Path() const { return m_path.string(); }
+
+ private:
+  static std::filesystem::path FreePath() {
+    static int count = 0;
+    const auto* test = testing::UnitTest::GetInstance()->current_test_info();
+    return std::filesystem::path(testing::TempDir()) /
+           (std::string("zkusb-") + test->test_suite_name() + "-" + test->name() + "-" +
+            std::to_string(++count) + ".json");
+  }
+  std::filesystem::path m_path;
+};
+
+// The built-in machine with changes.
+inline std::string ChangedMachine(const std::function<void(Json&)>& change) {
+  Json machine = LoadJson(MachineFile("dell-precision"));
+  change(machine);
+  return machine.dump();
+}
+
+// "0781:5580" of a node, empty where an id is unknown.
+inline std::string IdOf(const Json& node) {
+  const int vendor = node.at("VendorId").get<int>();
+  const int product = node.at("ProductId").get<int>();
+  if (vendor < 0 || product < 0) return "";
+  char text[32];
+  std::snprintf(text, sizeof text, "%04X:%04X", static_cast<unsigned>(vendor),
+                static_cast<unsigned>(product));
+  return text;
+}
+
+}  // namespace zkusb

@@ -1,0 +1,182 @@
+#include <algorithm>
+#include <regex>
+#include <set>
+
+#include "tests/tools/client.h"
+
+namespace zkusb {
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+constexpr const char* kMachines[] = {"asus-b560", "dell-precision", "hp-cardreader", "vmware-win7"};
+
+std::size_t Columns(const std::string& line) {
+  return static_cast<std::size_t>(
+      std::count_if(line.begin(), line.end(), [](char byte) { return (byte & 0xC0) != 0x80; }));
+}
+
+std::size_t WidestLine(const std::string& text) {
+  std::size_t widest = 0;
+  for (const std::string& line : Lines(text)) widest = std::max(widest, Columns(line));
+  return widest;
+}
+
+// The devices that the ports of a machine file hold, hubs left out.
+std::multiset<std::string> PluggedIn(const Json& machine) {
+  std::multiset<std::string> ids;
+  for (const Json& hub : machine.at("hubs")) {
+    for (const Json& port : hub.at("ports")) {
+      if (!port.contains("descriptor") || port.contains("hubName")) continue;
+      const auto number = [&](const char* member) {
+        const Json& value = port.at("descriptor").at(member);
+        return value.is_string() ? std::stoi(value.get<std::string>(), nullptr, 16)
+                                 : value.get<int>();
+      };
+      ids.insert(IdOf({{"VendorId", number("idVendor")}, {"ProductId", number("idProduct")}}));
+    }
+  }
+  return ids;
+}
+
+std::multiset<std::string> DevicesOfText(const std::string& text) {
+  static const std::regex device("Port [0-9]+: .* speed  ([0-9A-F]{4}:[0-9A-F]{4}) ");
+  std::multiset<std::string> ids;
+  for (const std::string& line : Lines(text)) {
+    std::smatch match;
+    if (std::regex_search(line, match, device)) ids.insert(match[1]);
+  }
+  return ids;
+}
+
+void CollectDevices(const Json& node, std::multiset<std::string>& ids) {
+  if (node.at("Type") == "KUDTPortDevice") {
+    if (!IdOf(node).empty()) ids.insert(IdOf(node));
+    return;
+  }
+  for (const Json& child : node.at("Childs")) CollectDevices(child, ids);
+}
+
+TEST(TreeCommand, ShowsTheBuiltInMachine) {
+  EXPECT_EQ(Output({"tree"}),
+            R"(USB tree
+├─ USB xHCI Compliant Host Controller
+│  └─ Root hub, 8 ports
+│     ├─ Port 3: full speed  0781:5580 SanDisk Corporation, USB Mass Stor…  [D:]
+│     │  └─ Disk SanDisk Extreme USB Device
+│     │     └─ Volume \\?\Volume{3869c27a-31b8-11e8-9b12-ecf4bb487fed}\ on D:
+│     └─ Ports 1-2, 4-8: empty
+├─ Intel(R) 7 Series/C216 Chipset Family USB Enhanced Host Controller - 1E2D
+│  └─ Root hub, 3 ports
+│     ├─ Port 1: hub 8087:0024 Generic USB Hub, 6 ports
+│     │  ├─ Port 4: full speed  413C:8197 Dell Wireless 380 Bluetooth 4.0 Module
+│     │  ├─ Port 5: full speed  0C45:643F USB Composite Device
+│     │  └─ Ports 1-3, 6: empty
+│     └─ Ports 2-3: empty
+└─ Intel(R) 7 Series/C216 Chipset Family USB Enhanced Host Controller - 1E26
+   └─ Root hub, 3 ports
+      ├─ Port 1: hub 8087:0024 Generic USB Hub, 8 ports
+      │  └─ Ports 1-8: empty
+      └─ Ports 2-3: empty
+)");
+}
+
+TEST(TreeCommand, NamesEveryDeviceOnceWithinEightyColumns) {
+  for (const std::string machine : kMachines) {
+    SCOPED_TRACE(machine);
+    const std::string file = MachineFile(machine);
+    const std::multiset<std::string> plugged = PluggedIn(LoadJson(file));
+    EXPECT_GE(plugged.size(), 2u);
+
+    const std::string text = Output({"tree", "--machine", file});
+    EXPECT_LE(WidestLine(text), 80u);
+    EXPECT_EQ(DevicesOfText(text), plugged);
+
+    std::multiset<std::string> ids;
+    CollectDevices(JsonOutput({"tree", "--machine", file}), ids);
+    EXPECT_EQ(ids, plugged);
+  }
+  EXPECT_EQ(Output({"tree", "--machine", MachineFile("dell-precision")}), Output({"tree"}));
+}
+
+TEST(TreeCommand, LeavesInternalDisksOutButNotWhatEventsMayName) {
+  EXPECT_THAT(Output({"tree"}), Not(HasSubstr("not USB")));
+  EXPECT_THAT(Output({"tree", "--machine", MachineFile("vmware-win7")}),
+              HasSubstr("└─ PCI\\VEN_15AD&DEV_07A0&SUBSYS_07A015AD&REV_01\\3&18D45AA6&0&A8 "
+                        "(not USB)\n   └─ VMware, VMware Virtual S SCSI Disk Device\n"));
+}
+
+TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
+  const TemporaryFile file(ChangedMachine([](Json& machine) {
+    Json& ports = machine["hubs"][0]["ports"];
+    ports[2]["configuration"] = 0;
+    ports[2].erase("filledIn");
+    ports[4] = {{"status", 2}, {"speed", "low"}};
+    for (Json& device : machine["devices"]) {
+      if (device["id"] != "USB\\VID_0781&PID_5580\\AA010603160707470215") continue;
+      device["description"] = "\u001b[2J   Stick \u202e ";
+      device.erase("filledIn");
+    }
+    for (Json& volume : machine["volumes"]) {
+      if (volume.value("paths", Json::array()) == Json::array({"D:\\"})) {
+        volume["paths"].push_back("C:\\All sticks\\One\\");
+      }
+    }
+  }));
+  const std::string text = Output({"tree", "--machine", file.Path()});
+  // The name is shortened, not the mount points.
+  EXPECT_THAT(text, HasSubstr("├─ Port 3: bad device  full speed  0781:5580 San…  "
+                              "[D:, C:\\All sticks\\One]\n"));
+  EXPECT_THAT(text, HasSubstr("├─ Port 5: bad device  low speed  0000:0000 unknown device\n"));
+  EXPECT_THAT(text, HasSubstr("└─ Ports 1-2, 4, 6-8: empty\n"));
+  EXPECT_LE(WidestLine(text), 80u);
+
+  const std::string found = Output({"find", "--vendor", "781", "--machine", file.Path()});
+  EXPECT_THAT(found, HasSubstr("SanDisk Corporation, \\x1B[2J Stick \\u202E  D:, C:\\All"));
+  const Json json = JsonOutput({"find", "--vendor", "781", "--machine", file.Path()});
+  EXPECT_EQ(json.at(0).at("DeviceDescr"), "\u001b[2J   Stick \u202e ");
+  EXPECT_THAT(Output({"dump", "--machine", file.Path()}),
+              HasSubstr("deviceDescr : \u001b[2J   Stick \u202e \r\n"));
+}
+
+// A hub on the first port of another one, and so on, below the root hub of the first controller.
+std::string HubChain(std::size_t length) {
+  return ChangedMachine([length](Json& machine) {
+    Json& hubs = machine["hubs"];
+    Json* port = &hubs[0]["ports"][0];
+    std::vector<Json> chain;
+    for (std::size_t i = 0; i < length; ++i) {
+      const std::string name = "USB#VID_1234&PID_5678#" + std::to_string(i) + "#{0}";
+      *port = {{"hubName", name}};
+      chain.push_back({{"name", name}, {"ports", {Json::object()}}});
+      port = &chain.back()["ports"][0];
+    }
+    for (Json& hub : chain) hubs.push_back(hub);
+  });
+}
+
+TEST(TreeCommand, CopesWithMoreHubsThanFitTheWindow) {
+  const TemporaryFile deep(HubChain(60));
+  const std::string text = Output({"tree", "--machine", deep.Path()});
+  EXPECT_THAT(text, HasSubstr("Port 1: hub 1234:5678 "));
+  EXPECT_EQ(WidestLine(text), 80u);
+  EXPECT_GE(Lines(text).size(), 60u);
+
+  const TemporaryFile tooDeep(HubChain(250));
+  const Result refused = RunClient({"tree", "--machine", tooDeep.Path()});
+  EXPECT_EQ(refused.code, kRefused);
+  EXPECT_EQ(refused.err, "zkusb: the topology has more than 400 levels\n");
+}
+
+TEST(TreeCommand, LooksAfterTheWholeScript) {
+  const std::string script = (MachinesFolder() / "scripts" / "stick-comes-and-goes.json").string();
+  Json half = LoadJson(script);
+  half["steps"].erase(half["steps"].size() - 1);
+  const TemporaryFile comes(half.dump());
+  EXPECT_THAT(Output({"tree", "--script", comes.Path()}), HasSubstr("0951:1666"));
+  EXPECT_EQ(Output({"tree", "--script", script}), Output({"tree"}));
+}
+
+}  // namespace
+}  // namespace zkusb
