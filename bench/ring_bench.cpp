@@ -2,6 +2,7 @@
 // under one process-wide lock, beside the standard shared pointer, which counts.
 #include <benchmark/benchmark.h>
 
+#include <chrono>
 #include <memory>
 #include <stop_token>
 #include <thread>

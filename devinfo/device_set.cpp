@@ -7,6 +7,13 @@
 
 namespace KelvoUHW {
 
+namespace {
+
+// Twice the longest path there is, in bytes.
+constexpr std::uint32_t kMostDetailBytes = 1U << 17;
+
+}  // namespace
+
 std::u16string InterfaceDetail::DevicePath() const {
   if (m_bytes.size() <= platform::kInterfaceDetailPathOffset) return {};
   const std::size_t bytes = m_bytes.size() - platform::kInterfaceDetailPathOffset;
@@ -21,7 +28,7 @@ InterfaceDetail ReadInterfaceDetail(platform::DeviceSets& sets, platform::Device
                                     platform::SP_DEVINFO_DATA* device, platform::Status& status) {
   std::uint32_t required = 0;
   status = sets.GetDeviceInterfaceDetail(set, data, nullptr, 0, &required, nullptr);
-  if (required == 0) return {};
+  if (required == 0 || required > kMostDetailBytes) return {};
 
   // The size is the system's word; a buffer that could not even hold the size field is not offered.
   const std::uint32_t fixedPart = platform::kInterfaceDetailSize;

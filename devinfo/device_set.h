@@ -10,6 +10,9 @@
 
 namespace KelvoUHW {
 
+// Far beyond any PC: an enumeration that a system never ends is left there.
+inline constexpr std::uint32_t kMostElements = 200'000;
+
 // A device-information set, destroyed with its owner unless it is let go.
 class DeviceSet {
  public:

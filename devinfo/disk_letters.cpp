@@ -123,7 +123,7 @@ void DiskLetterFinder::ReadClass(const platform::Guid& interfaceClass, ClassDevi
   if (!set.Open(&interfaceClass, platform::kDIGCF_PRESENT | platform::kDIGCF_DEVICEINTERFACE)) {
     return;
   }
-  for (std::uint32_t index = 0;; ++index) {
+  for (std::uint32_t index = 0; index < kMostElements; ++index) {
     platform::SP_DEVICE_INTERFACE_DATA data{};
     data.cbSize = sizeof data;
     if (!m_host.EnumDeviceInterfaces(set.Get(), interfaceClass, index, data)) return;

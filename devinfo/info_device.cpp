@@ -50,7 +50,7 @@ void CZKUMInfoDeviceImpl::Reset() {
   m_devInstHandle = m_devInstHandleParent = kUnknownDevInst;
 }
 
-void CZKUMInfoDeviceImpl::ToString(std::u16string& out, std::u16string indent) const {
+void CZKUMInfoDeviceImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   const auto lineIfAny = [&](std::u16string_view label, const std::u16string& value) {
     if (!value.empty()) AppendLine(out, indent, label, value);
   };
@@ -77,7 +77,6 @@ void CZKUMInfoDeviceImpl::ToString(std::u16string& out, std::u16string indent) c
     AppendLine(out, indent, u"SPDRP_UI_NUMBER    : 0x",
                platform::Hex(static_cast<std::uint32_t>(UiNumber)));
   }
-  ChildsToString(out, indent);
 }
 
 }  // namespace KelvoUHW

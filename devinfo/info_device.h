@@ -13,7 +13,7 @@ namespace KelvoUHW {
 class CZKUMInfoDeviceImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   CZKUMInfoDeviceImpl();
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   // Makes the record ready for the next node. Serial number, Location and EnumName are meant to
   // stay: a node that lacks them shows those of the node read before it.

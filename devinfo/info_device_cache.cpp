@@ -16,9 +16,6 @@ namespace KelvoUHW {
 
 namespace {
 
-// Far beyond any PC; a system whose list has no end is left there.
-constexpr std::uint32_t kMostDevices = 200'000;
-
 // Parents by how their ids begin: a device below any other bus is not reported.
 bool HasAdmittedParent(const CZKUMInfoDeviceImpl& record) noexcept {
   static constexpr std::array<std::u16string_view, 5> kPrefixes{u"USB", u"IUSB", u"SD", u"PCI",
@@ -115,7 +112,7 @@ std::uint32_t InfoDeviceCache::EnumerateDeviceNodes(std::u16string_view classNam
   m_current.Clear();
   PropertyBuffer buffer;
   InfoDevicePtr record = MakeRecord<CZKUMInfoDeviceImpl>();
-  for (std::uint32_t index = 0; index < kMostDevices; ++index) {
+  for (std::uint32_t index = 0; index < kMostElements; ++index) {
     platform::SP_DEVINFO_DATA element;
     element.cbSize = sizeof element;
     if (!m_sets.EnumDeviceInfo(set.Get(), index, element)) break;

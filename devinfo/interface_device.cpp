@@ -71,7 +71,7 @@ void CZKUMInterfaceDeviceImpl::DevicePropertiesToString(std::u16string& out,
   }
 }
 
-void CZKUMInterfaceDeviceImpl::ToString(std::u16string& out, std::u16string indent) const {
+void CZKUMInterfaceDeviceImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   AppendLine(out, indent, u" Interface ++++++++++++++++++++++++++++");
   BaseToString(out, indent);
   DevicePropertiesToString(out, indent);
@@ -86,7 +86,6 @@ void CZKUMInterfaceDeviceImpl::ToString(std::u16string& out, std::u16string inde
   for (const std::u16string& mountPoint : MountPoints) {
     AppendLine(out, indent, u"devMountPoint   : ", mountPoint);
   }
-  ChildsToString(out, indent);
 }
 
 }  // namespace KelvoUHW

@@ -28,7 +28,7 @@ inline constexpr std::size_t kStorageDescriptorBytes = 512;
 class CZKUMInterfaceDeviceImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   CZKUMInterfaceDeviceImpl() noexcept;
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   // The path of the device interface; empty without a detail.
   std::u16string DevicePath() const { return Detail.DevicePath(); }

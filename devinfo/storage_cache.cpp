@@ -77,7 +77,9 @@ std::vector<NodePtr> StorageCache::CollectVolumes(StoragePass& pass) {
   OpenEnumeration(m_volumeEnumeration);
   m_spare.clear();
   std::vector<NodePtr> accepted;
-  for (std::uint32_t index = 0; auto record = ReadInterface(m_volumeEnumeration, index); ++index) {
+  for (std::uint32_t index = 0; index < kMostElements; ++index) {
+    auto record = ReadInterface(m_volumeEnumeration, index);
+    if (!record) break;
     if (pass.OpenAndQueryVolume(*record) == KStorageAccepted) accepted.push_back(std::move(record));
   }
   return accepted;
@@ -87,7 +89,9 @@ std::vector<NodePtr> StorageCache::CollectDisks(StoragePass& pass) {
   OpenEnumeration(m_diskEnumeration);
   m_diskSpare.clear();
   std::vector<NodePtr> kept;
-  for (std::uint32_t index = 0; auto record = ReadInterface(m_diskEnumeration, index); ++index) {
+  for (std::uint32_t index = 0; index < kMostElements; ++index) {
+    auto record = ReadInterface(m_diskEnumeration, index);
+    if (!record) break;
     if (pass.PrepareDiskRecord(*record) != KStorageAccepted) continue;
     if (pass.KeepsDisk(*record)) kept.push_back(std::move(record));
   }

@@ -11,6 +11,7 @@
 #include "devinfo/device_set.h"
 #include "devinfo/devnode.h"
 #include "devinfo/property_reader.h"
+#include "devinfo/received_text.h"
 #include "platform/text.h"
 #include "tree/port_device.h"
 #include "tree/records.h"
@@ -63,7 +64,7 @@ class ElementReader {
                                           bufferBytes, nullptr)) {
       return std::nullopt;
     }
-    return std::u16string(platform::UpToZero(buffer));
+    return ReceivedText(buffer);
   }
 
   std::optional<std::u16string> ClassDescription() const {
@@ -72,7 +73,7 @@ class ElementReader {
                                     nullptr)) {
       return std::nullopt;
     }
-    return std::u16string(platform::UpToZero(buffer));
+    return ReceivedText(buffer);
   }
 
  private:
@@ -91,7 +92,7 @@ std::vector<DeviceNodeRecord> ReadDeviceRecords(platform::Host& host) {
            platform::kDIGCF_PRESENT | platform::kDIGCF_ALLCLASSES | platform::kDIGCF_PROFILE);
   if (set.Get() == platform::kInvalidHandle) return records;
 
-  for (std::uint32_t index = 0;; ++index) {
+  for (std::uint32_t index = 0; index < kMostElements; ++index) {
     platform::SP_DEVINFO_DATA data{.cbSize = sizeof data};
     if (!host.EnumDeviceInfo(set.Get(), index, data)) break;
     const ElementReader element(host, set.Get(), data);
@@ -240,6 +241,8 @@ std::vector<DeviceNodeRecord> LinkDeviceForest(std::vector<DeviceNodeRecord> rec
 
 void AddForestNodes(const std::vector<DeviceNodeRecord>& forest, CZKUMUsbTreeNodeImpl& root) {
   for (const DeviceNodeRecord& record : forest) {
+    // Anywhere in the id and exact in case; whatever the class, it becomes a controller. This is
+    // meant.
     if (record.InstanceId.find(u"PCI\\") != std::u16string::npos) {
       AddController(record, root);
     } else {

@@ -32,9 +32,15 @@ class NameBuffer {
   std::u16string Name(std::size_t head, std::uint32_t received) const {
     const std::size_t end = std::min(received, m_size);
     if (end <= head) return {};
-    std::u16string name((end - head) / sizeof(char16_t), u'\0');
-    std::memcpy(name.data(), m_bytes.get() + head, name.size() * sizeof(char16_t));
-    return std::u16string(platform::UpToZero(name));
+    // Taken one by one: how much a driver claims to have written says nothing about the name.
+    std::u16string name;
+    for (std::size_t at = head; at + sizeof(char16_t) <= end; at += sizeof(char16_t)) {
+      char16_t unit;
+      std::memcpy(&unit, m_bytes.get() + at, sizeof unit);
+      if (unit == u'\0') break;
+      name += unit;
+    }
+    return name;
   }
 
  private:
@@ -89,13 +95,11 @@ std::u16string GetHcdDriverKeyName(platform::DeviceIo& io, platform::FileHandle 
 
   NameBuffer second(first.head.ActualLength);
   if (!second) return {};
-  const platform::UsbNameHead head{};
-  second.PutHead(&head, sizeof head);
   if (!io.DeviceControl(controller, kCode, second.Data(), second.Size(), second.Data(),
                         second.Size(), received)) {
     return {};
   }
-  return second.Name(sizeof head, received);
+  return second.Name(sizeof(platform::UsbNameHead), received);
 }
 
 std::u16string GetRootHubName(platform::DeviceIo& io, platform::FileHandle controller) {

@@ -40,8 +40,37 @@ CZKUMUsbTreeNodeImpl::~CZKUMUsbTreeNodeImpl() {
 bool CZKUMUsbTreeNodeImpl::AcceptNode(NodePtr) { return true; }
 
 void CZKUMUsbTreeNodeImpl::ToString(std::u16string& out, std::u16string indent) const {
+  struct Level {
+    const CZKUMUsbTreeNodeImpl* node;
+    std::size_t nextChild;
+  };
+  std::vector<Level> path;
+  const auto enter = [&](const CZKUMUsbTreeNodeImpl& node) {
+    node.OwnLines(out, indent);
+    // The number is the constant 0 and not the count of children. This is meant: readers of dumps
+    // depend on the line as it is.
+    out += u"childvector size0\r\n";
+    path.push_back({&node, 0});
+  };
+  enter(*this);
+  while (!path.empty()) {
+    Level& level = path.back();
+    if (level.nextChild == level.node->m_childs.size()) {
+      out += u"ChildsToString End\r\n";
+      path.pop_back();
+      if (!path.empty()) indent.resize(indent.size() - kChildIndent.size());
+      continue;
+    }
+    const CZKUMUsbTreeNodeImpl& child = *level.node->m_childs[level.nextChild];
+    out.append(u"child ");
+    out.append(platform::Decimal(static_cast<std::int32_t>(level.nextChild++))).append(u"\r\n");
+    indent += kChildIndent;
+    enter(child);
+  }
+}
+
+void CZKUMUsbTreeNodeImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   BaseToString(out, indent);
-  ChildsToString(out, indent);
 }
 
 void CZKUMUsbTreeNodeImpl::BaseToString(std::u16string& out, const std::u16string& indent) const {
@@ -65,18 +94,6 @@ void CZKUMUsbTreeNodeImpl::BaseToString(std::u16string& out, const std::u16strin
   };
   lineUnlessZero(u"devInstHandle        : ", m_devInstHandle);
   lineUnlessZero(u"devInstHandleParent  : ", m_devInstHandleParent);
-}
-
-void CZKUMUsbTreeNodeImpl::ChildsToString(std::u16string& out, const std::u16string& indent) const {
-  // The number is the constant 0 and not the count of children. This is meant: readers of dumps
-  // depend on the line as it is.
-  out += u"childvector size0\r\n";
-  std::int32_t index = 0;
-  for (const NodePtr& child : m_childs) {
-    out += u"child " + platform::Decimal(index++) + u"\r\n";
-    child->ToString(out, indent + kChildIndent);
-  }
-  out += u"ChildsToString End\r\n";
 }
 
 bool CZKUMUsbTreeNodeImpl::HasChildWithDriverKey(const std::u16string& driverKey) const {

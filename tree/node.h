@@ -1,11 +1,15 @@
 // The base of all records: one node of the topology snapshot.
 //
 // Records are plain data, filled by one thread and read by many once published. They carry no lock.
+// Device records (info devices) are the exception: they live on from tree to tree, and each build
+// may change their children and parent links, so reading those of a published tree must not overlap
+// a build.
 #pragma once
 
 #include <atomic>
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "devinfo/identifiers.h"
@@ -50,7 +54,7 @@ class ParentLink {
 };
 
 // What is added to the indent of a child's dump.
-inline constexpr char16_t kChildIndent[] = u"- ";
+inline constexpr std::u16string_view kChildIndent = u"- ";
 
 class CZKUMUsbTreeNodeImpl : public NodeIdentity {
  public:
@@ -66,7 +70,7 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
   // Whether the node is kept when a replaced tree is pruned. Every class answers true.
   virtual bool AcceptNode(NodePtr node);
   // Appends the text dump of the node and its subtree. Each line starts with `indent` and ends with
-  // "\r\n".
+  // "\r\n". A loop over the tree, however deep: what differs between kinds of node is OwnLines.
   virtual void ToString(std::u16string& out, std::u16string indent) const;
 
   // Deletes a record that no RingPtr holds any more. Records that die with it are deleted one after
@@ -90,9 +94,10 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
  protected:
   explicit CZKUMUsbTreeNodeImpl(TUsbDeviceType type) noexcept : m_nType(type) {}
 
+  // What the dump shows of the node itself, before its children.
+  virtual void OwnLines(std::u16string& out, const std::u16string& indent) const;
   // The lines every kind of node shares.
   void BaseToString(std::u16string& out, const std::u16string& indent) const;
-  void ChildsToString(std::u16string& out, const std::u16string& indent) const;
 };
 
 // Hangs a node below a parent, unless one of the parent's children is the same node: then nothing

@@ -54,7 +54,7 @@ CZKUMPortDeviceImpl::~CZKUMPortDeviceImpl() {
 
 bool CZKUMPortDeviceImpl::AcceptNode(NodePtr) { return true; }
 
-void CZKUMPortDeviceImpl::ToString(std::u16string& out, std::u16string indent) const {
+void CZKUMPortDeviceImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   const ConnectionRecord* record = ConnectionInfo();
   if (record && record->Info.ConnectionStatus != platform::NoDeviceConnected) {
     AppendLine(out, indent, u"PortDevice: ==================================================");
@@ -74,7 +74,6 @@ void CZKUMPortDeviceImpl::ToString(std::u16string& out, std::u16string indent) c
     AppendLine(out, indent, u"End device -------------------------------------------");
   }
   if (m_infoDevice) m_infoDevice->ToString(out, indent);
-  ChildsToString(out, indent);
 }
 
 std::uint8_t CZKUMPortDeviceImpl::Speed() const noexcept {

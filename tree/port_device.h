@@ -24,7 +24,7 @@ class CZKUMPortDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   ~CZKUMPortDeviceImpl() override;
 
   bool AcceptNode(NodePtr node) override;
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   // The connection record's speed byte; 0 without a record.
   std::uint8_t Speed() const noexcept;

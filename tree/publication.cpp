@@ -90,6 +90,9 @@ DeviceList Publication::MatchAll(const InfoDeviceSet& entries, TreeIndex& index)
 }
 
 void Publication::Merge(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device, TreeIndex& index) {
+  if (device.m_infoDevice && device.m_infoDevice != entry) {
+    device.m_infoDevice->m_pParent.ClearIfNaming(device.m_pParent);
+  }
   device.m_infoDevice = entry;
   // The entry's parent is the hub port and not the device it belongs to. This is meant.
   entry->m_pParent = static_cast<CZKUMUsbTreeNodeImpl*>(device.m_pParent);

@@ -5,6 +5,7 @@
 #include "com/usb_names.h"
 #include "devinfo/identifiers.h"
 #include "platform/text.h"
+#include "tree/port_device.h"
 
 namespace KelvoUHW {
 
@@ -12,30 +13,26 @@ CZKUMUsbTreeRootImpl::CZKUMUsbTreeRootImpl() : CZKUMUsbTreeNodeImpl(KUDTRoot) {
   SetInstanceId(u"Abstract root");
 }
 
-void CZKUMUsbTreeRootImpl::ToString(std::u16string& out, std::u16string indent) const {
-  ChildsToString(out, indent);
-}
+void CZKUMUsbTreeRootImpl::OwnLines(std::u16string&, const std::u16string&) const {}
 
-void CZKUMHostControllerImpl::ToString(std::u16string& out, std::u16string indent) const {
+void CZKUMHostControllerImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   AppendLine(out, indent, u"HostController:");
   BaseToString(out, indent);
   AppendLine(out, indent, u"LeafName    : ", m_strLeafName);
   AppendLine(out, indent, u"rootHubName : ", m_strRootHubName);
-  ChildsToString(out, indent);
 }
 
 CZKUMHubDeviceImpl::~CZKUMHubDeviceImpl() {
-  ConnectionRecord::KeepForProcessLife(TakeConnectionRecord());
+  if (m_pPortInfo) ConnectionRecord::KeepForProcessLife(std::move(m_pPortInfo->ConnectionInfo));
 }
 
-void CZKUMHubDeviceImpl::ToString(std::u16string& out, std::u16string indent) const {
+void CZKUMHubDeviceImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   AppendLine(out, indent, u"Hub :");
   BaseToString(out, indent);
   AppendLine(out, indent, u"leafName       : ", LeafName());
   AppendLine(out, indent, u"pathName       : ", m_strPathName);
   AppendLine(out, indent, u"connectionName : ", m_strConnectionName);
   AppendLine(out, indent, u"Port nb    : ", platform::Decimal(NumberOfPorts()));
-  ChildsToString(out, indent);
 }
 
 void CZKUMHubDeviceImpl::SetHubName(const std::u16string& name) {
@@ -54,10 +51,6 @@ void CZKUMHubDeviceImpl::SetConnectionInfo(std::unique_ptr<ConnectionRecord> con
       UsbPortInfo{std::move(connectionInfo), std::move(configDesc), std::move(stringDescs)});
 }
 
-std::unique_ptr<ConnectionRecord> CZKUMHubDeviceImpl::TakeConnectionRecord() noexcept {
-  return m_pPortInfo ? std::move(m_pPortInfo->ConnectionInfo) : nullptr;
-}
-
 std::u16string CZKUMHubDeviceImpl::LeafName() const {
   std::u16string name;
   if (m_bHasConnectionInfo && m_pPortInfo->ConnectionInfo) {
@@ -69,7 +62,15 @@ std::u16string CZKUMHubDeviceImpl::LeafName() const {
   return name + (m_strDeviceDescr.empty() ? m_strConnectionName : m_strDeviceDescr);
 }
 
-void CZKUMHubPortImpl::ToString(std::u16string& out, std::u16string indent) const {
+CZKUMHubPortImpl::~CZKUMHubPortImpl() {
+  for (const NodePtr& child : m_childs) {
+    if (child->m_nType != KUDTPortDevice) continue;
+    const auto& device = static_cast<const CZKUMPortDeviceImpl&>(*child);
+    if (device.m_infoDevice) device.m_infoDevice->m_pParent.ClearIfNaming(this);
+  }
+}
+
+void CZKUMHubPortImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   AppendLine(out, indent,
              u"HubPort " + platform::Decimal(static_cast<std::int32_t>(m_nPortIndex)) + u":");
   // Everything but 0 and 1 is called bad, an unconfigured device too. This is meant.
@@ -77,7 +78,6 @@ void CZKUMHubPortImpl::ToString(std::u16string& out, std::u16string indent) cons
              m_nStatus == KPortEmpty       ? u"no device connected"
              : m_nStatus == KPortConnected ? u"device connected"
                                            : u"bad device");
-  ChildsToString(out, indent);
 }
 
 }  // namespace KelvoUHW

@@ -15,13 +15,13 @@ class CZKUMUsbTreeRootImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   CZKUMUsbTreeRootImpl();
   // The root writes no line of its own, only its children.
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 };
 
 class CZKUMHostControllerImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   CZKUMHostControllerImpl() noexcept : CZKUMUsbTreeNodeImpl(KUDTHostController) {}
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   void SetLeafName(std::u16string name) { m_strLeafName = std::move(name); }
 
@@ -41,17 +41,14 @@ class CZKUMHubDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   // The connection record stays allocated for the life of the process: it is handed on, not freed.
   // Only the string list and the port information are freed. This is meant.
   ~CZKUMHubDeviceImpl() override;
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   // Takes a symbolic name apart into path, instance id and GUID.
   void SetHubName(const std::u16string& name);
+  // Makes this a hub below a port; takes over all three, any of which may be null.
   void SetConnectionInfo(std::unique_ptr<ConnectionRecord> connectionInfo,
                          std::unique_ptr<DescriptorRequest> configDesc,
                          std::unique_ptr<StringDescriptorNode> stringDescs);
-  // Gives the connection record back, for a hub that did not build; it is then freed by who takes
-  // it.
-  std::unique_ptr<ConnectionRecord> TakeConnectionRecord() noexcept;
-
   std::uint8_t NumberOfPorts() const noexcept {
     return m_nodeInformation.HubDescriptor.bNumberOfPorts;
   }
@@ -59,8 +56,8 @@ class CZKUMHubDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   std::u16string LeafName() const;
 
   std::u16string m_strConnectionName;
-  std::u16string m_strPathName;
-  platform::Guid m_guid{};
+  std::u16string m_strPathName;  // what it opens under
+  platform::Guid m_guid{};       // behind the first brace of the name; zero without one
   bool m_bHasConnectionInfo = false;
   std::unique_ptr<UsbPortInfo> m_pPortInfo;
   platform::USB_NODE_INFORMATION m_nodeInformation{};
@@ -77,8 +74,11 @@ class CZKUMHubPortImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   explicit CZKUMHubPortImpl(std::uint32_t portIndex) noexcept
       : CZKUMUsbTreeNodeImpl(KUDTHubPort), m_nPortIndex(portIndex) {}
+  // The device-manager node of a device on the port names the port as its parent, though the device
+  // holds it: its link goes to null with the port.
+  ~CZKUMHubPortImpl() override;
   // A port writes no base lines.
-  void ToString(std::u16string& out, std::u16string indent) const override;
+  void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   std::uint32_t m_nPortIndex;  // 1 is the first
   std::uint32_t m_nStatus = KPortEmpty;

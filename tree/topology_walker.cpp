@@ -40,10 +40,17 @@ void CZKUMTopologyWalker::StartWalk() {
   m_nConnectedDevices = 0;
   m_nConnectedHubs = 0;
   m_building = MakeRecord<CZKUMUsbTreeRootImpl>();
-  m_driverKeys.emplace(m_host);
+  m_driverKeys.reset();
+  m_hubPaths.clear();
   AddLegacyControllers();
   AddInterfaceControllers();
   ReadDeviceManagerTree();
+  m_driverKeys.reset();
+  m_hubPaths.clear();
+}
+
+DriverKeyIndex& CZKUMTopologyWalker::DriverKeys() {
+  return m_driverKeys ? *m_driverKeys : m_driverKeys.emplace(m_host);
 }
 
 void CZKUMTopologyWalker::ReadDeviceManagerTree() {
@@ -72,7 +79,7 @@ void CZKUMTopologyWalker::AddInterfaceControllers() {
                 platform::kDIGCF_PRESENT | platform::kDIGCF_DEVICEINTERFACE)) {
     return;
   }
-  for (std::uint32_t index = 0;; ++index) {
+  for (std::uint32_t index = 0; index < kMostElements; ++index) {
     platform::SP_DEVICE_INTERFACE_DATA data{.cbSize = sizeof data};
     if (!m_host.EnumDeviceInterfaces(set.Get(), platform::kNullGuid, index, data)) return;
     platform::Status status;
@@ -112,8 +119,7 @@ bool CZKUMTopologyWalker::AddHostController(platform::FileHandle handle,
 
 bool CZKUMTopologyWalker::AddRootHub(const RingPtr<CZKUMHostControllerImpl>& controller,
                                      platform::FileHandle handle) {
-  if (!m_driverKeys) m_driverKeys.emplace(m_host);
-  if (!Initialise(m_host, m_host, *m_driverKeys, handle, *controller)) return false;
+  if (!Initialise(m_host, m_host, DriverKeys(), handle, *controller)) return false;
   std::unique_ptr<ConnectionRecord> none;
   if (NodePtr hub = BuildHub(controller->m_strRootHubName, none, u"RootHub")) {
     AddChild(std::move(hub), controller.Get());
@@ -136,14 +142,15 @@ bool CZKUMTopologyWalker::OpenHub(HubPath& path, const std::u16string& symbolicN
   entry->hub = MakeRecord<CZKUMHubDeviceImpl>();
   CZKUMHubDeviceImpl& hub = *entry->hub;
   hub.SetHubName(symbolicName);
-  // A driver that names a hub below itself would keep the walk going for ever.
-  for (const auto& above : path) {
-    if (platform::EqualIgnoringCase(above->hub->m_strPathName, hub.m_strPathName)) return false;
-  }
+  // A hub hangs in one place. A driver that names it in several, or below itself, would make the
+  // walk as long as it likes.
+  std::u16string loweredPath = platform::ToLower(hub.m_strPathName);
+  if (m_hubPaths.contains(loweredPath)) return false;
   if (!entry->file.Open(hub.m_strPathName, platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE) ||
       !GetNodeInformation(m_host, entry->file.Get(), hub.m_nodeInformation)) {
     return false;
   }
+  m_hubPaths.insert(std::move(loweredPath));
   if (connectionInfo) hub.SetConnectionInfo(std::move(connectionInfo), nullptr, nullptr);
   if (!description.empty()) hub.m_strDeviceDescr = description;
   path.push_back(std::move(entry));
@@ -189,7 +196,7 @@ void CZKUMTopologyWalker::BuildPort(HubPath& path, std::uint32_t index) {
     if (info.ConnectionStatus != platform::NoDeviceConnected) {
       driverKey = GetConnectionDriverKeyName(m_host, hub, index);
       if (!driverKey.empty()) {
-        node = m_driverKeys->Find(driverKey);
+        node = DriverKeys().Find(driverKey);
         description = GetDeviceDescription(m_host, node);
         instanceId = GetDeviceId(m_host, node);
       }

@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <unordered_set>
 #include <vector>
 
 #include "devinfo/devnode.h"
@@ -38,7 +39,8 @@ class CZKUMTopologyWalker {
   NodePtr m_current;
   std::vector<DeviceNodeRecord> m_deviceRecords;
 
-  // The steps of a walk. `handle` is open and stays the caller's.
+  // The steps of a walk. `handle` is open and stays the caller's. AddHostController is true when
+  // the controller is new; AddRootHub is true when it could be identified, with its hub or without.
   bool AddHostController(platform::FileHandle handle, const std::u16string& name);
   bool AddRootHub(const RingPtr<CZKUMHostControllerImpl>& controller, platform::FileHandle handle);
   // A hub with everything below it; empty when it does not open or answer. Takes the connection
@@ -64,7 +66,11 @@ class CZKUMTopologyWalker {
   void BuildPort(HubPath& path, std::uint32_t index);
 
   platform::Host& m_host;
+  DriverKeyIndex& DriverKeys();
+
   std::optional<DriverKeyIndex> m_driverKeys;  // of the running walk
+  // Paths of the hubs met in the running walk, lower-cased.
+  std::unordered_set<std::u16string> m_hubPaths;
 };
 
 }  // namespace KelvoUHW

@@ -11,17 +11,19 @@ CZKUMUsbTreeBuilder::CZKUMUsbTreeBuilder(platform::Host& host)
 bool CZKUMUsbTreeBuilder::Build() {
   m_walker.StartWalk();
   m_deviceInfo.SetDiskDrives(DiskDriveRecords(m_walker.m_deviceRecords));
-  // Both caches are asked in every build: each compares with its own last pass.
-  const bool devicesChanged = m_deviceInfo.Collect(m_walker.m_building);
+  // Both caches are asked in every build: each compares with its own last pass, and reports a
+  // change once. What a build that runs out of memory could not publish is owed until one does.
+  if (m_deviceInfo.Collect(m_walker.m_building)) m_bOwesPublication = true;
   std::u16string diagnostics;  // nobody reads them
-  const bool volumesChanged = m_storage.CollectStorage(diagnostics);
-  if (!devicesChanged && !volumesChanged) {
+  if (m_storage.CollectStorage(diagnostics)) m_bOwesPublication = true;
+  if (!m_bOwesPublication) {
     m_walker.Abort();
     return false;
   }
   Publication(m_host, m_deviceInfo, m_storage.Volumes(), m_walker.m_building, m_walker.m_current)
       .Run(m_deviceLists);
   m_walker.Commit();
+  m_bOwesPublication = false;
   return true;
 }
 

@@ -22,7 +22,8 @@ class CZKUMUsbTreeBuilder {
 
   // Reads the PC anew; blocks on its drivers. True when something changed: a new tree is published
   // and the lists are refilled. False when nothing did: tree and lists stay as they were. Throws
-  // std::bad_alloc only, and then publishes nothing.
+  // std::bad_alloc only, and then publishes neither tree nor lists; the next build does. Device
+  // records, which live on from tree to tree, may have been joined anew by then.
   bool Build();
 
   // The published tree; empty before the first build that found something.
@@ -45,6 +46,7 @@ class CZKUMUsbTreeBuilder {
   InfoDeviceCache m_deviceInfo;
   StorageCache m_storage;
   platform::Host& m_host;
+  bool m_bOwesPublication = false;  // a change was reported and is not published yet
 };
 
 }  // namespace KelvoUHW

@@ -5,6 +5,7 @@ function(expect_refused text message)
   execute_process(COMMAND ${CMAKE_COMMAND} -DINPUT=${DIRECTORY}/refused.tsv
                           -DOUTPUT=${DIRECTORY}/refused.inc -P ${GENERATOR}
                   RESULT_VARIABLE result ERROR_VARIABLE errors OUTPUT_QUIET)
+  string(REGEX REPLACE "[ \n]+" " " errors "${errors}")  # messages are broken into lines
   if(result EQUAL 0 OR EXISTS ${DIRECTORY}/refused.inc OR NOT errors MATCHES "${message}")
     message(SEND_ERROR "'${text}' gave ${result} and said: ${errors}")
   endif()

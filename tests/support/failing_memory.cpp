@@ -22,9 +22,7 @@ void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
 
 namespace testing_support {
 
-FailingAllocation::FailingAllocation(std::uint64_t allocation) noexcept {
-  t_countdown = allocation;
-}
+FailingAllocation::FailingAllocation(std::uint64_t allocation) noexcept { t_countdown = allocation; }
 FailingAllocation::~FailingAllocation() { t_countdown = 0; }
 bool FailingAllocation::Failed() const noexcept { return t_countdown == 0; }
 

@@ -17,8 +17,7 @@ inline Text HubName(const Text& id) {
   return platform::Replaced(id, u'\\', u'#') + u"#{f18a0e88-c30c-11d0-8815-00a0c906bed8}";
 }
 
-inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceClass, Text driver,
-                                              Text description) {
+inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceClass, Text driver, Text description) {
   platform::simulated::Device device;
   device.id = std::move(id);
   device.parent = std::move(parent);
@@ -29,8 +28,7 @@ inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceC
   return device;
 }
 
-inline platform::simulated::Port DevicePort(Text driverKey, std::uint16_t vendor,
-                                            std::uint16_t product) {
+inline platform::simulated::Port DevicePort(Text driverKey, std::uint16_t vendor, std::uint16_t product) {
   platform::simulated::Port port;
   port.status = 1;
   port.configuration = 1;
@@ -47,20 +45,16 @@ inline platform::simulated::Port HubOnPort(Text driverKey, Text name) {
   return port;
 }
 
-inline constexpr char16_t kControllerId[] =
-    u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086&REV_05\\3&11583659&0&E8";
+inline constexpr char16_t kControllerId[] = u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086&REV_05\\3&11583659&0&E8";
 
 // One controller, HCD0, with a root hub of `ports` empty ports.
 inline Machine OneController(std::size_t ports) {
   Machine machine;
-  machine.devices.push_back(
-      DeviceNode(u"ACPI\\PNP0A08\\0", u"", u"System", u"{sys}\\0001", u"PCI"));
-  machine.devices.push_back(
-      DeviceNode(kControllerId, u"ACPI\\PNP0A08\\0", u"USB", u"{usb}\\0000", u"EHCI Controller"));
+  machine.devices.push_back(DeviceNode(u"ACPI\\PNP0A08\\0", u"", u"System", u"{sys}\\0001", u"PCI"));
+  machine.devices.push_back(DeviceNode(kControllerId, u"ACPI\\PNP0A08\\0", u"USB", u"{usb}\\0000", u"EHCI Controller"));
   machine.devices.push_back(
       DeviceNode(u"USB\\ROOT_HUB20\\4&1", kControllerId, u"USB", u"{usb}\\0001", u"USB Root Hub"));
-  machine.hostControllers.push_back(
-      {{u"\\\\.\\HCD0"}, u"{usb}\\0000", HubName(u"USB\\ROOT_HUB20\\4&1")});
+  machine.hostControllers.push_back({{u"\\\\.\\HCD0"}, u"{usb}\\0000", HubName(u"USB\\ROOT_HUB20\\4&1")});
   machine.hubs.push_back({HubName(u"USB\\ROOT_HUB20\\4&1"), {}, false});
   machine.hubs.back().ports.resize(ports);
   return machine;

@@ -27,9 +27,8 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
   // Every request with this code changes the base's answer.
   void Always(std::uint32_t code, Answer change) { m_changes[code] = std::move(change); }
 
-  platform::Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in,
-                                 std::uint32_t inBytes, void* out, std::uint32_t outBytes,
-                                 std::uint32_t& returned) noexcept override {
+  platform::Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
+                                 void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
     auto& answers = m_answers[code];
     if (!answers.empty()) {
       const Answer answer = std::move(answers.front());
@@ -37,8 +36,7 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
       returned = 0;
       return answer(in, inBytes, out, outBytes, returned);
     }
-    const platform::Status status =
-        InterceptingHost::DeviceControl(handle, code, in, inBytes, out, outBytes, returned);
+    const platform::Status status = InterceptingHost::DeviceControl(handle, code, in, inBytes, out, outBytes, returned);
     const auto change = m_changes.find(code);
     if (!status || change == m_changes.end()) return status;
     return change->second(in, inBytes, out, outBytes, returned);
@@ -52,21 +50,19 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
 };
 
 // A name answer: the length it claims at an offset, then characters as far as they fit.
-inline ScriptedDriver::Answer NameAnswer(std::size_t head, std::uint32_t actualLength,
-                                         std::u16string text, std::uint32_t received) {
-  return
-      [=](const void*, std::uint32_t, void* out, std::uint32_t outBytes, std::uint32_t& returned) {
-        auto* bytes = static_cast<std::uint8_t*>(out);
-        if (outBytes >= head) std::memcpy(bytes + head - 4, &actualLength, sizeof actualLength);
-        const std::size_t room = outBytes > head ? outBytes - head : 0;
-        std::memcpy(bytes + head, text.data(), std::min(room, text.size() * sizeof(char16_t)));
-        returned = received;
-        return platform::Status::Success();
-      };
+inline ScriptedDriver::Answer NameAnswer(std::size_t head, std::uint32_t actualLength, std::u16string text,
+                                         std::uint32_t received) {
+  return [=](const void*, std::uint32_t, void* out, std::uint32_t outBytes, std::uint32_t& returned) {
+    auto* bytes = static_cast<std::uint8_t*>(out);
+    if (outBytes >= head) std::memcpy(bytes + head - 4, &actualLength, sizeof actualLength);
+    const std::size_t room = outBytes > head ? outBytes - head : 0;
+    std::memcpy(bytes + head, text.data(), std::min(room, text.size() * sizeof(char16_t)));
+    returned = received;
+    return platform::Status::Success();
+  };
 }
 
-inline platform::Status RefuseRequest(const void*, std::uint32_t, void*, std::uint32_t,
-                                      std::uint32_t&) {
+inline platform::Status RefuseRequest(const void*, std::uint32_t, void*, std::uint32_t, std::uint32_t&) {
   return platform::Status::Failure(31);
 }
 

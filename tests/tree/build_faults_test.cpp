@@ -23,25 +23,9 @@ namespace KelvoUHW {
 namespace {
 
 using platform::Status;
-using platform::simulated::Machine;
-using platform::simulated::SimulatedPc;
-using platform::simulated::Unplug;
 using platform::wrappers::HostCall;
 using platform::wrappers::IsReleasing;
 using platform::wrappers::Operation;
-using testing_support::BarePc;
-using testing_support::CardReader;
-using testing_support::Change;
-using testing_support::DiskId;
-using testing_support::ExternalHub;
-using testing_support::Gadget;
-using testing_support::InternalDisk;
-using testing_support::kNewHubService;
-using testing_support::Plug;
-using testing_support::StepOf;
-using testing_support::Stick;
-using testing_support::UsbId;
-using testing_support::Volume;
 
 // Fails one call, or that one and all after it, and remembers what failed.
 class FaultyHost final : public platform::wrappers::InterceptingHost {
@@ -87,9 +71,8 @@ class FaultyHost final : public platform::wrappers::InterceptingHost {
 const Machine& FullPc() {
   static const Machine machine = [] {
     Machine built = BarePc(kNewHubService);
-    for (const Plug& plug : {InternalDisk(), ExternalHub(u"HUB", 1, kNewHubService),
-                             Gadget(u"K1", 1, UsbId(u"HUB")), Stick(u"S1", 2, u'E', UsbId(u"HUB")),
-                             CardReader(u"CR", 2), Volume(DiskId(u"CR"), u'F')}) {
+    for (const Plug& plug : {InternalDisk(), ExternalHub(u"HUB", 1, kNewHubService), Gadget(u"K1", 1, UsbId(u"HUB")),
+                             Stick(u"S1", 2, u'E', UsbId(u"HUB")), CardReader(u"CR", 2), Volume(DiskId(u"CR"), u'F')}) {
       EXPECT_EQ(CarryOut(built, plug), u"");
     }
     return built;
@@ -158,12 +141,10 @@ std::size_t OwnedConnectionRecords(const CZKUMUsbTreeBuilder& builder) {
   std::set<const CZKUMUsbTreeNodeImpl*> owners;
   const auto visit = [&](const NodePtr& root) {
     VisitPreOrder(root, [&](const NodePtr& node) {
-      if (node->m_nType == KUDTPortDevice &&
-          static_cast<const CZKUMPortDeviceImpl&>(*node).ConnectionInfo()) {
+      if (node->m_nType == KUDTPortDevice && static_cast<const CZKUMPortDeviceImpl&>(*node).ConnectionInfo()) {
         owners.insert(node.Get());
       }
-      if (node->m_nType == KUDTHub &&
-          static_cast<const CZKUMHubDeviceImpl&>(*node).m_bHasConnectionInfo) {
+      if (node->m_nType == KUDTHub && static_cast<const CZKUMHubDeviceImpl&>(*node).m_bHasConnectionInfo) {
         owners.insert(node.Get());
       }
       return true;
@@ -187,8 +168,7 @@ void CheckNothingLost(const Desk& desk) {
   const std::size_t volumeSets = 1 + desk.builds - desk.host.failedSets.count(4);
   const std::size_t diskSets = desk.builds - desk.host.failedSets.count(5);
   std::map<std::string, std::size_t> expected = {
-      {"set interfaces " + platform::ToUtf8(GuidText(platform::GUID_DEVINTERFACE_VOLUME)),
-       volumeSets},
+      {"set interfaces " + platform::ToUtf8(GuidText(platform::GUID_DEVINTERFACE_VOLUME)), volumeSets},
       {"set interfaces " + platform::ToUtf8(GuidText(platform::GUID_DEVINTERFACE_DISK)), diskSets},
       {"set devices", desk.host.readingsStopped}};
   std::erase_if(expected, [](const auto& entry) { return entry.second == 0; });
@@ -199,7 +179,7 @@ void CheckNothingLost(const Desk& desk) {
 // Where the faulty build stands, and what fails in it.
 struct Stage {
   const char* what;
-  bool first;  // it is the first one of its builder; else a keyboard goes and a stick comes before
+  bool first;    // it is the first one of its builder; else a keyboard goes and a stick comes before
   bool onwards;  // all calls from the n-th on fail; else the n-th alone
   int mostCleanBuilds;
 
@@ -209,8 +189,7 @@ struct Stage {
 constexpr std::uint64_t kNoCall = std::numeric_limits<std::uint64_t>::max();
 
 // What the next event shows after a fault and so many clean builds.
-Shown AfterFault(const Stage& stage, std::uint64_t call, int cleanBuilds,
-                 std::optional<Operation>& failed) {
+Shown AfterFault(const Stage& stage, std::uint64_t call, int cleanBuilds, std::optional<Operation>& failed) {
   const std::size_t live = ConnectionRecord::LiveCount();
   const std::size_t kept = ConnectionRecord::KeptCount();
   Shown shown;
@@ -281,10 +260,9 @@ TEST_P(BuildFaults, AreForgottenAfterAFewBuilds) {
     } else {
       const std::string name = platform::ToUtf8(NameOf(*failed));
       ++stay[name];
-      EXPECT_TRUE(!stage.onwards && MayStay(*failed, shown, unharmed))
-          << name << "\n"
-          << shown.lists << "instead of\n"
-          << unharmed.lists;
+      EXPECT_TRUE(!stage.onwards && MayStay(*failed, shown, unharmed)) << name << "\n"
+                                                                       << shown.lists << "instead of\n"
+                                                                       << unharmed.lists;
     }
     if (HasFailure()) break;
   }

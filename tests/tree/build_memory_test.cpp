@@ -16,24 +16,11 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::Machine;
 using platform::simulated::OpenCounts;
-using platform::simulated::SimulatedPc;
-using testing_support::BarePc;
-using testing_support::CardReader;
-using testing_support::DiskId;
-using testing_support::ExternalHub;
 using testing_support::FailingAllocation;
-using testing_support::Gadget;
-using testing_support::InternalDisk;
-using testing_support::Plug;
-using testing_support::StepOf;
-using testing_support::Stick;
-using testing_support::UsbId;
-using testing_support::Volume;
 using testing_support::WellFedHost;
 
-struct Change {
+struct Newcomer {
   const char* what;
   Plug plug;
   const char* lists;  // of the first build that sees it
@@ -41,12 +28,11 @@ struct Change {
   // without a commit between them is attached twice.
   const char* listsOfSecond;
 
-  friend void PrintTo(const Change& change, std::ostream* out) { *out << change.what; }
+  friend void PrintTo(const Newcomer& change, std::ostream* out) { *out << change.what; }
 };
 
 // The lists of the build after one that ran out of memory.
-std::string BuildAfterFailure(const Machine& machine, const Change& change,
-                              std::uint64_t allocation, bool& failed) {
+std::string BuildAfterFailure(const Machine& machine, const Newcomer& change, std::uint64_t allocation, bool& failed) {
   SimulatedPc pc(machine);
   WellFedHost host(pc);
   CZKUMUsbTreeBuilder builder(host);
@@ -86,7 +72,7 @@ std::string BuildAfterFailure(const Machine& machine, const Change& change,
   return ListsText(builder);
 }
 
-class BuildWithoutMemory : public testing::TestWithParam<Change> {};
+class BuildWithoutMemory : public testing::TestWithParam<Newcomer> {};
 
 TEST_P(BuildWithoutMemory, PublishesNothingAndTheNextOneWorks) {
   Machine machine = BarePc();
@@ -103,13 +89,12 @@ TEST_P(BuildWithoutMemory, PublishesNothingAndTheNextOneWorks) {
   EXPECT_GT(allocation, 500u);
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Changes, BuildWithoutMemory,
-    testing::Values(Change{"Stick", Stick(u"S2", 4, u'F'), "M1 S1 CR S2 | S2 | - | S1 CR CR",
-                           "M1 S1 CR S2 | S2 S2 | - | S1 CR CR"},
-                    Change{"Card", Volume(DiskId(u"CR"), u'F'), "M1 S1 CR | - | - | S1 CR CR",
-                           "M1 S1 CR | - | - | S1 CR CR"}),
-    [](const auto& change) { return std::string(change.param.what); });
+INSTANTIATE_TEST_SUITE_P(Changes, BuildWithoutMemory,
+                         testing::Values(Newcomer{"Stick", Stick(u"S2", 4, u'F'), "M1 S1 CR S2 | S2 | - | S1 CR CR",
+                                                  "M1 S1 CR S2 | S2 S2 | - | S1 CR CR"},
+                                         Newcomer{"Card", Volume(DiskId(u"CR"), u'F'), "M1 S1 CR | - | - | S1 CR CR",
+                                                  "M1 S1 CR | - | - | S1 CR CR"}),
+                         [](const auto& change) { return std::string(change.param.what); });
 
 }  // namespace
 }  // namespace KelvoUHW

@@ -56,20 +56,17 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
       {"no class description", [](Device& d) { d.noClassDescription = true; }, "first third ", 0},
       {"a processor", [](Device& d) { d.deviceClass = u"pROCESSOR"; }, "first third ", 0},
       {"a computer", [](Device& d) { d.deviceClass = u"COMPUTER"; }, "first third ", 0},
-      {"a class that begins alike", [](Device& d) { d.deviceClass = u"Computers"; },
-       "first second third ", 0},
+      {"a class that begins alike", [](Device& d) { d.deviceClass = u"Computers"; }, "first second third ", 0},
       {"a friendly name", [](Device& d) { d.friendlyName = u"friend"; }, "first friend third ", 0},
       {"an empty friendly name", [](Device& d) { d.friendlyName = u""; }, "first  third ", 0},
-      {"a friendly name of 126 bytes with its zero",
-       [](Device& d) { d.friendlyName = std::u16string(62, u'f'); },
+      {"a friendly name of 126 bytes with its zero", [](Device& d) { d.friendlyName = std::u16string(62, u'f'); },
        "first " + std::string(62, 'f') + " third ", 0},
-      {"a friendly name that is too long",
-       [](Device& d) { d.friendlyName = std::u16string(63, u'f'); }, "first second third ", 0},
-      {"both names too long",
-       [](Device& d) { d.friendlyName = d.description = std::u16string(63, u'f'); },
+      {"a friendly name that is too long", [](Device& d) { d.friendlyName = std::u16string(63, u'f'); },
+       "first second third ", 0},
+      {"both names too long", [](Device& d) { d.friendlyName = d.description = std::u16string(63, u'f'); },
        "first  third ", 0},
-      {"a class name that is too long",
-       [](Device& d) { d.deviceClass = std::u16string(260, u'c'); }, "first third ", 0},
+      {"a class name that is too long", [](Device& d) { d.deviceClass = std::u16string(260, u'c'); }, "first third ",
+       0},
       {"no parent", [](Device& d) { d.noParent = true; }, "", 1},
       {"a processor without parent",
        [](Device& d) {
@@ -140,8 +137,8 @@ Records FromText(const std::string& text) {
     record.DevInst = static_cast<platform::DevInst>(word.front());
     record.ParentDevInst = static_cast<platform::DevInst>(word.back());
     record.ClassName = u"System";
-    for (const auto& [mark, name] : {std::pair('*', u"DiskDrive"), std::pair('+', u"diskDRIVE"),
-                                     std::pair('!', u"USB"), std::pair('~', u"usB")}) {
+    for (const auto& [mark, name] :
+         {std::pair('*', u"DiskDrive"), std::pair('+', u"diskDRIVE"), std::pair('!', u"USB"), std::pair('~', u"usB")}) {
       if (word[1] == mark) record.ClassName = name;
     }
     records.push_back(std::move(record));
@@ -195,8 +192,7 @@ TEST(DeviceForest, ChainsThatEndInDiskDrives) {
 
 // The same record by record, by moving and searching: slow, and easy to follow.
 bool HoldsDisk(const DeviceNodeRecord& record) {
-  return platform::EqualIgnoringCase(record.ClassName, u"DiskDrive") ||
-         std::ranges::any_of(record.Children, HoldsDisk);
+  return platform::EqualIgnoringCase(record.ClassName, u"DiskDrive") || std::ranges::any_of(record.Children, HoldsDisk);
 }
 DeviceNodeRecord* FindHandle(Records& level, platform::DevInst handle) {
   for (DeviceNodeRecord& record : level) {
@@ -228,9 +224,8 @@ Records LinkPlainly(Records records) {
   const auto leadsNowhere = [](const DeviceNodeRecord& record) { return !HoldsDisk(record); };
   RemoveBelow(top, leadsNowhere);
   std::erase_if(top, leadsNowhere);
-  RemoveBelow(top, [](const DeviceNodeRecord& record) {
-    return platform::EqualIgnoringCase(record.ClassName, u"USB");
-  });
+  RemoveBelow(top,
+              [](const DeviceNodeRecord& record) { return platform::EqualIgnoringCase(record.ClassName, u"USB"); });
   return top;
 }
 
@@ -268,13 +263,12 @@ std::string NodesOf(const std::vector<DeviceNodeRecord>& forest, const NodePtr& 
   AddForestNodes(forest, *root);
   std::string text;
   const auto write = [&](const auto& self, const NodePtr& node, const std::string& dots) -> void {
-    text += dots + std::to_string(node->m_nType) + " " + platform::ToUtf8(node->m_strDevInstId) +
-            " < " + platform::ToUtf8(node->m_strDevInstIdParent);
+    text += dots + std::to_string(node->m_nType) + " " + platform::ToUtf8(node->m_strDevInstId) + " < " +
+            platform::ToUtf8(node->m_strDevInstIdParent);
     if (node->m_nType == KUDTPortDevice) {
       const auto& device = static_cast<const CZKUMPortDeviceImpl&>(*node);
-      text += "'" + platform::ToUtf8(node->m_strDeviceDescr) + "' '" +
-              platform::ToUtf8(node->m_strDriverKeyName) + "' " +
-              std::to_string(node->m_devInstHandle);
+      text += "'" + platform::ToUtf8(node->m_strDeviceDescr) + "' '" + platform::ToUtf8(node->m_strDriverKeyName) +
+              "' " + std::to_string(node->m_devInstHandle);
       EXPECT_EQ(device.ConnectionInfo(), nullptr);
     }
     if (node->m_nType == KUDTHubPort) {
@@ -303,16 +297,14 @@ TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
        "2 PCI\\T < of PCI\\T\n"
        "2 XPCI\\C < of XPCI\\C\n"},
       {"two levels and no more, and a PCI device below another is no controller",
-       {Record(u"PCI\\C", {Record(u"PCI\\H", {Record(u"IDE\\D", {Record(u"PCI\\DEEP")})}),
-                           Record(u"IDE\\E")})},
+       {Record(u"PCI\\C", {Record(u"PCI\\H", {Record(u"IDE\\D", {Record(u"PCI\\DEEP")})}), Record(u"IDE\\E")})},
        "2 PCI\\C < of PCI\\C\n"
        ".3 PCI\\H < of PCI\\H\n"
        "..4 IDE\\D port 0 < of IDE\\D\n"
        "...5 IDE\\D < 'name of IDE\\D' 'class of IDE\\D' 77\n"
        ".3 IDE\\E < of IDE\\E\n"},
       {"the same node twice: what hangs below the second is lost",
-       {Record(u"PCI\\C", {Record(u"H", {Record(u"D"), Record(u"D"), Record(u"E")}),
-                           Record(u"H", {Record(u"F")})}),
+       {Record(u"PCI\\C", {Record(u"H", {Record(u"D"), Record(u"D"), Record(u"E")}), Record(u"H", {Record(u"F")})}),
         Record(u"PCI\\C", {Record(u"G")})},
        "2 PCI\\C < of PCI\\C\n"
        ".3 H < of H\n"

@@ -74,13 +74,11 @@ TEST_F(HubQueries, EachNameTakesTwoRequestsOfItsOwnShape) {
   EXPECT_EQ(GetConnectionDriverKeyName(m_log, m_root, 1), u"{usb}\\0004");
   EXPECT_EQ(GetConnectionName(m_log, m_root, 2), u"USB#HUB#2");
   // 4 or 8 bytes of head, the characters and their zero. The root hub's name takes nothing in.
-  EXPECT_THAT(
-      Log(m_log),
-      ElementsAre(
-          "DeviceControl #1 0x220424 in 6 out 6", "DeviceControl #1 0x220424 in 26 out 26",
-          "DeviceControl #1 0x220408 out 6", "DeviceControl #1 0x220408 out 120",
-          "DeviceControl #2 0x220420 in 10 out 10", "DeviceControl #2 0x220420 in 30 out 30",
-          "DeviceControl #2 0x220414 in 10 out 10", "DeviceControl #2 0x220414 in 28 out 28"));
+  EXPECT_THAT(Log(m_log),
+              ElementsAre("DeviceControl #1 0x220424 in 6 out 6", "DeviceControl #1 0x220424 in 26 out 26",
+                          "DeviceControl #1 0x220408 out 6", "DeviceControl #1 0x220408 out 120",
+                          "DeviceControl #2 0x220420 in 10 out 10", "DeviceControl #2 0x220420 in 30 out 30",
+                          "DeviceControl #2 0x220414 in 10 out 10", "DeviceControl #2 0x220414 in 28 out 28"));
 }
 
 constexpr std::uint32_t kGigabyte = 0x40000000;
@@ -116,8 +114,7 @@ TEST_F(HubQueries, ADriverThatLiesGivesNoNameOrAShorterOne) {
   for (const Query& query : queries) {
     const std::uint32_t head = query.head;
     const NameCase cases[] = {
-        {"nothing but the declared character", head + 2, u"", head + 2, query.testsSize ? 1u : 2u,
-         u""},
+        {"nothing but the declared character", head + 2, u"", head + 2, query.testsSize ? 1u : 2u, u""},
         {"one character and no zero", head + 4, u"ab", head + 4, 2, u"ab"},
         {"the second request fails", head + 8, u"abc", 0, 2, u""},
         {"fewer bytes than claimed", head + 400, u"abc", head + 6, 2, u"abc"},
@@ -131,9 +128,8 @@ TEST_F(HubQueries, ADriverThatLiesGivesNoNameOrAShorterOne) {
       m_log.Clear();
       m_driver.Next(query.code, NameAnswer(head, c.claimed, u"", head + 2));
       if (c.requests == 2) {
-        m_driver.Next(query.code, c.received == 0
-                                      ? ScriptedDriver::Answer(RefuseRequest)
-                                      : NameAnswer(head, c.claimed, c.text, c.received));
+        m_driver.Next(query.code, c.received == 0 ? ScriptedDriver::Answer(RefuseRequest)
+                                                  : NameAnswer(head, c.claimed, c.text, c.received));
       }
       const bool hub = head == 8;
       const std::u16string name = query.ask(m_log, hub ? m_root : m_hcd);
@@ -153,8 +149,7 @@ TEST_F(HubQueries, ADriverThatLiesGivesNoNameOrAShorterOne) {
 TEST_F(HubQueries, ARootHubNameWithoutRoomIsAskedForAllTheSame) {
   m_driver.Next(platform::kIOCTL_USB_GET_ROOT_HUB_NAME, NameAnswer(4, 0, u"", 6));
   EXPECT_EQ(GetRootHubName(m_log, m_hcd), u"");
-  EXPECT_THAT(Log(m_log),
-              ElementsAre("DeviceControl #1 0x220408 out 6", "DeviceControl #1 0x220408 ! 122"));
+  EXPECT_THAT(Log(m_log), ElementsAre("DeviceControl #1 0x220408 out 6", "DeviceControl #1 0x220408 ! 122"));
 }
 
 TEST_F(HubQueries, NodeInformationGoesInAndOutOfOneBuffer) {
@@ -187,8 +182,8 @@ TEST_F(HubQueries, ConnectionRecordsAreFilledFromTheOlderRequest) {
   EXPECT_EQ(+record.Info.NumberOfOpenPipes, 2u);
   EXPECT_EQ(+record.Info.Speed, platform::UsbLowSpeed);
   EXPECT_EQ(+record.PipeList[29].ScheduleOffset, 99u);
-  EXPECT_THAT(Log(m_log), ElementsAre("DeviceControl #2 0x220448 in 365 out 365",
-                                      "DeviceControl #2 0x22040C in 365 out 365"));
+  EXPECT_THAT(Log(m_log),
+              ElementsAre("DeviceControl #2 0x220448 in 365 out 365", "DeviceControl #2 0x22040C in 365 out 365"));
   m_driver.Next(platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, RefuseRequest);
   ConnectionRecord unfilled;
   EXPECT_FALSE(GetConnectionInformation(m_log, m_root, 1, unfilled));
@@ -208,8 +203,7 @@ TEST(ControllerIdentity, EachMissingPartEndsIt) {
   };
   const Case cases[] = {
       {"complete", [](Machine&) {}, true, kControllerId, 5, u"EHCI Controller"},
-      {"no device with that driver key", [](Machine& m) { m.devices[1].driver = u"{usb}\\0099"; },
-       false, u"", 0, u""},
+      {"no device with that driver key", [](Machine& m) { m.devices[1].driver = u"{usb}\\0099"; }, false, u"", 0, u""},
       {"no PCI device",
        [](Machine& m) {
          m.devices[1].id = u"ROOT\\USB\\0000";
@@ -222,12 +216,10 @@ TEST(ControllerIdentity, EachMissingPartEndsIt) {
          m.devices[2].parent = m.devices[1].id;
        },
        false, u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086\\1", 0, u""},
-      {"no description", [](Machine& m) { m.devices[1].description.reset(); }, false, kControllerId,
-       5, u""},
-      {"an empty description", [](Machine& m) { m.devices[1].description = u""; }, false,
-       kControllerId, 5, u""},
-      {"no root hub", [](Machine& m) { m.hostControllers[0].rootHub.reset(); }, false,
-       kControllerId, 5, u"EHCI Controller"},
+      {"no description", [](Machine& m) { m.devices[1].description.reset(); }, false, kControllerId, 5, u""},
+      {"an empty description", [](Machine& m) { m.devices[1].description = u""; }, false, kControllerId, 5, u""},
+      {"no root hub", [](Machine& m) { m.hostControllers[0].rootHub.reset(); }, false, kControllerId, 5,
+       u"EHCI Controller"},
   };
   for (const Case& c : cases) {
     Machine machine = OneController(1);

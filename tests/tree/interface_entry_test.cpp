@@ -46,10 +46,10 @@ TEST(MakeInterfaceEntries, TakesWholeInterfacesAndOwnsThem) {
   strings.StringDescriptor = {4, 3, 'x', 0};
   std::vector<InterfaceEntryPtr> entries;
   {
-    const Bytes data = {9,  4, 0, 0, 0, 0, 0, 0, 8,        // taken
-                        11, 4, 1, 0, 0, 0, 0, 0, 9, 1, 2,  // taken, no string
+    const Bytes data = {9,  4, 0, 0, 0, 0, 0, 0, 8,                                // taken
+                        11, 4, 1, 0, 0, 0, 0, 0, 9, 1, 2,                          // taken, no string
                         10, 4, 2, 0, 0, 0, 0, 0, 8, 0, 9, 5, 3, 0, 0, 0, 0, 0, 8,  // neither
-                        9,  4, 4, 0, 0, 0, 0, 0};  // a byte is missing
+                        9,  4, 4, 0, 0, 0, 0, 0};                                  // a byte is missing
     entries = MakeInterfaceEntries(SplitConfiguration(data), &strings);
   }
   ASSERT_EQ(entries.size(), 2u);

@@ -28,8 +28,7 @@ std::unique_ptr<ConnectionRecord> Connection(std::uint32_t status) {
   return record;
 }
 
-void AddString(std::unique_ptr<StringDescriptorNode>& head, std::uint8_t index,
-               const std::u16string& text) {
+void AddString(std::unique_ptr<StringDescriptorNode>& head, std::uint8_t index, const std::u16string& text) {
   auto node = std::make_unique<StringDescriptorNode>();
   node->DescriptorIndex = index;
   node->LanguageID = 0x0409;
@@ -83,15 +82,12 @@ TEST(PortDevice, TakesItsIdentityFromRecordAndStrings) {
   const Case cases[] = {
       {"nothing", false, false, u"", kUnknownId, kUnknownId, u"", u""},
       {"the id alone", false, true, u"USB\\VID_046D&PID_C52B\\7", 0x46D, 0xC52B, u"7", u""},
-      {"the record over the id", true, false, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"7",
-       u""},
-      {"the strings over the id", true, true, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"AA01",
-       u"SanDisk"},
+      {"the record over the id", true, false, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"7", u""},
+      {"the strings over the id", true, true, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"AA01", u"SanDisk"},
   };
   for (const Case& c : cases) {
-    const auto device =
-        MakeRecord<CZKUMPortDeviceImpl>(5u, c.record ? Connection(1) : nullptr, nullptr,
-                                        c.strings ? Strings() : nullptr, u"key", u"descr", c.id);
+    const auto device = MakeRecord<CZKUMPortDeviceImpl>(5u, c.record ? Connection(1) : nullptr, nullptr,
+                                                        c.strings ? Strings() : nullptr, u"key", u"descr", c.id);
     EXPECT_EQ(device->m_nType, KUDTPortDevice) << c.what;
     EXPECT_EQ(device->m_devInstHandle, 5u) << c.what;
     EXPECT_EQ(device->m_strDriverKeyName, u"key") << c.what;
@@ -114,17 +110,16 @@ TEST(PortDevice, WithoutConnectionOnlyItsNeighboursAreDumped) {
       "childvector size0\r\nChildsToString End\r\n"
       "childvector size0\r\nChildsToString End\r\n";
   for (auto* record : {static_cast<ConnectionRecord*>(nullptr), Connection(0).release()}) {
-    const auto device = MakeRecord<CZKUMPortDeviceImpl>(
-        1u, std::unique_ptr<ConnectionRecord>(record), nullptr, nullptr, u"k", u"d", u"i");
+    const auto device = MakeRecord<CZKUMPortDeviceImpl>(1u, std::unique_ptr<ConnectionRecord>(record), nullptr, nullptr,
+                                                        u"k", u"d", u"i");
     device->m_infoDevice = info;
     EXPECT_EQ(Dump(*device, u"x "), rest);
   }
 }
 
 TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
-  const auto device =
-      MakeRecord<CZKUMPortDeviceImpl>(6u, Connection(1), Configuration(), Strings(), u"key",
-                                      u"USB Mass Storage Device", u"USB\\VID_0781&PID_5580\\AA01");
+  const auto device = MakeRecord<CZKUMPortDeviceImpl>(6u, Connection(1), Configuration(), Strings(), u"key",
+                                                      u"USB Mass Storage Device", u"USB\\VID_0781&PID_5580\\AA01");
   EXPECT_EQ(device->NumberInterfaces(), 1);
   ASSERT_EQ(device->m_interfaceDescrs.size(), 1u);
   EXPECT_EQ(Dump(*device, u"> "),
@@ -195,8 +190,7 @@ TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
 TEST(PortDevice, AVendorWithoutNameIsPrintedAsNull) {
   auto record = Connection(1);
   record->Info.DeviceDescriptor.idVendor = 0xFFFF;
-  const auto device =
-      MakeRecord<CZKUMPortDeviceImpl>(0u, std::move(record), nullptr, nullptr, u"", u"", u"");
+  const auto device = MakeRecord<CZKUMPortDeviceImpl>(0u, std::move(record), nullptr, nullptr, u"", u"", u"");
   EXPECT_NE(Dump(*device, u"").find("idVendor      : 0xFFFF (null)\r\n"), std::string::npos);
 }
 

@@ -35,6 +35,7 @@ using testing_support::Machine;
 using testing_support::OneController;
 using testing_support::RefuseRequest;
 using testing_support::ScriptedDriver;
+using testing_support::Text;
 
 // One line a node: kind, what tells it apart, and its depth in dots.
 void Outline(const NodePtr& node, const std::string& dots, std::string& out) {
@@ -45,18 +46,15 @@ void Outline(const NodePtr& node, const std::string& dots, std::string& out) {
              platform::ToUtf8(static_cast<const CZKUMHostControllerImpl&>(*node).m_strLeafName);
       break;
     case KUDTHub:
-      out += "hub " + platform::ToUtf8(node->m_strDevInstId) + " '" +
-             platform::ToUtf8(node->m_strDeviceDescr) + "'";
+      out += "hub " + platform::ToUtf8(node->m_strDevInstId) + " '" + platform::ToUtf8(node->m_strDeviceDescr) + "'";
       break;
     case KUDTHubPort:
-      out += "port status " +
-             std::to_string(static_cast<const CZKUMHubPortImpl&>(*node).m_nStatus) + " " +
+      out += "port status " + std::to_string(static_cast<const CZKUMHubPortImpl&>(*node).m_nStatus) + " " +
              platform::ToUtf8(node->m_strDevInstId);
       break;
     case KUDTPortDevice:
-      out += "device " + platform::ToUtf8(node->m_strDevInstId) + " '" +
-             platform::ToUtf8(node->m_strDeviceDescr) + "' speed " +
-             std::to_string(static_cast<const CZKUMPortDeviceImpl&>(*node).Speed());
+      out += "device " + platform::ToUtf8(node->m_strDevInstId) + " '" + platform::ToUtf8(node->m_strDeviceDescr) +
+             "' speed " + std::to_string(static_cast<const CZKUMPortDeviceImpl&>(*node).Speed());
       break;
     default:
       out += platform::ToUtf8(node->m_strDevInstId);
@@ -75,10 +73,10 @@ std::string OutlineOf(const NodePtr& root) {
 // ports with a device of unknown driver key.
 Machine Busy() {
   Machine machine = OneController(5);
-  machine.devices.push_back(DeviceNode(u"USB\\VID_046D&PID_C52B\\7", u"USB\\ROOT_HUB20\\4&1",
-                                       u"HIDClass", u"{usb}\\0004", u"Mouse"));
-  machine.devices.push_back(DeviceNode(u"USB\\VID_05E3&PID_0610\\2", u"USB\\ROOT_HUB20\\4&1",
-                                       u"USB", u"{usb}\\0005", u"Generic Hub"));
+  machine.devices.push_back(
+      DeviceNode(u"USB\\VID_046D&PID_C52B\\7", u"USB\\ROOT_HUB20\\4&1", u"HIDClass", u"{usb}\\0004", u"Mouse"));
+  machine.devices.push_back(
+      DeviceNode(u"USB\\VID_05E3&PID_0610\\2", u"USB\\ROOT_HUB20\\4&1", u"USB", u"{usb}\\0005", u"Generic Hub"));
   auto& ports = machine.hubs[0].ports;
   ports[0] = DevicePort(u"{USB}\\0004", 0x046D, 0xC52B);
   ports[0].speed = platform::simulated::Speed::Low;
@@ -136,8 +134,7 @@ TEST(Walk, RequestsOfAPortGoInOrder) {
   walker.StartWalk();
   std::string requests;
   for (const std::u16string& line : log.Log()) {
-    if (line.starts_with(u"OpenDevice") || line.starts_with(u"DeviceControl") ||
-        line.starts_with(u"CloseDevice")) {
+    if (line.starts_with(u"OpenDevice") || line.starts_with(u"DeviceControl") || line.starts_with(u"CloseDevice")) {
       requests += platform::ToUtf8(line) + "\n";
     }
   }
@@ -179,9 +176,7 @@ TEST(Walk, SourcesOfControllers) {
   };
   const Case cases[] = {
       {"none", [](Machine& m) { m.hostControllers.clear(); }, {}},
-      {"a number above nine",
-       [](Machine& m) { m.hostControllers[0].names = {u"\\\\.\\HCD10"}; },
-       {}},
+      {"a number above nine", [](Machine& m) { m.hostControllers[0].names = {u"\\\\.\\HCD10"}; }, {}},
       {"two names for one controller",
        [](Machine& m) {
          m.hostControllers[0].names = {u"\\\\.\\HCD3", u"\\\\.\\HCD7"};
@@ -212,9 +207,7 @@ TEST(Walk, SourcesOfControllers) {
          m.devices[2].parent = m.devices[1].id;
        },
        {"\\\\.\\HCD0 without hub"}},
-      {"one whose root hub does not open",
-       [](Machine& m) { m.hubs.clear(); },
-       {"\\\\.\\HCD0 without hub"}},
+      {"one whose root hub does not open", [](Machine& m) { m.hubs.clear(); }, {"\\\\.\\HCD0 without hub"}},
       {"two that fail before their ids are read look the same, and one is in the tree",
        [](Machine& m) {
          m.hostControllers[0].driverKey = u"{usb}\\0091";
@@ -232,8 +225,7 @@ TEST(Walk, SourcesOfControllers) {
     std::vector<std::string> found;
     for (const NodePtr& node : walker.m_building->m_childs) {
       const auto& controller = static_cast<const CZKUMHostControllerImpl&>(*node);
-      found.push_back(platform::ToUtf8(controller.m_strLeafName) +
-                      (controller.m_childs.empty() ? " without hub" : ""));
+      found.push_back(platform::ToUtf8(controller.m_strLeafName) + (controller.m_childs.empty() ? " without hub" : ""));
     }
     EXPECT_EQ(found, c.leafNames) << c.what;
     EXPECT_EQ(pc.Open(), OpenCounts{}) << c.what;
@@ -255,33 +247,28 @@ TEST(Walk, PortsThatFailCostThemselvesAlone) {
     std::uint32_t code;
     std::uint32_t failingPort;
     const char* outline;  // of the root hub's ports 4 and 5
-    std::size_t freedRecords;
   };
   const Case cases[] = {
       {"probe", platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX, 5,
        "...port status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  '' speed 1\n"
-       "...port status 0 USB\\ROOT_HUB20\\4&1 port 5\n",
-       0},
+       "...port status 0 USB\\ROOT_HUB20\\4&1 port 5\n"},
       {"older request", platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, 5,
-       "...port status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  '' speed 1\n", 0},
+       "...port status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  '' speed 1\n"},
       {"driver key", platform::kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME, 5,
        "...port status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  '' speed 1\n"
        "...port status 1 USB\\ROOT_HUB20\\4&1 port 5\n"
        "....hub USB\\VID_05E3&PID_0610\\2 ''\n"
        ".....port status 0 USB\\VID_05E3&PID_0610\\2 port 1\n"
        ".....port status 1 USB\\VID_05E3&PID_0610\\2 port 2\n"
-       "......device  '' speed 1\n",
-       0},
+       "......device  '' speed 1\n"},
       {"hub name", platform::kIOCTL_USB_GET_NODE_CONNECTION_NAME, 5,
        "...port status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  '' speed 1\n"
-       "...port status 0 USB\\ROOT_HUB20\\4&1 port 5\n",
-       1},
+       "...port status 0 USB\\ROOT_HUB20\\4&1 port 5\n"},
   };
   for (const Case& c : cases) {
     SimulatedPc pc(Busy());
     ScriptedDriver driver(pc);
-    driver.Always(c.code, [&c](const void* in, std::uint32_t, void*, std::uint32_t,
-                               std::uint32_t&) {
+    driver.Always(c.code, [&c](const void* in, std::uint32_t, void*, std::uint32_t, std::uint32_t&) {
       const std::uint32_t port = *static_cast<const std::uint32_t*>(in);
       return port == c.failingPort ? platform::Status::Failure(31) : platform::Status::Success();
     });
@@ -323,8 +310,7 @@ TEST(Walk, AHubThatDoesNotBuildLeavesItsPortEmptyAndItsRecordFreed) {
     const std::size_t live = ConnectionRecord::LiveCount();
     CZKUMTopologyWalker walker(pc);
     walker.StartWalk();
-    EXPECT_THAT(OutlineOf(walker.m_building),
-                testing::EndsWith("...port status 0 USB\\ROOT_HUB20\\4&1 port 5\n"))
+    EXPECT_THAT(OutlineOf(walker.m_building), testing::EndsWith("...port status 0 USB\\ROOT_HUB20\\4&1 port 5\n"))
         << c.what;
     EXPECT_EQ(walker.m_nConnectedHubs, 1u) << c.what;
     EXPECT_EQ(ConnectionRecord::LiveCount() - live, 3u) << c.what;
@@ -338,8 +324,7 @@ TEST(Walk, ChainsOfHubsHaveNoLimit) {
   Machine machine = OneController(1);
   machine.hubs[0].ports[0] = HubOnPort(u"{k}\\0", u"hub 1");
   for (std::size_t depth = 1; depth < kDepth; ++depth) {
-    machine.hubs.push_back(
-        {u"hub " + platform::Decimal(static_cast<std::int32_t>(depth)), {}, false});
+    machine.hubs.push_back({u"hub " + platform::Decimal(static_cast<std::int32_t>(depth)), {}, false});
     machine.hubs.back().ports.push_back(
         HubOnPort(u"{k}\\0", u"hub " + platform::Decimal(static_cast<std::int32_t>(depth + 1))));
   }
@@ -352,6 +337,33 @@ TEST(Walk, ChainsOfHubsHaveNoLimit) {
     return true;
   });
   EXPECT_EQ(hubs, kDepth);
+}
+
+// A driver that names its hubs on every port would otherwise make the walk grow with each of them.
+TEST(Walk, AHubIsWalkedOnce) {
+  constexpr std::size_t kHubs = 12;
+  Machine machine = OneController(kHubs);
+  for (std::size_t hub = 0; hub < kHubs; ++hub) {
+    const Text name = u"hub " + platform::Decimal(static_cast<std::int32_t>(hub));
+    machine.hubs.push_back({name, {}, false});
+  }
+  for (auto& hub : machine.hubs) {
+    hub.ports.clear();
+    for (std::size_t port = 1; port <= kHubs; ++port) {
+      hub.ports.push_back(HubOnPort(u"{k}\\0", machine.hubs[port].name));
+    }
+  }
+  SimulatedPc pc(machine);
+  CountingHost host(pc);
+  CZKUMTopologyWalker walker(host);
+  walker.StartWalk();
+  std::size_t hubs = 0;
+  VisitPreOrder(walker.m_building, [&](const NodePtr& node) {
+    hubs += node->m_nType == KUDTHub ? 1 : 0;
+    return true;
+  });
+  EXPECT_EQ(hubs, kHubs + 1);
+  EXPECT_EQ(host.Count(Operation::OpenDevice), 10 + hubs);
 }
 
 // Fails every call in turn, once and from then on.
@@ -373,10 +385,8 @@ TEST(Walk, AnyCallMayFail) {
         walker.StartWalk();
         ASSERT_NE(walker.m_building, nullptr);
         VisitPreOrder(walker.m_building, [&](const NodePtr& node) {
-          hubsWithRecord += node->m_nType == KUDTHub &&
-                                    static_cast<CZKUMHubDeviceImpl&>(*node).m_bHasConnectionInfo
-                                ? 1
-                                : 0;
+          hubsWithRecord +=
+              node->m_nType == KUDTHub && static_cast<CZKUMHubDeviceImpl&>(*node).m_bHasConnectionInfo ? 1 : 0;
           return true;
         });
       }

@@ -17,37 +17,18 @@ namespace {
 
 using platform::simulated::Dismount;
 using platform::simulated::Mount;
-using platform::simulated::SimulatedPc;
-using platform::simulated::Unplug;
 using testing::HasSubstr;
 using testing::Not;
-using testing_support::BarePc;
-using testing_support::CardReader;
-using testing_support::Change;
-using testing_support::DiskId;
-using testing_support::ExternalHub;
-using testing_support::Gadget;
-using testing_support::HubName;
-using testing_support::InternalDisk;
-using testing_support::kNewHubService;
-using testing_support::kRootHubId;
-using testing_support::Machine;
-using testing_support::Plug;
-using testing_support::StepOf;
-using testing_support::Stick;
-using testing_support::UsbId;
-using testing_support::Volume;
-using testing_support::VolumeId;
 
 Change Out(const std::u16string& id) { return Unplug{id}; }
 Change NodeOnly(const std::u16string& serial, const std::u16string& parent = kRootHubId) {
   Plug plug;
-  testing_support::AddNode(plug, UsbId(serial), parent, u"HIDClass", u"HidUsb");
+  AddNode(plug, UsbId(serial), parent, u"HIDClass", u"HidUsb");
   return plug;
 }
 Change PortOnly(const std::u16string& serial, std::uint32_t port) {
   Plug plug;
-  testing_support::AddPort(plug, UsbId(serial), kRootHubId, port);
+  AddPort(plug, UsbId(serial), kRootHubId, port);
   return plug;
 }
 
@@ -128,9 +109,7 @@ void Play(const Story& story) {
 }
 
 // A mouse, a stick and a card reader with two empty slots, beside an internal disk.
-std::vector<Change> Usual() {
-  return {InternalDisk(), Gadget(u"M1", 1), Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)};
-}
+std::vector<Change> Usual() { return {InternalDisk(), Gadget(u"M1", 1), Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)}; }
 const char kUsual[] = "M1 S1 CR | M1 S1 CR | - | -";
 
 // The list of modified devices repeats every device with a volume or an empty slot that is not
@@ -198,10 +177,10 @@ TEST(Builds, ParentsOfWhatLeftComeBack) {
         {{}, "same"},
         {{Volume(DiskId(u"CR"), u'G')}, "M1 S1 CR | - | - | S1 CR CR"},
         {{}, "same"}}},
+      // Records of hubs have the ids of hubs of the tree, which nothing joins.
       {"a stick below hubs that are devices themselves",
        BarePc(kNewHubService),
-       {ExternalHub(u"HUB", 1, kNewHubService), Gadget(u"K1", 1, UsbId(u"HUB")),
-        Stick(u"S3", 2, u'E', UsbId(u"HUB"))},
+       {ExternalHub(u"HUB", 1, kNewHubService), Gadget(u"K1", 1, UsbId(u"HUB")), Stick(u"S3", 2, u'E', UsbId(u"HUB"))},
        {{{}, "K1 S3 | K1 S3 | - | -"},
         {{Out(UsbId(u"S3"))}, "K1 | - | S3 | -"},
         {{}, "K1 | - | - | -"},
@@ -282,9 +261,11 @@ TEST(Builds, APublishedTreeShowsTheCardThatIsThere) {
   desk.Do({Out(VolumeId(DiskId(u"CR")))});
   desk.Build();
   EXPECT_THAT(desk.Dump(), Not(HasSubstr("of F:")));
-  // What is reported as removed still tells what left.
-  EXPECT_THAT(platform::ToUtf8(DumpOf(desk.builder.GetDeviceList(kRemovedList)->at(0))),
-              HasSubstr("devMountPoint   : F:\\\r\n"));
+  // What is reported as removed still tells what left, and hangs in the tree before.
+  const NodePtr removed = desk.builder.GetDeviceList(kRemovedList)->at(0);
+  EXPECT_THAT(platform::ToUtf8(DumpOf(removed)), HasSubstr("devMountPoint   : F:\\\r\n"));
+  const NodePtr& info = static_cast<const CZKUMPortDeviceImpl&>(*removed).m_infoDevice;
+  EXPECT_EQ(info->m_pParent, static_cast<CZKUMUsbTreeNodeImpl*>(removed->m_pParent));
   desk.Build();
   desk.Do({Volume(DiskId(u"CR"), u'G')});
   EXPECT_EQ(desk.Build(), "M1 S1 CR | - | - | S1 CR CR");
@@ -332,8 +313,7 @@ TEST(Builds, RecordsSharedBetweenTreesLeaveNoLinkBehind) {
   EXPECT_EQ(desk.Build(), "same");
   desk.Do({Gadget(u"M2", 3)});
   EXPECT_EQ(desk.Build(), "S1 M1 M2 | M2 | - | S1");
-  const auto& stick =
-      static_cast<const CZKUMPortDeviceImpl&>(*FindByInstanceId(desk.builder.Root(), UsbId(u"S1")));
+  const auto& stick = static_cast<const CZKUMPortDeviceImpl&>(*FindByInstanceId(desk.builder.Root(), UsbId(u"S1")));
   EXPECT_EQ(stick.m_infoDevice, static_cast<CZKUMPortDeviceImpl&>(*removed).m_infoDevice);
   for (NodePtr* each : {&first, &second}) {
     EXPECT_GT(ClimbFromEverywhere(*each), 0u);

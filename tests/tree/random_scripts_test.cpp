@@ -1,0 +1,251 @@
+// Random scripts over a small PC: what a build publishes is what is there, and what it reports is
+// what changed.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <iostream>
+#include <map>
+#include <set>
+#include <string>
+
+#include "devinfo/interface_device.h"
+#include "platform/text.h"
+#include "tests/support/machines.h"
+#include "tests/support/random_pc.h"
+#include "tree/records.h"
+#include "tree/tree_builder.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::ToUtf8;
+using testing_support::Gadget;
+using testing_support::Kind;
+using testing_support::RandomPc;
+
+constexpr int kScripts = 500;
+constexpr int kChangesPerScript = 14;
+// A held parent returns one level per build: a slot with the first, its reader with the second.
+constexpr int kBuildsUntilHeldAreBack = 2;
+
+std::uint32_t FirstSeed() {
+  const char* seed = std::getenv("ZKUSB_RANDOM_SEED");
+  return seed == nullptr ? 20'240'615u
+                         : static_cast<std::uint32_t>(std::strtoul(seed, nullptr, 10));
+}
+
+// Port devices by instance id, each with where it is plugged in and the volumes below it.
+struct Seen {
+  std::string port;
+  std::set<std::string> volumes;  // the name, then the paths in their order
+  friend bool operator==(const Seen&, const Seen&) = default;
+};
+using Picture = std::map<std::string, Seen>;
+using Ids = std::set<std::string>;
+
+void PrintTo(const Seen& seen, std::ostream* out) {
+  *out << seen.port << " " << testing::PrintToString(seen.volumes);
+}
+
+std::string VolumeText(const std::u16string& name, std::vector<std::u16string> paths) {
+  std::ranges::sort(paths);
+  std::string text = ToUtf8(name);
+  for (const std::u16string& path : paths) text += " " + ToUtf8(path);
+  return text;
+}
+
+std::string PortText(const std::u16string& hub, std::uint32_t port) {
+  return ToUtf8(hub) + ":" + std::to_string(port);
+}
+
+Picture PictureOfPc(const platform::simulated::Machine& machine, const RandomPc& pc) {
+  Picture picture;
+  for (const auto& hub : machine.hubs) {
+    for (std::uint32_t i = 0; i < hub.ports.size(); ++i) {
+      const auto device = std::ranges::find_if(machine.devices, [&](const auto& candidate) {
+        return hub.ports[i].driverKey && candidate.driver == hub.ports[i].driverKey;
+      });
+      if (device == machine.devices.end() || hub.ports[i].isHub) continue;
+      picture[ToUtf8(device->id)].port = PortText(hub.name, i + 1);
+    }
+  }
+  for (const auto& volume : machine.volumes) {
+    for (const Gadget& gadget : pc.Plugged()) {
+      for (const auto& disk : gadget.disks) {
+        if (std::ranges::find(disk, volume.name) == disk.end()) continue;
+        picture[ToUtf8(gadget.id)].volumes.insert(VolumeText(volume.name, volume.paths));
+      }
+    }
+  }
+  return picture;
+}
+
+Picture PictureOfTree(const NodePtr& root) {
+  Picture picture;
+  VisitPreOrder(root, [&](const NodePtr& node) {
+    if (node->m_nType != KUDTPortDevice) return true;
+    const auto& port = static_cast<const CZKUMHubPortImpl&>(*node->m_pParent);
+    const auto& hub = static_cast<const CZKUMHubDeviceImpl&>(*port.m_pParent);
+    const auto [place, fresh] = picture.try_emplace(ToUtf8(node->m_strDevInstId));
+    EXPECT_TRUE(fresh) << place->first << " is in the tree twice";
+    place->second.port = PortText(hub.m_strPathName.substr(4), port.m_nPortIndex);
+    VisitPreOrder(node, [&](const NodePtr& below) {
+      if (below->m_nType != KUDTInterfaceDevice) return true;
+      const auto& device = static_cast<const CZKUMInterfaceDeviceImpl&>(*below);
+      if (device.VolumeName.empty()) return true;  // the disk of an empty slot
+      const std::string text = VolumeText(device.VolumeName, device.MountPoints);
+      EXPECT_TRUE(place->second.volumes.insert(text).second) << text << " is in the tree twice";
+      return true;
+    });
+    return true;
+  });
+  return picture;
+}
+
+class Watcher {
+ public:
+  explicit Watcher(std::uint32_t seed) : m_pc(seed), m_builder(m_pc.Pc()) {}
+
+  RandomPc& Pc() { return m_pc; }
+  int Publications() const { return m_publications; }
+  const Ids& Ever() const { return m_ever; }
+
+  void Build() {
+    NoteEmptiedSlots();
+    if (m_builder.Build()) {
+      ++m_publications;
+      CheckLists();
+      CheckTree();
+    }
+    m_builder.CommitDeviceCache();
+  }
+
+  // With nothing going on, every device is connected that has a way to be.
+  void CheckAtRest() {
+    for (int i = 0; i < kBuildsUntilHeldAreBack; ++i) Build();
+    for (const Gadget& gadget : m_pc.Plugged()) {
+      if (IsReported(gadget) && !CannotReturn(gadget)) {
+        EXPECT_TRUE(m_connected.contains(ToUtf8(gadget.id))) << ToUtf8(gadget.id);
+      }
+    }
+  }
+
+ private:
+  // Exception: a device whose own node is left out by its service has no info device. It is in the
+  // tree and never in a list of arrivals; hubs are in no list at all.
+  static bool IsReported(const Gadget& gadget) {
+    return gadget.kind != Kind::Unreported && gadget.kind != Kind::Hub;
+  }
+
+  // Exception: a card that is taken out takes its slot and the reader along, which are reported as
+  // removed and held back until they have a child again.
+  bool MayBeHeld(const Gadget& gadget) const {
+    return gadget.kind == Kind::CardReader && m_lostACard.contains(ToUtf8(gadget.id));
+  }
+
+  // Exception: a reader all of whose slots were emptied has no child that could bring it back.
+  bool CannotReturn(const Gadget& gadget) const {
+    if (!MayBeHeld(gadget)) return false;
+    for (std::size_t slot = 0; slot < gadget.disks.size(); ++slot) {
+      const bool empty = gadget.disks[slot].empty();
+      if (!empty || !m_emptied.contains(DiskId(gadget, slot))) return false;
+    }
+    return true;
+  }
+
+  void NoteEmptiedSlots() {
+    for (const Gadget& gadget : m_pc.Plugged()) {
+      if (gadget.kind != Kind::CardReader) continue;
+      for (std::size_t slot = 0; slot < gadget.disks.size(); ++slot) {
+        const auto id = DiskId(gadget, slot);
+        std::u16string card = gadget.disks[slot].empty() ? u"" : gadget.disks[slot][0];
+        std::u16string& before = m_cards[id];
+        if (!before.empty() && before != card) {
+          m_lostACard.insert(ToUtf8(gadget.id));
+          m_emptied.insert(id);
+        }
+        if (!card.empty()) m_emptied.erase(id);
+        before = std::move(card);
+      }
+    }
+  }
+
+  Ids ListOf(DeviceListKind kind) const {
+    Ids ids;
+    for (const NodePtr& node : *m_builder.GetDeviceList(kind)) {
+      ids.insert(ToUtf8(node->m_strDevInstId));
+    }
+    return ids;
+  }
+
+  // What was connected, with those that came and without those that left, is connected now.
+  void CheckLists() {
+    Ids expected = m_connected;
+    const Ids attached = ListOf(kAttachedList);
+    expected.insert(attached.begin(), attached.end());
+    for (const std::string& id : ListOf(kRemovedList)) expected.erase(id);
+    m_connected = ListOf(kConnectedList);
+    EXPECT_EQ(m_connected, expected);
+    m_ever.insert(m_connected.begin(), m_connected.end());
+  }
+
+  // Exception: a held reader may return and be held again in one build. It is reported as both, in
+  // this order, and shows what it had when it was held the first time.
+  bool CameAndLeft(const std::string& id) const {
+    return ListOf(kAttachedList).contains(id) && ListOf(kRemovedList).contains(id);
+  }
+
+  void CheckTree() {
+    Picture shown = PictureOfTree(m_builder.Root());
+    Picture expected = PictureOfPc(m_pc.Pc().Snapshot(), m_pc);
+    Ids reported;
+    for (auto& [id, seen] : expected) {
+      const Gadget& gadget = *m_pc.Find(platform::FromUtf8(id));
+      const bool held = MayBeHeld(gadget) && !m_connected.contains(id);
+      // Exception: without its info device nothing is merged into a port device, no volume either.
+      if (held) seen.volumes.clear();
+      if (held && CameAndLeft(id)) shown[id].volumes.clear();
+      if (IsReported(gadget) && !held) reported.insert(id);
+    }
+    EXPECT_EQ(shown, expected);
+    EXPECT_EQ(m_connected, reported);
+    std::erase_if(m_lostACard, [this](const std::string& id) { return m_connected.contains(id); });
+  }
+
+  RandomPc m_pc;
+  CZKUMUsbTreeBuilder m_builder;
+  Ids m_connected;
+  Ids m_ever;
+  Ids m_lostACard;
+  std::set<std::u16string> m_emptied;
+  std::map<std::u16string, std::u16string> m_cards;  // by slot, as the last build met them
+  int m_publications = 0;
+};
+
+TEST(RandomScripts, PublishWhatIsThereAndReportWhatChanged) {
+  const std::uint32_t firstSeed = FirstSeed();
+  std::cout << "ZKUSB_RANDOM_SEED=" << firstSeed << '\n';
+  int publications = 0;
+  std::size_t devices = 0;
+  for (std::uint32_t seed = firstSeed; seed < firstSeed + kScripts; ++seed) {
+    Watcher watcher(seed);
+    std::string script;
+    for (int i = 0; i < kChangesPerScript; ++i) {
+      script += "\n  " + watcher.Pc().Change();
+      // Most changes are met by a build of their own, some by one for several.
+      if (watcher.Pc().Below(4) == 0) continue;
+      script += " | build";
+      watcher.Build();
+    }
+    watcher.CheckAtRest();
+    publications += watcher.Publications();
+    devices += watcher.Ever().size();
+    ASSERT_FALSE(HasFailure()) << "seed " << seed << ":" << script;
+  }
+  EXPECT_GE(publications, 2000);
+  EXPECT_GE(devices, 1500u);
+}
+
+}  // namespace
+}  // namespace KelvoUHW
