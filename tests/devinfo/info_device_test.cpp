@@ -2,15 +2,15 @@
 
 #include <gtest/gtest.h>
 
-#include <tuple>
+#include <sstream>
 
 #include "devinfo/devnode.h"
+#include "platform/text.h"
 
 namespace KelvoUHW {
 namespace {
 
-// Every field set.
-void Fill(CZKUMInfoDeviceImpl& device) {
+void FillEveryField(CZKUMInfoDeviceImpl& device) {
   device.SetInstanceId(u"USBSTOR\\DISK&VEN_V&PROD_P\\S");
   device.m_strDeviceDescr = u"descr";
   device.m_strDriverKeyName = u"driver";
@@ -37,96 +37,55 @@ std::u16string Dump(const CZKUMInfoDeviceImpl& device) {
   return out;
 }
 
-constexpr char16_t kEmptyDump[] =
-    u">  Info ------------------------------------------\r\n"
-    u"> devInstHandle        : -1\r\n"
-    u"> devInstHandleParent  : -1\r\n"
-    u"> INTERFACE_TYPE: InterfaceTypeUndefined\r\n"
-    u"childvector size0\r\n"
-    u"ChildsToString End\r\n";
+// Of a record with nothing in it but what these lines show.
+std::u16string DumpWith(const std::u16string& classLine, const std::u16string& busType) {
+  return u">  Info ------------------------------------------\r\n> devInstHandle        : -1\r\n"
+         u"> devInstHandleParent  : -1\r\n" +
+         classLine + (busType.empty() ? u"" : u"> INTERFACE_TYPE: " + busType + u"\r\n") +
+         u"childvector size0\r\nChildsToString End\r\n";
+}
 
-TEST(InfoDevice, DumpsEveryField) {
+TEST(InfoDevice, DumpsEveryFieldAndResetLeavesThree) {
   CZKUMInfoDeviceImpl device;
-  Fill(device);
-  AddChild(NodePtr(new CZKUMInfoDeviceImpl), &device);
+  FillEveryField(device);
   // The class name decides about the first class line and is not in it: this is meant.
   EXPECT_EQ(Dump(device),
             u">  Info ------------------------------------------\r\n"
             u"> DevInstId            : USBSTOR\\DISK&VEN_V&PROD_P\\S\r\n"
-            u"> driverKeyName : driver\r\n"
-            u"> m_strDevInstIdParent : parent\r\n"
-            u"> deviceDescr : descr\r\n"
-            u"> serial number        : S\r\n"
-            u"> Vendor; product: V;P\r\n"
-            u"> devInstHandle        : 21\r\n"
-            u"> devInstHandleParent  : 22\r\n"
-            u"> SPDRP_CLASS: guid text\r\n"
-            u"> SPDRP_CLASS: {4D36E967-E325-11CE-BFC1-08002BE10318}\r\n"
-            u"> SPDRP_FRIENDLYNAME: friendly\r\n"
-            u"> SPDRP_MFG: mfg\r\n"
-            u"> INTERFACE_TYPE: TurboChannel\r\n"
-            u"> SPDRP_HARDWAREID: hardware\r\n"
-            u"> SPDRP_PHYSICAL_DEVICE_OBJECT_NAME: physical\r\n"
-            u"> SPDRP_SERVICE: service\r\n"
-            u"> SPDRP_ENUMERATOR_NAME: enum\r\n"
-            u"> SPDRP_LOCATION_INFORMATION: location\r\n"
-            u"> SPDRP_UI_NUMBER    : 0x1F\r\n"
-            u"childvector size0\r\n"
-            u"child 0\r\n"
-            u"> -  Info ------------------------------------------\r\n"
-            u"> - devInstHandle        : -1\r\n"
-            u"> - devInstHandleParent  : -1\r\n"
-            u"> - INTERFACE_TYPE: InterfaceTypeUndefined\r\n"
-            u"childvector size0\r\n"
-            u"ChildsToString End\r\n"
-            u"ChildsToString End\r\n");
-}
-
-TEST(InfoDevice, ClassLinesFollowTheNameAndTheGuid) {
-  const std::tuple<const char16_t*, platform::Guid, std::u16string> cases[] = {
-      {u"", {}, u""},
-      {u"Class", {}, u"> SPDRP_CLASS: text\r\n"},
-      {u"", {1, 0, 0, {}}, u"> SPDRP_CLASS: {00000001-0000-0000-0000-000000000000}\r\n"}};
-  for (const auto& [name, guid, lines] : cases) {
-    CZKUMInfoDeviceImpl device;
-    device.DevClass = name;
-    device.ClassGuidText = u"text";
-    device.ClassGuid = guid;
-    std::u16string expected = kEmptyDump;
-    expected.insert(expected.find(u"> INTERFACE"), lines);
-    EXPECT_EQ(Dump(device), expected);
-  }
-}
-
-TEST(InfoDevice, BusTypesReachOneTooFar) {
-  // The name of 17 is meant.
-  const std::pair<std::int32_t, std::u16string> cases[] = {
-      {-2, u""},       {-1, u"InterfaceTypeUndefined"}, {0, u"Internal"}, {5, u"PCIBus"},
-      {15, u"PNPBus"}, {16, u"MaximumInterfaceType"},   {17, u"usbhub"},  {18, u""}};
-  for (const auto& [value, name] : cases) {
-    CZKUMInfoDeviceImpl device;
-    device.LegacyBusType = value;
-    const std::u16string dump = Dump(device);
-    const std::size_t line = dump.find(u"> INTERFACE_TYPE: " + name + u"\r\n");
-    EXPECT_EQ(line != dump.npos, !name.empty()) << value;
-    EXPECT_EQ(dump.find(u"INTERFACE_TYPE") != dump.npos, !name.empty()) << value;
-  }
-}
-
-TEST(InfoDevice, ResetLeavesThreeFields) {
-  CZKUMInfoDeviceImpl device;
-  Fill(device);
+            u"> driverKeyName : driver\r\n> m_strDevInstIdParent : parent\r\n> deviceDescr : descr\r\n"
+            u"> serial number        : S\r\n> Vendor; product: V;P\r\n"
+            u"> devInstHandle        : 21\r\n> devInstHandleParent  : 22\r\n"
+            u"> SPDRP_CLASS: guid text\r\n> SPDRP_CLASS: {4D36E967-E325-11CE-BFC1-08002BE10318}\r\n"
+            u"> SPDRP_FRIENDLYNAME: friendly\r\n> SPDRP_MFG: mfg\r\n> INTERFACE_TYPE: TurboChannel\r\n"
+            u"> SPDRP_HARDWAREID: hardware\r\n> SPDRP_PHYSICAL_DEVICE_OBJECT_NAME: physical\r\n"
+            u"> SPDRP_SERVICE: service\r\n> SPDRP_ENUMERATOR_NAME: enum\r\n"
+            u"> SPDRP_LOCATION_INFORMATION: location\r\n> SPDRP_UI_NUMBER    : 0x1F\r\n"
+            u"childvector size0\r\nChildsToString End\r\n");
+  device.m_nVendorId = device.m_nProductId = 1;
   device.Reset();
-  EXPECT_EQ(device.m_strSerialNumber, u"S");
-  EXPECT_EQ(device.Location, u"location");
-  EXPECT_EQ(device.EnumName, u"enum");
+  EXPECT_TRUE(device.m_nVendorId == kUnknownId && device.m_nProductId == kUnknownId);
+  EXPECT_EQ(device.m_strSerialNumber + device.Location + device.EnumName, u"Slocationenum");
   device.m_strSerialNumber = device.Location = device.EnumName = u"";
-  EXPECT_EQ(Dump(device), kEmptyDump);
+  EXPECT_EQ(Dump(device), DumpWith(u"", u"InterfaceTypeUndefined"));
+}
 
-  device.SetInstanceId(u"USB\\VID_1&PID_2\\3");
-  device.Reset();
-  EXPECT_EQ(device.m_nVendorId, kUnknownId);
-  EXPECT_EQ(device.m_nProductId, kUnknownId);
+TEST(InfoDevice, ClassLinesAndBusTypes) {
+  CZKUMInfoDeviceImpl named, withGuid, onBus;
+  named.DevClass = u"Class";
+  named.ClassGuidText = withGuid.ClassGuidText = u"text";
+  withGuid.ClassGuid = {1, 0, 0, {}};
+  const std::u16string undefined = u"InterfaceTypeUndefined";
+  EXPECT_EQ(Dump(named), DumpWith(u"> SPDRP_CLASS: text\r\n", undefined));
+  EXPECT_EQ(Dump(withGuid), DumpWith(u"> SPDRP_CLASS: {00000001-0000-0000-0000-000000000000}\r\n", undefined));
+  // That names reach one too far, to 17, is meant, and so is the name of 17.
+  std::istringstream names(
+      "InterfaceTypeUndefined Internal Isa Eisa MicroChannel TurboChannel PCIBus VMEBus NuBus PCMCIABus CBus MPIBus "
+      "MPSABus ProcessorInternal InternalPowerBus PNPISABus PNPBus MaximumInterfaceType usbhub");
+  for (onBus.LegacyBusType = -2; onBus.LegacyBusType <= 18; ++onBus.LegacyBusType) {
+    std::string name;
+    if (onBus.LegacyBusType >= -1) names >> name;
+    EXPECT_EQ(Dump(onBus), DumpWith(u"", platform::FromUtf8(name))) << onBus.LegacyBusType;
+  }
 }
 
 }  // namespace

@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
-#include <filesystem>
 #include <fstream>
 #include <iterator>
 
@@ -42,10 +41,8 @@ TEST(ScriptFile, ReadsEveryKindOfStep) {
   EXPECT_EQ(script[0].name, u"in");
   const auto& plug = std::get<Plug>(script[0].change);
   ASSERT_EQ(plug.ports.size(), 1u);
-  EXPECT_EQ(plug.ports[0].hub, u"usb#hub#1");
-  EXPECT_EQ(plug.ports[0].index, 2u);
-  EXPECT_EQ(plug.ports[0].port.status, 1u);
-  EXPECT_EQ(plug.ports[0].port.speed, Speed::High);
+  const auto& [hub, index, port] = plug.ports[0];
+  EXPECT_TRUE(hub == u"usb#hub#1" && index == 2 && port.status == 1 && port.speed == Speed::High);
   EXPECT_EQ(plug.fragment.devices.at(0).driver, u"k2");
   EXPECT_EQ(script[1].atMilliseconds, 5u);
   EXPECT_EQ(std::get<Mount>(script[1].change).path, u"E:\\");
@@ -71,8 +68,7 @@ TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
       {R"({"plug": {"name": "x"}})", R"(steps[0].plug: unknown member "name")"},
       {R"({"plug": {"ports": [{"hub": "USB#HUB#1", "index": 0}]}})",
        "steps[0].plug.ports[0].index: 0 does not fit (1 to 255)"},
-      {R"({"plug": {"ports": [{"hub": "USB#HUB#1", "speed": "low"}]}})",
-       "steps[0].plug.ports[0].index: is missing"},
+      {R"({"plug": {"ports": [{"hub": "USB#HUB#1", "speed": "low"}]}})", "steps[0].plug.ports[0].index: is missing"},
       {R"({"plug": {"devices": [{"id": "USB\\B", "parent": "USB\\C"}]}})",
        R"(steps[0].plug.devices[0].parent: no device with the id "USB\C")"},
       {R"({"plug": {"devices": [{"id": "usb\\a\\1"}]}})",
@@ -84,53 +80,50 @@ TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
   }
   // What a step needs of the PC is refused with the PC's own reason.
   for (const std::string step :
-       {R"({"at": 9, "unplug": "USB\\C"})",
-        R"({"at": 9, "mount": {"volume": "V", "path": "E:\\"}})",
+       {R"({"at": 9, "unplug": "USB\\C"})", R"({"at": 9, "mount": {"volume": "V", "path": "E:\\"}})",
         R"({"at": 9, "plug": {"ports": [{"hub": "USB#HUB#1", "index": 3, "driverKey": "k"}]}})",
         R"({"at": 9, "plug": {"ports": [{"hub": "USB#HUB#2", "index": 1, "driverKey": "k"}]}})"}) {
     EXPECT_THAT(ScriptError(wait + step), StartsWith("s.json: steps[1]: ")) << step;
   }
   // A device that a step took away can come back, and cannot go twice.
-  EXPECT_EQ(ScriptError(R"({"unplug": "USB\\A\\1"}, {"plug": {"devices": [{"id": "USB\\A\\1"}]}})"),
-            "no error");
-  EXPECT_THAT(ScriptError(R"({"unplug": "USB\\A\\1"}, {"unplug": "USB\\A\\1"})"),
-              StartsWith("s.json: steps[1]: "));
+  EXPECT_EQ(ScriptError(R"({"unplug": "USB\\A\\1"}, {"plug": {"devices": [{"id": "USB\\A\\1"}]}})"), "no error");
+  EXPECT_THAT(ScriptError(R"({"unplug": "USB\\A\\1"}, {"unplug": "USB\\A\\1"})"), StartsWith("s.json: steps[1]: "));
 }
 
 TEST(ScriptFile, ReadyMadeScriptsEndWhereTheyBegin) {
-  const std::filesystem::path folder = std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines";
+  const std::string folder = ZKUSB_SOURCE_DIR "/machines/";
   const auto sizes = [](const Machine& pc) {
     return std::vector{pc.devices.size(), pc.interfaces.size(), pc.hubs.size(),
                        pc.storage.size(), pc.volumes.size(),    pc.drives.size()};
   };
-  const auto load = [&](const char* machine, const char* script) {
-    const Machine start = LoadMachine((folder / machine).string());
-    const Script steps = LoadScript((folder / "scripts" / script).string(), start);
+  const struct {
+    std::string machine, script;
+    std::size_t steps;
+  } kCases[] = {{"dell-precision", "stick-comes-and-goes", 3},
+                {"hp-cardreader", "card-in-slot", 3},
+                {"asus-b560", "hub-with-four-devices", 3},
+                {"dell-precision", "usb-hard-disk", 5}};
+  for (const auto& [machine, name, steps] : kCases) {
+    const Machine start = LoadMachine(folder + machine + ".json");
+    const Script script = LoadScript(folder + "scripts/" + name + ".json", start);
+    EXPECT_EQ(script.size(), steps) << name;
     SimulatedPc pc(start);
     std::size_t most = 0;
-    for (const Step& step : steps) {
-      EXPECT_EQ(ToUtf8(pc.Apply(step)), "") << script;
+    for (const Step& step : script) {
+      EXPECT_EQ(ToUtf8(pc.Apply(step)), "") << name;
       most = std::max(most, pc.Snapshot().devices.size());
     }
-    EXPECT_GT(most, start.devices.size()) << script;
-    EXPECT_EQ(sizes(pc.Snapshot()), sizes(start)) << script;
-    return steps.size();
-  };
-  EXPECT_EQ(load("dell-precision.json", "stick-comes-and-goes.json"), 3u);
-  EXPECT_EQ(load("hp-cardreader.json", "card-in-slot.json"), 3u);
-  EXPECT_EQ(load("asus-b560.json", "hub-with-four-devices.json"), 3u);
-  EXPECT_EQ(load("dell-precision.json", "usb-hard-disk.json"), 5u);
-}
-
-TEST(ScriptFile, ReadsTheExampleOfItsDocumentation) {
+    EXPECT_GT(most, start.devices.size()) << name;
+    EXPECT_EQ(sizes(pc.Snapshot()), sizes(start)) << name;
+  }
+  // The example of the documentation.
   const std::string path = ZKUSB_SOURCE_DIR "/docs/machine-file.md";
   std::ifstream file(path);
   const std::string text((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
   const std::size_t start = text.find("```json\n");
   ASSERT_NE(start, std::string::npos);
   const std::string example = text.substr(start + 8, text.find("\n```", start) - start - 8);
-  const Machine dell = LoadMachine(ZKUSB_SOURCE_DIR "/machines/dell-precision.json");
-  EXPECT_EQ(ParseScript(example, path, dell).size(), 2u);
+  EXPECT_EQ(ParseScript(example, path, LoadMachine(folder + "dell-precision.json")).size(), 2u);
 }
 
 }  // namespace

@@ -1,9 +1,8 @@
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <atomic>
-#include <functional>
 #include <thread>
+#include <type_traits>
 #include <vector>
 
 #include "platform/simulated/simulated_pc.h"
@@ -13,92 +12,35 @@ namespace platform::simulated {
 namespace {
 
 using testing::ElementsAre;
-
-template <class Record>
-std::vector<Text> Names(const std::vector<Record>& records, Text Record::*name) {
-  std::vector<Text> names;
-  for (const Record& record : records) names.push_back(record.*name);
-  return names;
-}
+using testing::Field;
 
 // A keyboard for port 1 of the external hub.
 Plug Keyboard() {
   Plug plug;
-  plug.fragment.devices = {
-      MakeDevice(u"HID\\KEYS\\1", u"USB\\KEYS\\1", u"HIDClass", u"{hid}\\0000"),
-      MakeDevice(u"USB\\KEYS\\1", kHub, u"HIDClass", u"{hid}\\0001")};
-  Port port;
-  port.status = DeviceConnected;
-  port.driverKey = u"{hid}\\0001";
-  plug.ports = {{kHubName, 1, port}};
+  plug.fragment.devices = {MakeDevice(u"HID\\KEYS\\1", u"USB\\KEYS\\1", u"HIDClass", u"{hid}\\0000"),
+                           MakeDevice(u"USB\\KEYS\\1", kHub, u"HIDClass", u"{hid}\\0001")};
+  plug.ports = {{kHubName, 1, {DeviceConnected, Speed::Low, false, {}, u"{hid}\\0001", {}, 1, 0, {}}}};
   return plug;
 }
 
-// What comes back with the stick.
-Plug StickPlug() {
-  const Machine whole = StickMachine();
-  Plug back;
-  back.fragment.devices = {whole.devices[3], whole.devices[4], whole.devices[6]};
-  back.fragment.interfaces = {whole.interfaces[1], whole.interfaces[2]};
-  back.fragment.storage = whole.storage;
-  back.fragment.volumes = {whole.volumes[1]};
-  back.fragment.drives = {whole.drives[0]};
-  back.ports = {{ToUpper(std::u16string_view(kRootHubName)), 1, whole.hubs[0].ports[0]}};
-  return back;
-}
-
-TEST(Unplug, TakesEverythingThatNamesTheStick) {
-  SimulatedPc pc(StickMachine());
+TEST(Unplug, TakesEverythingThatNamesTheStickAndItCanComeBack) {
+  const Machine before = StickMachine();
+  SimulatedPc pc(before);
   ASSERT_EQ(pc.Apply(UnplugStep(ToLower(std::u16string_view(kStick)))), u"");
   const Machine left = pc.Snapshot();
-  EXPECT_THAT(Names(left.devices, &Device::id),
-              ElementsAre(kController, u"USB\\ROOT_HUB30\\4&1", kHub, u"ROOT\\VOLMGR\\0000",
-                          u"STORAGE\\VOLUME\\{5C31}#01"));
-  EXPECT_THAT(Names(left.interfaces, &Interface::path),
-              ElementsAre(kControllerPath, u"\\\\?\\STORAGE#Volume#{5c31}#01#{53f5630d}"));
+  EXPECT_THAT(left.devices, ElementsAre(Field(&Device::id, kController), Field(&Device::id, u"USB\\ROOT_HUB30\\4&1"),
+                                        Field(&Device::id, kHub), Field(&Device::id, u"ROOT\\VOLMGR\\0000"),
+                                        Field(&Device::id, kSystemVolume)));
+  EXPECT_THAT(left.interfaces,
+              ElementsAre(Field(&Interface::path, kControllerPath), Field(&Interface::path, kSystemVolumePath)));
   EXPECT_TRUE(left.storage.empty()) << "of the disk and of its drive";
-  EXPECT_THAT(Names(left.volumes, &Volume::name), ElementsAre(kSystemVolumeName));
+  EXPECT_THAT(left.volumes, ElementsAre(Field(&Volume::name, kSystemVolumeName)));
   EXPECT_TRUE(left.volumes[0].folderMounts.empty());
-  ASSERT_EQ(left.drives.size(), 1u);
-  EXPECT_EQ(left.drives[0].letter, u'C');
+  EXPECT_THAT(left.drives, ElementsAre(Field(&Drive::letter, u'C')));
   EXPECT_EQ(left.hubs[0].ports[0].status, NoDeviceConnected);
   EXPECT_FALSE(left.hubs[0].ports[0].driverKey);
   EXPECT_TRUE(left.hubs[0].ports[1].hubName) << "the other ports stay";
-}
 
-TEST(Unplug, AHubTakesWhatHangsBelow) {
-  SimulatedPc pc(StickMachine());
-  ASSERT_EQ(pc.Apply({0, u"", Keyboard()}), u"");
-  EXPECT_EQ(pc.Snapshot().hubs[1].ports[0].driverKey, u"{hid}\\0001");
-  ASSERT_EQ(pc.Apply(UnplugStep(kHub)), u"");
-  const Machine left = pc.Snapshot();
-  EXPECT_EQ(left.devices.size(), StickMachine().devices.size() - 1);
-  EXPECT_THAT(Names(left.hubs, &Hub::name), ElementsAre(kRootHubName));
-  EXPECT_FALSE(left.hubs[0].ports[1].isHub);
-  EXPECT_EQ(left.volumes.size(), 2u);
-}
-
-TEST(Unplug, AControllerTakesItsHubs) {
-  SimulatedPc pc(StickMachine());
-  ASSERT_EQ(pc.Apply(UnplugStep(kController)), u"");
-  const Machine left = pc.Snapshot();
-  EXPECT_TRUE(left.hostControllers.empty());
-  EXPECT_TRUE(left.hubs.empty());
-  EXPECT_EQ(left.devices.size(), 2u);
-}
-
-TEST(Unplug, FoldersOfALostVolumeAreLost) {
-  Machine machine = StickMachine();
-  machine.volumes[0].paths.push_back(u"e:\\System\\");
-  SimulatedPc pc(machine);
-  ASSERT_EQ(pc.Apply(UnplugStep(kStick)), u"");
-  EXPECT_THAT(pc.Snapshot().volumes[0].paths, ElementsAre(u"C:\\"));
-}
-
-TEST(Plug, WhatLeftCanComeBack) {
-  const Machine before = StickMachine();
-  SimulatedPc pc(before);
-  ASSERT_EQ(pc.Apply(UnplugStep(kStick)), u"");
   ASSERT_EQ(pc.Apply({0, u"", StickPlug()}), u"");
   const Machine after = pc.Snapshot();
   EXPECT_EQ(after.devices.size(), before.devices.size());
@@ -109,12 +51,48 @@ TEST(Plug, WhatLeftCanComeBack) {
   EXPECT_EQ(after.hubs[0].ports[0].driverKey, before.hubs[0].ports[0].driverKey);
 }
 
+// What is left of the PC with the keyboard and a folder mount on the stick, by what goes.
+TEST(Unplug, TakesWhatHangsBelow) {
+  Machine before = StickMachine();
+  before.volumes[0].paths.push_back(u"e:\\System\\");
+  const struct {
+    const char16_t* device;
+    std::size_t controllers, hubs, devices, volumes, pathsOfSystem;
+  } kCases[] = {{kStick, 1, 2, 7, 1, 1}, {kHub, 1, 1, 7, 2, 2}, {kController, 0, 0, 2, 1, 1}};
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(ToUtf8(test.device));
+    SimulatedPc pc(before);
+    ASSERT_EQ(pc.Apply({0, u"", Keyboard()}), u"");
+    EXPECT_EQ(pc.Snapshot().hubs[1].ports[0].driverKey, u"{hid}\\0001");
+    ASSERT_EQ(pc.Apply(UnplugStep(test.device)), u"");
+    const Machine left = pc.Snapshot();
+    EXPECT_EQ(left.hostControllers.size(), test.controllers);
+    ASSERT_EQ(left.hubs.size(), test.hubs);
+    EXPECT_EQ(left.devices.size(), test.devices);
+    EXPECT_EQ(left.volumes.size(), test.volumes);
+    EXPECT_EQ(left.volumes[0].paths.size(), test.pathsOfSystem) << "folders of a lost volume are lost";
+    EXPECT_TRUE(left.hubs.empty() || left.hubs[0].ports[1].isHub == (test.hubs == 2));
+  }
+}
+
+// The keyboard with one list more, or with ports more.
+template <class Record>
+Step With(std::vector<Record> Machine::*list, const std::type_identity_t<std::vector<Record>>& more) {
+  Plug plug = Keyboard();
+  (plug.fragment.*list).insert((plug.fragment.*list).begin(), more.begin(), more.end());
+  return {0, u"", plug};
+}
+Step WithPort(const PortChange& port) {
+  Plug plug = Keyboard();
+  plug.ports.push_back(port);
+  return {0, u"", plug};
+}
+
 TEST(Steps, RefusedOnesChangeNothing) {
-  const auto plugWith = [](const std::function<void(Plug&)>& change) {
-    Plug plug = Keyboard();
-    change(plug);
-    return Step{0, u"", plug};
-  };
+  const Text hub = kHubName, volume = kStickVolumeName;
+  const auto device = [](const Text& id, const Text& parent = u"") { return MakeDevice(id, parent, u"USB", u"k"); };
+  const auto mount = [](const Text& name, const Text& path) { return Step{0, u"", Mount{name, path}}; };
+  const auto dismount = [](const Text& name, const Text& path) { return Step{0, u"", Dismount{name, path}}; };
   const struct {
     Step step;
     Text reason;
@@ -122,73 +100,39 @@ TEST(Steps, RefusedOnesChangeNothing) {
       {UnplugStep(u"USB\\NONE\\1"), u"device USB\\NONE\\1 is missing"},
       {UnplugStep(kRootDeviceId), u"the root device stays"},
       {UnplugStep(u""), u"the root device stays"},
-      {plugWith([](Plug& p) { p.fragment.devices[0].id = ToLower(std::u16string_view(kStick)); }),
+      {With(&Machine::devices, {device(u"usb\\vid_0781&pid_5580\\aa01")}),
        u"device usb\\vid_0781&pid_5580\\aa01 is there already"},
-      {plugWith([](Plug& p) { p.fragment.devices[0].id = kRootDeviceId; }),
-       u"device HTREE\\ROOT\\0 is there already"},
-      {plugWith([](Plug& p) { p.fragment.devices[0].id = p.fragment.devices[1].id; }),
-       u"device USB\\KEYS\\1 is there already"},
-      {plugWith([](Plug& p) { p.fragment.devices[1].parent = u"USB\\NONE\\1"; }),
-       u"parent USB\\NONE\\1 is missing"},
-      {plugWith([](Plug& p) { p.fragment.devices[1].parent = u"hid\\keys\\1"; }),
-       u"the parents of HID\\KEYS\\1 form a circle"},
-      {plugWith([](Plug& p) {
-         p.fragment.interfaces = {{kNullGuid, kDiskPath, kStick}};
-       }),
+      {With(&Machine::devices, {device(kRootDeviceId)}), u"device HTREE\\ROOT\\0 is there already"},
+      {With(&Machine::devices, {device(u"USB\\KEYS\\1")}), u"device USB\\KEYS\\1 is there already"},
+      {With(&Machine::devices, {device(u"A", u"USB\\NONE\\1")}), u"parent USB\\NONE\\1 is missing"},
+      {With(&Machine::devices, {device(u"A", u"b"), device(u"B", u"a")}), u"the parents of A form a circle"},
+      {With(&Machine::interfaces, {{kNullGuid, kDiskPath, kStick}}),
        Text(u"interface ") + kDiskPath + u" is there already"},
-      {plugWith([](Plug& p) {
-         p.fragment.interfaces = {{kNullGuid, u"new", u"USB\\NONE\\1"}};
-       }),
+      {With(&Machine::interfaces, {{kNullGuid, u"new", u"USB\\NONE\\1"}}),
        u"device USB\\NONE\\1 of interface new is missing"},
-      {plugWith([](Plug& p) {
-         p.fragment.hostControllers = {{{u"\\\\.\\hcd0"}, u"k", u"h"}};
-       }),
+      {With(&Machine::hostControllers, {{{u"\\\\.\\hcd0"}, u"k", u"h"}}),
        u"host controller \\\\.\\hcd0 is there already"},
-      {plugWith([](Plug& p) {
-         p.fragment.hubs = {{kHubName, {}, false}};
-       }),
-       Text(u"hub ") + kHubName + u" is there already"},
-      {plugWith([](Plug& p) {
-         p.fragment.volumes = {{kStickVolumeName, u"", {}, {}, 3, false, {}}};
-       }),
-       Text(u"volume ") + kStickVolumeName + u" is there already"},
-      {plugWith([](Plug& p) {
-         p.fragment.volumes = {{u"new", u"", {u"e:\\"}, {}, 3, false, {}}};
-       }),
-       u"path e:\\ is there already"},
-      {plugWith([](Plug& p) {
-         p.fragment.drives = {{u'c', 3, {}, u""}};
-       }),
-       u"drive c is there already"},
-      {plugWith([](Plug& p) {
-         p.fragment.drives = {{u'X', 3, {}, u"USB\\NONE\\1"}};
-       }),
-       u"device USB\\NONE\\1 of drive X: is missing"},
-      {plugWith([](Plug& p) { p.ports[0].hub = u"USB#NONE"; }), u"hub USB#NONE is missing"},
-      {plugWith([](Plug& p) { p.ports[0].index = 3; }),
-       Text(u"port 3 of hub ") + kHubName + u" is missing"},
-      {plugWith([](Plug& p) { p.ports[0].index = 0; }),
-       Text(u"port 0 of hub ") + kHubName + u" is missing"},
-      {plugWith([](Plug& p) { p.ports.push_back(p.ports[0]); }),
-       Text(u"port 1 of hub ") + kHubName + u" is taken"},
-      {{0, u"", Mount{u"none", u"X:\\"}}, u"volume none is missing"},
-      {{0, u"", Mount{kStickVolumeName, u"e:\\"}}, u"path e:\\ is taken"},
-      {{0, u"", Mount{kStickVolumeName, u"X:"}},
-       u"path X: is neither a drive's root nor a folder that ends with \\"},
-      {{0, u"", Mount{kStickVolumeName, u"C:\\Folder"}},
-       u"path C:\\Folder is neither a drive's root nor a folder that ends with \\"},
-      {{0, u"", Dismount{u"none", u"E:\\"}}, u"volume none is missing"},
-      {{0, u"", Dismount{kStickVolumeName, u"C:\\"}},
-       Text(u"volume ") + kStickVolumeName + u" has no path C:\\"},
-  };
+      {With(&Machine::hubs, {{hub, {}, false}}), u"hub " + hub + u" is there already"},
+      {With(&Machine::volumes, {{volume, u"", {}, {}, 3, false, {}}}), u"volume " + volume + u" is there already"},
+      {With(&Machine::volumes, {{u"new", u"", {u"e:\\"}, {}, 3, false, {}}}), u"path e:\\ is there already"},
+      {With(&Machine::drives, {{u'c', 3, {}, u""}}), u"drive c is there already"},
+      {With(&Machine::drives, {{u'X', 3, {}, u"USB\\NONE\\1"}}), u"device USB\\NONE\\1 of drive X: is missing"},
+      {WithPort({u"USB#NONE", 1, {}}), u"hub USB#NONE is missing"},
+      {WithPort({hub, 3, {}}), u"port 3 of hub " + hub + u" is missing"},
+      {WithPort({hub, 0, {}}), u"port 0 of hub " + hub + u" is missing"},
+      {WithPort(Keyboard().ports[0]), u"port 1 of hub " + hub + u" is taken"},
+      {mount(u"none", u"X:\\"), u"volume none is missing"},
+      {mount(volume, u"e:\\"), u"path e:\\ is taken"},
+      {mount(volume, u"X:"), u"path X: is neither a drive's root nor a folder that ends with \\"},
+      {mount(volume, u"C:\\A"), u"path C:\\A is neither a drive's root nor a folder that ends with \\"},
+      {dismount(u"none", u"E:\\"), u"volume none is missing"},
+      {dismount(volume, u"C:\\"), u"volume " + volume + u" has no path C:\\"}};
   for (const auto& [step, reason] : kCases) {
     SimulatedPc pc(StickMachine());
     EXPECT_EQ(ToUtf8(pc.Apply(step)), ToUtf8(reason));
     const Machine after = pc.Snapshot();
-    EXPECT_EQ(after.devices.size(), 8u) << ToUtf8(reason);
-    EXPECT_EQ(after.hubs.size(), 2u) << ToUtf8(reason);
+    EXPECT_EQ(after.devices.size() + after.hubs.size() + after.volumes[1].paths.size(), 8u + 2u + 2u) << ToUtf8(reason);
     EXPECT_FALSE(after.hubs[1].ports[0].driverKey) << ToUtf8(reason);
-    EXPECT_EQ(after.volumes[1].paths.size(), 2u) << ToUtf8(reason);
   }
 }
 

@@ -16,13 +16,17 @@ inline constexpr char16_t kHubName[] = u"USB#VID_0424&PID_2513#5&2#{f18a0e88}";
 inline constexpr char16_t kStick[] = u"USB\\VID_0781&PID_5580\\AA01";
 inline constexpr char16_t kDisk[] = u"USBSTOR\\DISK&VEN_SANDISK\\AA01&0";
 inline constexpr char16_t kDiskPath[] = u"\\\\?\\USBSTOR#Disk&Ven_SanDisk#AA01&0#{53f56307}";
-inline constexpr char16_t kStickVolume[] =
-    u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_SANDISK#AA01&0#{53F56307}";
+inline constexpr char16_t kStickVolume[] = u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_SANDISK#AA01&0#{53F56307}";
 inline constexpr char16_t kStickVolumePath[] =
     u"\\\\?\\STORAGE#Volume#_??_USBSTOR#Disk&Ven_SanDisk#AA01&0#{53f56307}#{53f5630d}";
 inline constexpr char16_t kStickVolumeName[] = u"\\\\?\\Volume{3869c27a}\\";
+inline constexpr char16_t kSystemVolume[] = u"STORAGE\\VOLUME\\{5C31}#01";
+inline constexpr char16_t kSystemVolumePath[] = u"\\\\?\\STORAGE#Volume#{5c31}#01#{53f5630d}";
 inline constexpr char16_t kSystemVolumeName[] = u"\\\\?\\Volume{09931f21}\\";
 inline constexpr char16_t kDiskClass[] = u"{4d36e967-e325-11ce-bfc1-08002be10318}";
+
+// The error of a refusal, 0 of a success.
+inline std::uint32_t Error(const Status& status) { return status.ok ? 0 : status.error; }
 
 inline Device MakeDevice(Text id, Text parent, Text deviceClass, Text driver) {
   Device device;
@@ -35,17 +39,14 @@ inline Device MakeDevice(Text id, Text parent, Text deviceClass, Text driver) {
 
 inline Machine StickMachine() {
   Machine machine;
-  machine.devices = {
-      MakeDevice(kController, u"", u"USB", u"{usb}\\0000"),
-      MakeDevice(u"USB\\ROOT_HUB30\\4&1", kController, u"USB", u"{usb}\\0001"),
-      MakeDevice(kHub, u"USB\\ROOT_HUB30\\4&1", u"USB", u"{usb}\\0002"),
-      MakeDevice(kStick, u"usb\\root_hub30\\4&1", u"USB", u"{usb}\\0003"),
-      MakeDevice(kDisk, kStick, u"DiskDrive", u"{disk}\\0001"),
-      MakeDevice(u"ROOT\\VOLMGR\\0000", kRootDeviceId, u"System", u"{system}\\0000"),
-      MakeDevice(kStickVolume, u"ROOT\\VOLMGR\\0000", u"Volume", u"{volume}\\0001"),
-      MakeDevice(u"STORAGE\\VOLUME\\{5C31}#01", u"ROOT\\VOLMGR\\0000", u"Volume",
-                 u"{volume}\\0000"),
-  };
+  machine.devices = {MakeDevice(kController, u"", u"USB", u"{usb}\\0000"),
+                     MakeDevice(u"USB\\ROOT_HUB30\\4&1", kController, u"USB", u"{usb}\\0001"),
+                     MakeDevice(kHub, u"USB\\ROOT_HUB30\\4&1", u"USB", u"{usb}\\0002"),
+                     MakeDevice(kStick, u"usb\\root_hub30\\4&1", u"USB", u"{usb}\\0003"),
+                     MakeDevice(kDisk, kStick, u"DiskDrive", u"{disk}\\0001"),
+                     MakeDevice(u"ROOT\\VOLMGR\\0000", kRootDeviceId, u"System", u"{system}\\0000"),
+                     MakeDevice(kStickVolume, u"ROOT\\VOLMGR\\0000", u"Volume", u"{volume}\\0001"),
+                     MakeDevice(kSystemVolume, u"ROOT\\VOLMGR\\0000", u"Volume", u"{volume}\\0000")};
   Device& disk = machine.devices[4];
   disk.classGuid = kDiskClass;
   disk.description = u"Disk drive";
@@ -54,67 +55,41 @@ inline Machine StickMachine() {
   disk.legacyBusType = -1;
   disk.uiNumber = 7;
   machine.devices[6].physicalName = u"\\Device\\HarddiskVolume5";
-  machine.interfaces = {
-      {{0x3ABF6F2D, 0, 0, {}}, kControllerPath, kController},
-      {GUID_DEVINTERFACE_DISK, kDiskPath, kDisk},
-      {GUID_DEVINTERFACE_VOLUME, kStickVolumePath, kStickVolume},
-      {GUID_DEVINTERFACE_VOLUME, u"\\\\?\\STORAGE#Volume#{5c31}#01#{53f5630d}",
-       u"STORAGE\\VOLUME\\{5C31}#01"},
-  };
+  machine.interfaces = {{{0x3ABF6F2D, 0, 0, {}}, kControllerPath, kController},
+                        {GUID_DEVINTERFACE_DISK, kDiskPath, kDisk},
+                        {GUID_DEVINTERFACE_VOLUME, kStickVolumePath, kStickVolume},
+                        {GUID_DEVINTERFACE_VOLUME, kSystemVolumePath, kSystemVolume}};
   machine.hostControllers = {{{u"\\\\.\\HCD0", kControllerPath}, u"{usb}\\0000", kRootHubName}};
 
-  Port stick;
-  stick.status = DeviceConnected;
-  stick.speed = Speed::Super;
-  stick.driverKey = u"{usb}\\0003";
+  Port stick{DeviceConnected, Speed::Super, false, {}, u"{usb}\\0003", {}, 1, 5, {}};
   stick.descriptor.idVendor = 0x0781;
   stick.descriptor.idProduct = 0x5580;
-  stick.configuration = 1;
-  stick.address = 5;
   stick.pipes = {{{7, 5, 0x81, 2, 1024, 0}, 0}, {{7, 5, 0x02, 2, 1024, 0}, 0}};
-  Port hub;
-  hub.status = DeviceConnected;
-  hub.isHub = true;
-  hub.hubName = kHubName;
-  hub.driverKey = u"{usb}\\0002";
+  const Port hub{DeviceConnected, Speed::Full, true, kHubName, u"{usb}\\0002", {}, 0, 0, {}};
   machine.hubs = {{kRootHubName, {stick, hub, Port{}}, false}, {kHubName, {Port{}, Port{}}, true}};
+  machine.storage = {{kDiskPath, std::uint8_t{0}, 0, true, "SanDisk ", {}, {}, "AA01", DeviceNumber{7, 1, 0}, u"M1"},
+                     {u"\\\\.\\E:", {}, 0, true, "SanDisk ", {}, {}, "AA01", DeviceNumber{7, 1, 1}, {}}};
 
-  Storage storage;
-  storage.path = kDiskPath;
-  storage.deviceType = std::uint8_t{0};
-  storage.removable = true;
-  storage.vendor = "SanDisk ";
-  storage.serial = "AA01";
-  storage.deviceNumber = DeviceNumber{7, 1, 0};
-  storage.mediaSerialNumber = u"M1";
-  machine.storage.push_back(storage);
-  storage.path = u"\\\\.\\E:";
-  storage.deviceNumber = DeviceNumber{7, 1, 1};
-  storage.deviceType.reset();
-  storage.mediaSerialNumber.reset();
-  machine.storage.push_back(storage);
-
+  const FolderMount folder{u"Mount\\Stick\\", kStickVolumeName};
   machine.volumes = {
-      {kSystemVolumeName,
-       u"STORAGE\\VOLUME\\{5C31}#01",
-       {u"C:\\"},
-       0xB4D87E32,
-       kDRIVE_FIXED,
-       true,
-       {{u"Mount\\Stick\\", kStickVolumeName}}},
-      {kStickVolumeName,
-       kStickVolume,
-       {u"E:\\", u"C:\\Mount\\Stick\\"},
-       0x3E9A61C7,
-       kDRIVE_REMOVABLE,
-       false,
-       {}},
-  };
-  machine.drives = {
-      {u'E', kDRIVE_REMOVABLE, u"\\Device\\HarddiskVolume5", kDisk},
-      {u'C', kDRIVE_FIXED, u"\\Device\\HarddiskVolume4", u""},
-  };
+      {kSystemVolumeName, kSystemVolume, {u"C:\\"}, 0xB4D87E32, kDRIVE_FIXED, true, {folder}},
+      {kStickVolumeName, kStickVolume, {u"E:\\", u"C:\\Mount\\Stick\\"}, 0x3E9A61C7, kDRIVE_REMOVABLE, false, {}}};
+  machine.drives = {{u'E', kDRIVE_REMOVABLE, u"\\Device\\HarddiskVolume5", kDisk},
+                    {u'C', kDRIVE_FIXED, u"\\Device\\HarddiskVolume4", u""}};
   return machine;
+}
+
+// What comes back with the stick.
+inline Plug StickPlug() {
+  const Machine whole = StickMachine();
+  Plug back;
+  back.fragment.devices = {whole.devices[3], whole.devices[4], whole.devices[6]};
+  back.fragment.interfaces = {whole.interfaces[1], whole.interfaces[2]};
+  back.fragment.storage = whole.storage;
+  back.fragment.volumes = {whole.volumes[1]};
+  back.fragment.drives = {whole.drives[0]};
+  back.ports = {{ToUpper(std::u16string_view(kRootHubName)), 1, whole.hubs[0].ports[0]}};
+  return back;
 }
 
 inline Step UnplugStep(Text device) { return {0, u"", Unplug{std::move(device)}}; }

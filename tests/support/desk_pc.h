@@ -1,34 +1,23 @@
 // A desktop PC and what is plugged into it, for tests of whole builds.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
-#include <functional>
-#include <string>
-#include <utility>
+#include <gtest/gtest.h>
 
-#include "platform/simulated/machine.h"
-#include "platform/simulated/script.h"
+#include <functional>
+
 #include "platform/simulated/simulated_pc.h"
-#include "platform/text.h"
+#include "platform/simulated/steps.h"
 #include "tests/support/machines.h"
-#include "tree/device_lists.h"
 #include "tree/tree_builder.h"
 
 namespace KelvoUHW {
 
-using platform::simulated::Machine;
+using platform::simulated::OpenCounts;
 using platform::simulated::Plug;
 using platform::simulated::SimulatedPc;
-using platform::simulated::Text;
 using platform::simulated::Unplug;
-using testing_support::DeviceNode;
-using testing_support::DevicePort;
-using testing_support::HubName;
-using testing_support::kControllerId;
 using Change = decltype(platform::simulated::Step::change);
 
-inline constexpr char16_t kRootHubId[] = u"USB\\ROOT_HUB20\\4&1";
 inline constexpr char16_t kVolumeManagerId[] = u"ROOT\\VOLMGR\\0000";
 inline constexpr char16_t kInternalDiskId[] = u"SCSI\\DISK&VEN_WDC&PROD_INTERNAL\\4&0";
 // Hubs with this service have no device record; the newer one is not on the list of exclusions.
@@ -58,13 +47,12 @@ inline void AddPort(Plug& plug, const Text& id, const Text& hub, std::uint32_t p
 inline void AddStorageInterface(Plug& plug, const platform::Guid& kind, const Text& id, const Text& diskId) {
   const Text path = u"\\\\?\\" + platform::Replaced(id, u'\\', u'#') + u"#" + GuidText(kind);
   plug.fragment.interfaces.push_back({kind, path, id});
-  platform::simulated::Storage storage;
+  platform::simulated::Storage& storage = plug.fragment.storage.emplace_back();
   storage.path = path;
   storage.deviceType = 0;
   storage.vendor = "ACME    ";
   // Any number will do that differs from disk to disk.
   storage.deviceNumber = {7, static_cast<std::uint32_t>(std::hash<Text>{}(diskId)), 0};
-  plug.fragment.storage.push_back(storage);
 }
 inline void AddDisk(Plug& plug, const Text& id, const Text& parent) {
   AddNode(plug, id, parent, u"DiskDrive", u"disk");
@@ -112,14 +100,13 @@ inline Plug ExternalHub(const Text& serial, std::uint32_t port, const char16_t* 
   Plug plug;
   AddNode(plug, UsbId(serial), kRootHubId, u"USB", service);
   plug.fragment.hubs.push_back({HubName(UsbId(serial)), {{}, {}, {}}, false});
-  plug.ports.push_back(
-      {HubName(kRootHubId), port, testing_support::HubOnPort(DriverKey(UsbId(serial)), HubName(UsbId(serial)))});
+  plug.ports.push_back({HubName(kRootHubId), port, HubOnPort(DriverKey(UsbId(serial)), HubName(UsbId(serial)))});
   return plug;
 }
 
 // One controller with a root hub of six free ports, and the volume manager.
 inline Machine BarePc(const char16_t* hubService = kOldHubService) {
-  Machine machine = testing_support::OneController(6);
+  Machine machine = OneController(6);
   machine.devices[2].service = hubService;
   machine.devices.push_back(DeviceNode(kVolumeManagerId, u"", u"System", u"{sys}\\0002", u"Volume manager"));
   return machine;
@@ -133,8 +120,6 @@ inline Plug InternalDisk() {
   AddStorageInterface(plug, platform::GUID_DEVINTERFACE_VOLUME, u"STORAGE\\VOLUME\\{1}#00", kInternalDiskId);
   return plug;
 }
-
-inline platform::simulated::Step StepOf(Change change) { return {0, u"", std::move(change)}; }
 
 // The last components of the instance ids: "S1 CR", "-" for none, "?" for an empty id.
 inline std::string ShortNames(const DeviceList& list) {
@@ -160,5 +145,25 @@ inline std::u16string DumpOf(const NodePtr& root) {
   if (root) root->ToString(dump, u"");
   return dump;
 }
+
+// A PC with devices, and a builder that sees it through a host.
+template <class Host>
+struct Desk {
+  explicit Desk(Machine machine, const std::vector<Change>& devices = {}) : pc(std::move(machine)) { Do(devices); }
+
+  void Do(const std::vector<Change>& changes) {
+    for (const Change& change : changes) ASSERT_EQ(pc.Apply({0, u"", change}), u"");
+  }
+  std::vector<DeviceList> Lists() const {
+    std::vector<DeviceList> lists;
+    for (std::size_t kind = kConnectedList; kind <= kModifiedList; ++kind)
+      lists.push_back(*builder.GetDeviceList(kind));
+    return lists;
+  }
+
+  SimulatedPc pc;
+  Host host{pc};
+  CZKUMUsbTreeBuilder builder{host};
+};
 
 }  // namespace KelvoUHW

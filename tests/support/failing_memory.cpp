@@ -3,24 +3,19 @@
 #include <cstdlib>
 #include <new>
 
-namespace {
-
 // Allocations until the one that fails; 0: none fails.
-thread_local std::uint64_t t_countdown = 0;
-thread_local bool t_paused = false;
-
-}  // namespace
+static thread_local std::uint64_t t_countdown = 0;
+static thread_local bool t_paused = false;
 
 void* operator new(std::size_t bytes) {
   if (t_countdown != 0 && !t_paused && --t_countdown == 0) throw std::bad_alloc();
-  void* memory = std::malloc(bytes == 0 ? 1 : bytes);
-  if (memory == nullptr) throw std::bad_alloc();
-  return memory;
+  if (void* memory = std::malloc(bytes == 0 ? 1 : bytes)) return memory;
+  throw std::bad_alloc();
 }
 void operator delete(void* memory) noexcept { std::free(memory); }
 void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
 
-namespace testing_support {
+namespace KelvoUHW {
 
 FailingAllocation::FailingAllocation(std::uint64_t allocation) noexcept { t_countdown = allocation; }
 FailingAllocation::~FailingAllocation() { t_countdown = 0; }
@@ -35,4 +30,4 @@ void WellFedHost::AfterCall(const platform::wrappers::HostCall&, const platform:
   t_paused = false;
 }
 
-}  // namespace testing_support
+}  // namespace KelvoUHW

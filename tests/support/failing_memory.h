@@ -6,31 +6,23 @@
 
 #include "platform/wrappers/intercepting_host.h"
 
-namespace testing_support {
+namespace KelvoUHW {
 
 // From construction to destruction the n-th allocation of this thread fails, counted from 1, and
 // all behind it succeed. One at a time.
-class FailingAllocation {
- public:
+struct FailingAllocation {
   explicit FailingAllocation(std::uint64_t allocation) noexcept;
   ~FailingAllocation();
-  FailingAllocation(const FailingAllocation&) = delete;
-  FailingAllocation& operator=(const FailingAllocation&) = delete;
-
-  // Whether it came to the failure.
-  bool Failed() const noexcept;
+  bool Failed() const noexcept;  // whether it came to the failure
 };
 
 // Platform calls of the component get their memory from the system: what a simulated PC allocates
 // does not count and does not fail.
-class WellFedHost final : public platform::wrappers::InterceptingHost {
- public:
+struct WellFedHost final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
-
- private:
   platform::Status BeforeCall(const platform::wrappers::HostCall& call) noexcept override;
   void AfterCall(const platform::wrappers::HostCall& call, const platform::Status& status,
                  const std::intptr_t* opened) noexcept override;
 };
 
-}  // namespace testing_support
+}  // namespace KelvoUHW

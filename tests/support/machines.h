@@ -13,6 +13,9 @@ namespace testing_support {
 using platform::simulated::Machine;
 using platform::simulated::Text;
 
+inline constexpr char16_t kControllerId[] = u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086&REV_05\\3&11583659&0&E8";
+inline constexpr char16_t kRootHubId[] = u"USB\\ROOT_HUB20\\4&1";
+
 inline Text HubName(const Text& id) {
   return platform::Replaced(id, u'\\', u'#') + u"#{f18a0e88-c30c-11d0-8815-00a0c906bed8}";
 }
@@ -45,19 +48,30 @@ inline platform::simulated::Port HubOnPort(Text driverKey, Text name) {
   return port;
 }
 
-inline constexpr char16_t kControllerId[] = u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086&REV_05\\3&11583659&0&E8";
-
 // One controller, HCD0, with a root hub of `ports` empty ports.
 inline Machine OneController(std::size_t ports) {
   Machine machine;
-  machine.devices.push_back(DeviceNode(u"ACPI\\PNP0A08\\0", u"", u"System", u"{sys}\\0001", u"PCI"));
-  machine.devices.push_back(DeviceNode(kControllerId, u"ACPI\\PNP0A08\\0", u"USB", u"{usb}\\0000", u"EHCI Controller"));
-  machine.devices.push_back(
-      DeviceNode(u"USB\\ROOT_HUB20\\4&1", kControllerId, u"USB", u"{usb}\\0001", u"USB Root Hub"));
-  machine.hostControllers.push_back({{u"\\\\.\\HCD0"}, u"{usb}\\0000", HubName(u"USB\\ROOT_HUB20\\4&1")});
-  machine.hubs.push_back({HubName(u"USB\\ROOT_HUB20\\4&1"), {}, false});
+  machine.devices = {DeviceNode(u"ACPI\\PNP0A08\\0", u"", u"System", u"{sys}\\0001", u"PCI"),
+                     DeviceNode(kControllerId, u"ACPI\\PNP0A08\\0", u"USB", u"{usb}\\0000", u"EHCI Controller"),
+                     DeviceNode(kRootHubId, kControllerId, u"USB", u"{usb}\\0001", u"USB Root Hub")};
+  machine.hostControllers.push_back({{u"\\\\.\\HCD0"}, u"{usb}\\0000", HubName(kRootHubId)});
+  machine.hubs.push_back({HubName(kRootHubId), {}, false});
   machine.hubs.back().ports.resize(ports);
   return machine;
 }
 
 }  // namespace testing_support
+
+namespace KelvoUHW {
+
+using platform::simulated::Machine;
+using platform::simulated::Text;
+using testing_support::DeviceNode;
+using testing_support::DevicePort;
+using testing_support::HubName;
+using testing_support::HubOnPort;
+using testing_support::kControllerId;
+using testing_support::kRootHubId;
+using testing_support::OneController;
+
+}  // namespace KelvoUHW

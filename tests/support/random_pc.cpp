@@ -18,26 +18,22 @@ constexpr char16_t kVolumeManager[] = u"ROOT\\VOLMGR\\0000";
 constexpr char16_t kDiskClassText[] = u"#{53f56307-b6bf-11d0-94f2-00a0c91efb8b}";
 constexpr char16_t kVolumeClassText[] = u"#{53f5630d-b6bf-11d0-94f2-00a0c91efb8b}";
 
-Text DiskPath(const Text& diskId) {
-  return u"\\\\?\\" + platform::Replaced(diskId, u'\\', u'#') + kDiskClassText;
-}
+Text DiskPath(const Text& diskId) { return u"\\\\?\\" + platform::Replaced(diskId, u'\\', u'#') + kDiskClassText; }
 
 // Several volumes of one disk: the first as Windows names it, the others with something behind it.
 Text VolumeId(const Text& diskId, const Text& volumeName) {
-  const Text id = u"STORAGE\\VOLUME\\_??_" + platform::Replaced(diskId, u'\\', u'#') +
-                  kDiskClassText + volumeName.substr(volumeName.size() - 3, 1);
+  const Text id = u"STORAGE\\VOLUME\\_??_" + platform::Replaced(diskId, u'\\', u'#') + kDiskClassText +
+                  volumeName.substr(volumeName.size() - 3, 1);
   return platform::ToUpper(id);
 }
 
-void AddNode(Machine& machine, const Text& id, const Text& parent, const Text& deviceClass,
-             const Text& service) {
+void AddNode(Machine& machine, const Text& id, const Text& parent, const Text& deviceClass, const Text& service) {
   const Text driver = u"{" + deviceClass + u"}\\" + id.substr(id.find(u'\\') + 1);
   machine.devices.push_back(DeviceNode(id, parent, deviceClass, driver, service + u" device"));
   machine.devices.back().service = service;
 }
 
-void AddStorage(Machine& machine, const platform::Guid& interfaceClass, const Text& path,
-                const Text& device) {
+void AddStorage(Machine& machine, const platform::Guid& interfaceClass, const Text& path, const Text& device) {
   machine.interfaces.push_back({interfaceClass, path, device});
   Storage storage;
   storage.path = path;
@@ -62,8 +58,8 @@ void AddVolume(Machine& machine, const Text& diskId, const Text& name) {
 
 // Everything a gadget brings; the result says what stands on its port.
 Port AddGadget(Machine& machine, const Gadget& gadget, const Text& hubDevice) {
-  static constexpr const char16_t* kServices[kKinds] = {
-      u"HidUsb", u"HidUsb", u"USBSTOR", u"usbccgp", u"STHDA", u"usbhub", u"USBSTOR"};
+  static constexpr const char16_t* kServices[kKinds] = {u"HidUsb", u"HidUsb", u"USBSTOR", u"usbccgp",
+                                                        u"STHDA",  u"usbhub", u"USBSTOR"};
   AddNode(machine, gadget.id, hubDevice, u"USB", kServices[static_cast<std::size_t>(gadget.kind)]);
   const Text driver = *machine.devices.back().driver;
   const Text serial = gadget.id.substr(gadget.id.rfind(u'\\') + 1);
@@ -77,8 +73,7 @@ Port AddGadget(Machine& machine, const Gadget& gadget, const Text& hubDevice) {
     case Kind::Composite:
       for (const Text function : {u"VID_1&PID_2&MI_00\\", u"VID_1&PID_2&MI_01\\"}) {
         AddNode(machine, u"USB\\" + function + serial, gadget.id, u"HIDClass", u"HidUsb");
-        AddNode(machine, u"HID\\" + function + serial, u"USB\\" + function + serial, u"Keyboard",
-                u"kbdhid");
+        AddNode(machine, u"HID\\" + function + serial, u"USB\\" + function + serial, u"Keyboard", u"kbdhid");
       }
       break;
     case Kind::Hub:
@@ -116,14 +111,6 @@ Machine EmptyPc(std::uint32_t controllers, bool reportedHubs) {
   return machine;
 }
 
-template <class List>
-std::optional<std::size_t> IndexOf(const List& gadgets, const Text& id) {
-  for (std::size_t i = 0; i < gadgets.size(); ++i) {
-    if (gadgets[i].id == id) return i;
-  }
-  return {};
-}
-
 }  // namespace
 
 Text DiskId(const Gadget& gadget, std::size_t disk) {
@@ -136,153 +123,91 @@ RandomPc::RandomPc(std::uint32_t seed) : m_random(seed) {
   m_pc.emplace(EmptyPc(controllers, Below(2) == 0));
 }
 
-const Gadget* RandomPc::Find(const Text& id) const {
-  for (const auto* list : {&m_plugged, &m_away}) {
-    if (const auto index = IndexOf(*list, id)) return &(*list)[*index];
-  }
-  return nullptr;
+void RandomPc::Change() {
+  const std::uint32_t choice = Below(12);
+  if (choice < 3 || m_gadgets.empty()) return AddNewGadget();
+  if (choice >= 10) return MountOrDismount();
+  Gadget& gadget = m_gadgets[Below(static_cast<std::uint32_t>(m_gadgets.size()))];
+  if (choice >= 6) return ChangeCard(gadget);
+  const bool moves = gadget.plugged && choice == 5;
+  if (gadget.plugged) Unplug(gadget);
+  if (moves || choice < 5) Plug(gadget);
 }
 
-std::string RandomPc::Change() {
-  switch (Below(12)) {
-    case 0:
-    case 1:
-      if (!m_plugged.empty()) {
-        return Unplug(Below(static_cast<std::uint32_t>(m_plugged.size())));
-      }
-      [[fallthrough]];
-    case 2:
-    case 3:
-    case 4:
-      return PlugNew();
-    case 5:
-      return PlugAgain();
-    case 6:
-      return Move();
-    case 7:
-    case 8:
-    case 9:
-      return ChangeCard();
-    default:
-      return MountOrDismount();
-  }
-}
+Text RandomPc::NewVolume() { return u"\\\\?\\Volume{" + platform::HexLower(++m_volumes, 8) + u"}\\"; }
 
-Text RandomPc::NewVolume() {
-  return u"\\\\?\\Volume{" + platform::HexLower(++m_volumes, 8) + u"}\\";
-}
-
-std::string RandomPc::PlugNew() {
-  Gadget gadget;
+void RandomPc::AddNewGadget() {
+  Gadget& gadget = m_gadgets.emplace_back();
   gadget.kind = static_cast<Kind>(Below(kKinds));
-  gadget.id = u"USB\\VID_0781&PID_558" + platform::Hex(static_cast<std::uint32_t>(gadget.kind)) +
-              u"\\S" + platform::Hex(++m_serials, 4);
+  gadget.id = u"USB\\VID_0781&PID_558" + platform::Hex(static_cast<std::uint32_t>(gadget.kind)) + u"\\S" +
+              platform::Hex(static_cast<std::uint32_t>(m_gadgets.size()), 4);
   if (gadget.kind == Kind::Stick) {
-    gadget.disks.resize(1);
-    for (std::uint32_t volumes = 1 + Below(2); volumes > 0; --volumes) {
-      gadget.disks[0].push_back(NewVolume());
-    }
+    gadget.disks.emplace_back(1 + Below(2));
   } else if (gadget.kind == Kind::CardReader) {
-    gadget.disks.resize(1 + Below(3));
-    for (auto& slot : gadget.disks) {
-      if (Below(2) == 0) slot.push_back(NewVolume());
-    }
+    for (std::uint32_t slots = 1 + Below(3); slots > 0; --slots) gadget.disks.emplace_back(Below(2));
   }
-  const Text id = gadget.id;
-  return Plug(std::move(gadget)) ? "plug " + platform::ToUtf8(id) : "pause";
+  for (auto& disk : gadget.disks) std::ranges::generate(disk, [this] { return NewVolume(); });
+  Plug(gadget);
 }
 
-std::string RandomPc::PlugAgain() {
-  if (m_away.empty()) return "pause";
-  const std::size_t index = Below(static_cast<std::uint32_t>(m_away.size()));
-  const Gadget gadget = m_away[index];
-  if (!Plug(gadget)) return "pause";
-  m_away.erase(m_away.begin() + static_cast<std::ptrdiff_t>(index));
-  return "plug again " + platform::ToUtf8(gadget.id);
-}
-
-bool RandomPc::Plug(Gadget gadget) {
+void RandomPc::Plug(Gadget& gadget) {
   std::vector<PortChange> free;
   for (const Hub& hub : m_pc->Snapshot().hubs) {
     for (std::uint32_t port = 0; port < hub.ports.size(); ++port) {
       if (hub.ports[port].status == 0) free.push_back({hub.name, port + 1, {}});
     }
   }
-  if (free.empty()) return false;
+  if (free.empty()) return;
   PortChange change = free[Below(static_cast<std::uint32_t>(free.size()))];
-  const Text hubDevice =
-      platform::Replaced(change.hub.substr(0, change.hub.rfind(u"#{")), u'#', u'\\');
+  const Text hub = platform::Replaced(change.hub.substr(0, change.hub.rfind(u"#{")), u'#', u'\\');
   simulated::Plug plug;
-  change.port = AddGadget(plug.fragment, gadget, hubDevice);
+  change.port = AddGadget(plug.fragment, gadget, hub);
   plug.ports.push_back(std::move(change));
-  Apply({0, {}, std::move(plug)});
-  m_plugged.push_back(std::move(gadget));
-  return true;
+  Apply({0, {}, std::move(plug)}, "plug", gadget.id);
+  gadget.plugged = true;
 }
 
 // Whatever hangs below goes along.
-std::string RandomPc::Unplug(std::size_t index) {
-  const Text id = m_plugged[index].id;
-  Apply({0, {}, simulated::Unplug{id}});
+void RandomPc::Unplug(const Gadget& gadget) {
+  Apply({0, {}, simulated::Unplug{gadget.id}}, "unplug", gadget.id);
   const Machine left = m_pc->Snapshot();
-  const auto stays = std::stable_partition(
-      m_plugged.begin(), m_plugged.end(),
-      [&](const Gadget& gadget) { return IndexOf(left.devices, gadget.id).has_value(); });
-  m_away.insert(m_away.end(), stays, m_plugged.end());
-  m_plugged.erase(stays, m_plugged.end());
-  return "unplug " + platform::ToUtf8(id);
-}
-
-std::string RandomPc::Move() {
-  if (m_plugged.empty()) return "pause";
-  const std::size_t index = Below(static_cast<std::uint32_t>(m_plugged.size()));
-  const Text id = m_plugged[index].id;
-  Unplug(index);
-  const std::size_t away = *IndexOf(m_away, id);
-  const Gadget gadget = m_away[away];
-  m_away.erase(m_away.begin() + static_cast<std::ptrdiff_t>(away));
-  Plug(gadget);
-  return "move " + platform::ToUtf8(id);
-}
-
-std::string RandomPc::ChangeCard() {
-  std::vector<std::pair<Gadget*, std::size_t>> slots;
-  for (Gadget& gadget : m_plugged) {
-    if (gadget.kind != Kind::CardReader) continue;
-    for (std::size_t slot = 0; slot < gadget.disks.size(); ++slot) slots.push_back({&gadget, slot});
+  for (Gadget& each : m_gadgets) {
+    each.plugged =
+        each.plugged && std::ranges::any_of(left.devices, [&](const Device& device) { return device.id == each.id; });
   }
-  if (slots.empty()) return "pause";
-  const auto [reader, slot] = slots[Below(static_cast<std::uint32_t>(slots.size()))];
-  const Text diskId = DiskId(*reader, slot);
-  std::vector<Text>& cards = reader->disks[slot];
-  if (!cards.empty()) {
-    Apply({0, {}, simulated::Unplug{VolumeId(diskId, cards[0])}});
+}
+
+void RandomPc::ChangeCard(Gadget& gadget) {
+  if (!gadget.plugged || gadget.kind != Kind::CardReader) return;
+  const std::size_t slot = Below(static_cast<std::uint32_t>(gadget.disks.size()));
+  const Text diskId = DiskId(gadget, slot);
+  std::vector<Text>& cards = gadget.disks[slot];
+  if (cards.empty()) {
+    cards.push_back(NewVolume());
+    simulated::Plug plug;
+    AddVolume(plug.fragment, diskId, cards[0]);
+    Apply({0, {}, std::move(plug)}, "put a card into", diskId);
+  } else {
+    Apply({0, {}, simulated::Unplug{VolumeId(diskId, cards[0])}}, "take the card from", diskId);
     cards.clear();
-    return "take card from " + platform::ToUtf8(diskId);
   }
-  simulated::Plug plug;
-  cards.push_back(NewVolume());
-  AddVolume(plug.fragment, diskId, cards[0]);
-  Apply({0, {}, std::move(plug)});
-  return "put card into " + platform::ToUtf8(diskId);
 }
 
-std::string RandomPc::MountOrDismount() {
+void RandomPc::MountOrDismount() {
   const Machine machine = m_pc->Snapshot();
-  if (machine.volumes.empty()) return "pause";
+  if (machine.volumes.empty()) return;
   const Volume& volume = machine.volumes[Below(static_cast<std::uint32_t>(machine.volumes.size()))];
-  if (!volume.paths.empty() && Below(2) == 0) {
-    Apply({0, {}, Dismount{volume.name, volume.paths[0]}});
-    return "dismount " + platform::ToUtf8(volume.name);
+  if (!volume.paths.empty()) {
+    return Apply({0, {}, Dismount{volume.name, volume.paths[0]}}, "dismount", volume.name);
   }
   const char16_t letter = static_cast<char16_t>(u'E' + Below(20));
-  const auto taken = [&](const Drive& drive) { return drive.letter == letter; };
-  if (std::ranges::any_of(machine.drives, taken)) return "pause";
-  Apply({0, {}, Mount{volume.name, Text(1, letter) + u":\\"}});
-  return "mount " + platform::ToUtf8(volume.name);
+  const auto isTaken = [&](const Drive& drive) { return drive.letter == letter; };
+  if (std::ranges::any_of(machine.drives, isTaken)) return;
+  Apply({0, {}, Mount{volume.name, Text(1, letter) + u":\\"}}, "mount", volume.name);
 }
 
-void RandomPc::Apply(Step step) {
+void RandomPc::Apply(Step step, const char* what, std::u16string_view which) {
+  m_script.append("\n  ").append(what).append(" ").append(platform::ToUtf8(which));
   const Text refused = m_pc->Apply(step);
   if (!refused.empty()) throw std::logic_error(platform::ToUtf8(refused));
 }

@@ -8,7 +8,6 @@
 #include <string>
 #include <vector>
 
-#include "platform/simulated/machine.h"
 #include "platform/simulated/simulated_pc.h"
 
 namespace testing_support {
@@ -28,45 +27,40 @@ struct Gadget {
   Kind kind = Kind::Mouse;
   std::u16string id;
   std::vector<std::vector<std::u16string>> disks;  // the names of the volumes on each
+  bool plugged = false;
 };
+
+// The device-manager id of a stick's disk or of a card reader's slot.
+std::u16string DiskId(const Gadget& gadget, std::size_t disk);
 
 // One or two controllers of four ports each. The same seed makes the same PC and the same changes.
 class RandomPc {
  public:
   explicit RandomPc(std::uint32_t seed);
 
+  // One change, or a pause where there is nothing to change.
+  void Change();
+  std::uint32_t Below(std::uint32_t bound) { return static_cast<std::uint32_t>(m_random() % bound); }
+
   platform::simulated::SimulatedPc& Pc() { return *m_pc; }
-  std::uint32_t Below(std::uint32_t bound) {
-    return static_cast<std::uint32_t>(m_random() % bound);
-  }
-
-  // A random change, and what it was. One that finds nothing to change is a pause.
-  std::string Change();
-
-  // What is plugged in, or has been: ids come back when a device does.
-  const std::vector<Gadget>& Plugged() const { return m_plugged; }
-  const Gadget* Find(const std::u16string& id) const;
+  // All that ever were plugged in; one that comes back is the same as before.
+  const std::vector<Gadget>& Gadgets() const { return m_gadgets; }
+  const std::string& Script() const { return m_script; }
 
  private:
-  std::string PlugNew();
-  std::string PlugAgain();
-  std::string Unplug(std::size_t index);
-  std::string Move();
-  std::string ChangeCard();
-  std::string MountOrDismount();
-  bool Plug(Gadget gadget);
-  void Apply(platform::simulated::Step step);
+  void AddNewGadget();
+  void Plug(Gadget& gadget);
+  void Unplug(const Gadget& gadget);
+  void ChangeCard(Gadget& gadget);
+  void MountOrDismount();
   std::u16string NewVolume();
+  void Apply(platform::simulated::Step step, const char* what, std::u16string_view which);
 
   std::mt19937 m_random;
   std::optional<platform::simulated::SimulatedPc> m_pc;
-  std::vector<Gadget> m_plugged;
-  std::vector<Gadget> m_away;
-  std::uint32_t m_serials = 0;
+  std::vector<Gadget> m_gadgets;
   std::uint32_t m_volumes = 0;
+  std::string m_script;
 };
-
-// The device-manager id of a card reader's slot or a stick's disk.
-std::u16string DiskId(const Gadget& gadget, std::size_t disk);
 
 }  // namespace testing_support

@@ -1,8 +1,7 @@
 // A host whose drivers answer some requests as a test says and all others as the base does.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
+#include <algorithm>
 #include <cstring>
 #include <functional>
 #include <map>
@@ -12,13 +11,13 @@
 
 #include "platform/wrappers/intercepting_host.h"
 
-namespace testing_support {
+namespace KelvoUHW {
 
 class ScriptedDriver : public platform::wrappers::InterceptingHost {
  public:
   // Sees the buffers of one request; returns the outcome.
-  using Answer = std::function<platform::Status(const void* in, std::uint32_t inBytes, void* out,
-                                                std::uint32_t outBytes, std::uint32_t& returned)>;
+  using Answer =
+      std::function<platform::Status(const void* in, void* out, std::uint32_t outBytes, std::uint32_t& returned)>;
 
   using InterceptingHost::InterceptingHost;
 
@@ -29,17 +28,15 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
 
   platform::Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
                                  void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
-    auto& answers = m_answers[code];
-    if (!answers.empty()) {
+    if (auto& answers = m_answers[code]; !answers.empty()) {
       const Answer answer = std::move(answers.front());
       answers.erase(answers.begin());
       returned = 0;
-      return answer(in, inBytes, out, outBytes, returned);
+      return answer(in, out, outBytes, returned);
     }
     const platform::Status status = InterceptingHost::DeviceControl(handle, code, in, inBytes, out, outBytes, returned);
     const auto change = m_changes.find(code);
-    if (!status || change == m_changes.end()) return status;
-    return change->second(in, inBytes, out, outBytes, returned);
+    return !status || change == m_changes.end() ? status : change->second(in, out, outBytes, returned);
   }
 
  private:
@@ -52,7 +49,7 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
 // A name answer: the length it claims at an offset, then characters as far as they fit.
 inline ScriptedDriver::Answer NameAnswer(std::size_t head, std::uint32_t actualLength, std::u16string text,
                                          std::uint32_t received) {
-  return [=](const void*, std::uint32_t, void* out, std::uint32_t outBytes, std::uint32_t& returned) {
+  return [=](const void*, void* out, std::uint32_t outBytes, std::uint32_t& returned) {
     auto* bytes = static_cast<std::uint8_t*>(out);
     if (outBytes >= head) std::memcpy(bytes + head - 4, &actualLength, sizeof actualLength);
     const std::size_t room = outBytes > head ? outBytes - head : 0;
@@ -62,8 +59,8 @@ inline ScriptedDriver::Answer NameAnswer(std::size_t head, std::uint32_t actualL
   };
 }
 
-inline platform::Status RefuseRequest(const void*, std::uint32_t, void*, std::uint32_t, std::uint32_t&) {
+inline platform::Status RefuseRequest(const void*, void*, std::uint32_t, std::uint32_t&) {
   return platform::Status::Failure(31);
 }
 
-}  // namespace testing_support
+}  // namespace KelvoUHW

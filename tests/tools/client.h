@@ -53,12 +53,8 @@ inline std::vector<std::string> Lines(const std::string& text) {
   return lines;
 }
 
-inline std::filesystem::path MachinesFolder() {
-  return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines";
-}
-inline std::string MachineFile(const std::string& name) {
-  return (MachinesFolder() / (name + ".json")).string();
-}
+inline std::filesystem::path MachinesFolder() { return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines"; }
+inline std::string MachineFile(const std::string& name) { return (MachinesFolder() / (name + ".json")).string(); }
 inline Json LoadJson(const std::filesystem::path& path) {
   std::ifstream stream(path);
   return Json::parse(stream);
@@ -67,24 +63,20 @@ inline Json LoadJson(const std::filesystem::path& path) {
 // A file that is gone with its owner.
 class TemporaryFile {
  public:
-  explicit TemporaryFile(const std::string& text) : m_path(FreePath()) {
-    std::ofstream(m_path) << text;
-  }
+  explicit TemporaryFile(const std::string& text) : m_path(FreePath()) { std::ofstream(m_path) << text; }
   ~TemporaryFile() { std::filesystem::remove(m_path); }
   TemporaryFile(const TemporaryFile&) = delete;
   TemporaryFile& operator=(const TemporaryFile&) = delete;
 
-  std::string Path() const { return m_path.string(); }
+  std::string Path() const { return m_path; }
 
  private:
-  static std::filesystem::path FreePath() {
+  static std::string FreePath() {
     static int count = 0;
     const auto* test = testing::UnitTest::GetInstance()->current_test_info();
-    return std::filesystem::path(testing::TempDir()) /
-           (std::string("zkusb-") + test->test_suite_name() + "-" + test->name() + "-" +
-            std::to_string(++count) + ".json");
+    return testing::TempDir() + "zkusb-" + test->test_suite_name() + "-" + test->name() + "-" + std::to_string(++count);
   }
-  std::filesystem::path m_path;
+  std::string m_path;
 };
 
 // The built-in machine with changes.
@@ -100,8 +92,7 @@ inline std::string IdOf(const Json& node) {
   const int product = node.at("ProductId").get<int>();
   if (vendor < 0 || product < 0) return "";
   char text[32];
-  std::snprintf(text, sizeof text, "%04X:%04X", static_cast<unsigned>(vendor),
-                static_cast<unsigned>(product));
+  std::snprintf(text, sizeof text, "%04X:%04X", static_cast<unsigned>(vendor), static_cast<unsigned>(product));
   return text;
 }
 

@@ -1,4 +1,3 @@
-#include <algorithm>
 #include <streambuf>
 
 #include "tests/tools/client.h"
@@ -10,12 +9,14 @@ using testing::HasSubstr;
 using testing::StartsWith;
 using Args = std::vector<std::string>;
 
-// One line that begins with the program's name.
-void ExpectOneLine(const std::string& text, const std::string& part) {
-  EXPECT_THAT(text, StartsWith("zkusb: "));
-  EXPECT_THAT(text, HasSubstr(part));
-  EXPECT_EQ(std::count(text.begin(), text.end(), '\n'), 1) << text;
-  EXPECT_EQ(text.empty() ? ' ' : text.back(), '\n');
+// Refuses with one line that begins with the program's name and `start`.
+void ExpectRefused(const Args& args, const std::string& start, const std::string& part, const std::string& end = "") {
+  SCOPED_TRACE(testing::PrintToString(args));
+  const Result result = RunClient(args);
+  EXPECT_EQ(result.code, kRefused);
+  EXPECT_EQ(result.out, "");
+  EXPECT_THAT(result.err, testing::AllOf(StartsWith("zkusb: " + start), HasSubstr(part), HasSubstr(end)));
+  EXPECT_EQ(result.err.find('\n') + 1, result.err.size());
 }
 
 TEST(CommandLine, RefusesWrongUsageInOneLine) {
@@ -24,38 +25,26 @@ TEST(CommandLine, RefusesWrongUsageInOneLine) {
     std::string reason;
   } cases[] = {
       {{}, "a command is needed"},
-      {{"--json"}, "a command is needed"},
       {{"list"}, "not expected: list"},
       {{"tree", "dump"}, "dump"},
       {{"tree", "--bogus"}, "--bogus"},
-      {{"--bogus", "tree"}, "--bogus"},
       {{"tree", "a\nb\x1b[2J"}, "a\\x0Ab\\x1B[2J"},
       {{"tree", "--machine"}, "--machine"},
       {{"tree", "--machine", "a", "--machine", "b"}, "--machine"},
       {{"--json=no", "tree"}, "json"},
       {{"tree", "--vendor", "1"}, "--vendor"},
       {{"find"}, "--vendor is required"},
-      {{"find", "--product", "1"}, "--vendor is required"},
       {{"find", "--vendor", ""}, "hexadecimal"},
       {{"find", "--vendor", "0x"}, "\"0x\" is not a number of one to four hexadecimal digits"},
-      {{"find", "--vendor", "12345"}, "hexadecimal"},
       {{"find", "--vendor", "0x00781"}, "hexadecimal"},
       {{"find", "--vendor", "78g"}, "hexadecimal"},
       {{"find", "--vendor", "-1"}, "hexadecimal"},
-      {{"find", "--vendor", "+781"}, "hexadecimal"},
       {{"find", "--vendor", "0x0x1"}, "hexadecimal"},
       {{"find", "--vendor", "781", "--product", "zz"}, "--product: \"zz\""},
       {{"find", "--vendor", "781", "--product", ""}, "--product: \"\""},
       {{"watch"}, "watch needs --script FILE"},
   };
-  for (const auto& [args, reason] : cases) {
-    SCOPED_TRACE(testing::PrintToString(args));
-    const Result result = RunClient(args);
-    EXPECT_EQ(result.code, kRefused);
-    EXPECT_EQ(result.out, "");
-    ExpectOneLine(result.err, reason);
-    EXPECT_THAT(result.err, HasSubstr("zkusb --help"));
-  }
+  for (const auto& [args, reason] : cases) ExpectRefused(args, "", reason, "zkusb --help");
 }
 
 TEST(CommandLine, RefusesBadFilesWithTheirPlace) {
@@ -65,8 +54,7 @@ TEST(CommandLine, RefusesBadFilesWithTheirPlace) {
   const TemporaryFile badStep(R"({"steps": [{"at": 5, "unplug": "USB\\NO\\1"}]})");
   const struct {
     Args args;
-    std::string file;
-    std::string reason;
+    std::string file, reason;
   } cases[] = {
       {{"tree", "--machine", "/no/such/file"}, "/no/such/file", "cannot be read"},
       {{"tree", "--machine", noJson.Path()}, noJson.Path(), "line 1, column 16"},
@@ -77,20 +65,12 @@ TEST(CommandLine, RefusesBadFilesWithTheirPlace) {
       {{"dump", "--script", noSteps.Path()}, noSteps.Path(), "steps: is missing"},
       {{"--script", badStep.Path(), "watch"}, badStep.Path(), "steps[0]: "},
   };
-  for (const auto& [args, file, reason] : cases) {
-    SCOPED_TRACE(testing::PrintToString(args));
-    const Result result = RunClient(args);
-    EXPECT_EQ(result.code, kRefused);
-    EXPECT_EQ(result.out, "");
-    EXPECT_THAT(result.err, StartsWith("zkusb: " + file + ": "));
-    ExpectOneLine(result.err, reason);
-  }
+  for (const auto& [args, file, reason] : cases) ExpectRefused(args, file + ": ", reason);
 }
 
 TEST(CommandLine, SaysWhatWasNotFound) {
   const TemporaryFile nothing("{}");
-  const TemporaryFile storageOnly(
-      ChangedMachine([](Json& machine) { machine.erase("hostControllers"); }));
+  const TemporaryFile storageOnly(ChangedMachine([](Json& machine) { machine.erase("hostControllers"); }));
   const TemporaryFile controllersOnly(ChangedMachine([](Json& machine) { machine.erase("hubs"); }));
   const TemporaryFile noStick(R"({"steps": [
       {"unplug": "USB\\VID_0781&PID_5580\\AA010603160707470215"}]})");
@@ -99,15 +79,13 @@ TEST(CommandLine, SaysWhatWasNotFound) {
     Args args;
     std::string message;
   } cases[] = {
-      {{"tree", "--machine", nothing.Path()}, noController},
       {{"dump", "--machine", nothing.Path()}, noController},
       {{"tree", "--machine", storageOnly.Path()}, noController},
       {{"volumes", "--machine", storageOnly.Path(), "--json"}, noController},
       {{"find", "--vendor", "781", "--machine", controllersOnly.Path()}, noController},
       {{"find", "--vendor", "1"}, "zkusb: no device of vendor 0001\n"},
       {{"find", "--vendor", "0781", "--product", "5581"}, "zkusb: no device 0781:5581\n"},
-      {{"volumes", "--script", noStick.Path()},
-       "zkusb: no device carries a volume or a drive letter\n"},
+      {{"volumes", "--script", noStick.Path()}, "zkusb: no device carries a volume or a drive letter\n"},
   };
   for (const auto& [args, message] : cases) {
     SCOPED_TRACE(testing::PrintToString(args));
@@ -121,15 +99,14 @@ TEST(CommandLine, SaysWhatWasNotFound) {
   EXPECT_EQ(json.out, "[]\n");
 }
 
-TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommand) {
+TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
   const std::string file = MachineFile("vmware-win7");
   const std::string expected = Output({"--machine", file, "--json", "tree"});
   EXPECT_EQ(Output({"tree", "--json", "--machine", file}), expected);
   EXPECT_EQ(Output({"--json", "tree", "--machine=" + file}), expected);
   EXPECT_NE(Output({"tree", "--machine", file}), expected);
-}
 
-TEST(CommandLine, HelpAndVersionAreNoFailures) {
+  // Help and version are no failures.
   EXPECT_THAT(Output({"--version"}), testing::MatchesRegex("zkusb [0-9.]+\n"));
   for (const std::string line : {"tree", "dump", "find", "volumes", "watch", "--json"}) {
     EXPECT_THAT(Output({"--help"}), HasSubstr("  " + line));

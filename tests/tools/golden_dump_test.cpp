@@ -1,5 +1,4 @@
-#include <gtest/gtest.h>
-
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -17,18 +16,14 @@ TEST(GoldenDump, EveryMachineIsDumpedByteForByte) {
   std::size_t compared = 0;
   for (const auto& entry : std::filesystem::directory_iterator(MachinesFolder())) {
     if (entry.path().extension() != ".json") continue;
-    const std::filesystem::path golden = std::filesystem::path(ZKUSB_SOURCE_DIR) / "tests" /
-                                         "golden" / (entry.path().stem().string() + ".txt");
+    const std::string golden = ZKUSB_SOURCE_DIR "/tests/golden/" + entry.path().stem().string() + ".txt";
     std::ifstream stream(golden, std::ios::binary);
     ASSERT_TRUE(stream) << golden;
     const std::string expected{std::istreambuf_iterator<char>(stream), {}};
     const std::string dump = Output({"--machine", entry.path().string(), "dump"});
-    const auto [atDump, atExpected] =
-        std::mismatch(dump.begin(), dump.end(), expected.begin(), expected.end());
-    EXPECT_TRUE(dump == expected) << entry.path().stem() << ", from byte " << atDump - dump.begin()
-                                  << ": " << std::string(atDump, dump.end()).substr(0, 80)
-                                  << " instead of "
-                                  << std::string(atExpected, expected.end()).substr(0, 80);
+    const auto differs = std::ranges::mismatch(dump, expected).in1;
+    EXPECT_TRUE(dump == expected) << golden << ", from byte " << differs - dump.begin() << ": "
+                                  << std::string(differs, dump.end()).substr(0, 80);
     ++compared;
   }
   EXPECT_EQ(compared, 4u);

@@ -12,14 +12,11 @@ using testing::Not;
 
 constexpr const char* kMachines[] = {"asus-b560", "dell-precision", "hp-cardreader", "vmware-win7"};
 
-std::size_t Columns(const std::string& line) {
-  return static_cast<std::size_t>(
-      std::count_if(line.begin(), line.end(), [](char byte) { return (byte & 0xC0) != 0x80; }));
-}
-
-std::size_t WidestLine(const std::string& text) {
-  std::size_t widest = 0;
-  for (const std::string& line : Lines(text)) widest = std::max(widest, Columns(line));
+std::ptrdiff_t WidestLine(const std::string& text) {
+  std::ptrdiff_t widest = 0;
+  for (const std::string& line : Lines(text)) {
+    widest = std::max(widest, std::ranges::count_if(line, [](char byte) { return (byte & 0xC0) != 0x80; }));
+  }
   return widest;
 }
 
@@ -31,8 +28,7 @@ std::multiset<std::string> PluggedIn(const Json& machine) {
       if (!port.contains("descriptor") || port.contains("hubName")) continue;
       const auto number = [&](const char* member) {
         const Json& value = port.at("descriptor").at(member);
-        return value.is_string() ? std::stoi(value.get<std::string>(), nullptr, 16)
-                                 : value.get<int>();
+        return value.is_string() ? std::stoi(value.get<std::string>(), nullptr, 16) : value.get<int>();
       };
       ids.insert(IdOf({{"VendorId", number("idVendor")}, {"ProductId", number("idProduct")}}));
     }
@@ -90,7 +86,7 @@ TEST(TreeCommand, NamesEveryDeviceOnceWithinEightyColumns) {
     EXPECT_GE(plugged.size(), 2u);
 
     const std::string text = Output({"tree", "--machine", file});
-    EXPECT_LE(WidestLine(text), 80u);
+    EXPECT_LE(WidestLine(text), 80);
     EXPECT_EQ(DevicesOfText(text), plugged);
 
     std::multiset<std::string> ids;
@@ -98,13 +94,11 @@ TEST(TreeCommand, NamesEveryDeviceOnceWithinEightyColumns) {
     EXPECT_EQ(ids, plugged);
   }
   EXPECT_EQ(Output({"tree", "--machine", MachineFile("dell-precision")}), Output({"tree"}));
-}
-
-TEST(TreeCommand, LeavesInternalDisksOutButNotWhatEventsMayName) {
+  // Internal disks are left out, but not what events may name.
   EXPECT_THAT(Output({"tree"}), Not(HasSubstr("not USB")));
   EXPECT_THAT(Output({"tree", "--machine", MachineFile("vmware-win7")}),
-              HasSubstr("└─ PCI\\VEN_15AD&DEV_07A0&SUBSYS_07A015AD&REV_01\\3&18D45AA6&0&A8 "
-                        "(not USB)\n   └─ VMware, VMware Virtual S SCSI Disk Device\n"));
+              HasSubstr("└─ PCI\\VEN_15AD&DEV_07A0&SUBSYS_07A015AD&REV_01\\3&18D45AA6&0&A8 (not USB)\n"
+                        "   └─ VMware, VMware Virtual S SCSI Disk Device\n"));
 }
 
 TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
@@ -130,14 +124,13 @@ TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
                               "[D:, C:\\All sticks\\One]\n"));
   EXPECT_THAT(text, HasSubstr("├─ Port 5: bad device  low speed  0000:0000 unknown device\n"));
   EXPECT_THAT(text, HasSubstr("└─ Ports 1-2, 4, 6-8: empty\n"));
-  EXPECT_LE(WidestLine(text), 80u);
+  EXPECT_LE(WidestLine(text), 80);
 
   const std::string found = Output({"find", "--vendor", "781", "--machine", file.Path()});
   EXPECT_THAT(found, HasSubstr("SanDisk Corporation, \\x1B[2J Stick \\u202E  D:, C:\\All"));
   const Json json = JsonOutput({"find", "--vendor", "781", "--machine", file.Path()});
   EXPECT_EQ(json.at(0).at("DeviceDescr"), "\u001b[2J   Stick \u202e ");
-  EXPECT_THAT(Output({"dump", "--machine", file.Path()}),
-              HasSubstr("deviceDescr : \u001b[2J   Stick \u202e \r\n"));
+  EXPECT_THAT(Output({"dump", "--machine", file.Path()}), HasSubstr("deviceDescr : \u001b[2J   Stick \u202e \r\n"));
 }
 
 // A hub on the first port of another one, and so on, below the root hub of the first controller.
@@ -160,7 +153,7 @@ TEST(TreeCommand, CopesWithMoreHubsThanFitTheWindow) {
   const TemporaryFile deep(HubChain(60));
   const std::string text = Output({"tree", "--machine", deep.Path()});
   EXPECT_THAT(text, HasSubstr("Port 1: hub 1234:5678 "));
-  EXPECT_EQ(WidestLine(text), 80u);
+  EXPECT_EQ(WidestLine(text), 80);
   EXPECT_GE(Lines(text).size(), 60u);
 
   const TemporaryFile tooDeep(HubChain(250));

@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <map>
 #include <regex>
 
 #include "tests/tools/client.h"
@@ -34,8 +33,8 @@ std::vector<std::string> ComingsAndGoings(const std::vector<Json>& events) {
   std::vector<std::string> result;
   for (const Json& event : events) {
     if (event.at("event") != "KDeviceAttached" && event.at("event") != "KDeviceRemoved") continue;
-    std::string text = std::to_string(event.at("at").get<int>()) + " " +
-                       event.at("event").get<std::string>() + " " + IdOf(event);
+    std::string text =
+        std::to_string(event.at("at").get<int>()) + " " + event.at("event").get<std::string>() + " " + IdOf(event);
     for (const Json& mountPoint : event.at("MountPoints")) {
       text += " " + mountPoint.get<std::string>();
     }
@@ -48,74 +47,56 @@ TEST(WatchCommand, TellsWhatAStickDoes) {
   const std::string script = (ScriptsFolder() / "stick-comes-and-goes.json").string();
   const std::vector<std::string> lines = Lines(Output({"watch", "--script", script}));
   ASSERT_GE(lines.size(), 6u);
-  EXPECT_EQ(lines[0], "3 devices at the start");
-  EXPECT_EQ(lines[1], "+0.000s  the PC as it stands");
-  EXPECT_EQ(lines[2], "  no change");
-  EXPECT_EQ(lines[3], "+1.000s  a Kingston stick goes into port 2");
-  EXPECT_EQ(lines[4],
-            "  +1.000s  attached   0951:1666 Kingston Technology Company USB Mass Storage Device  "
-            "serial 60A44C413FD1B2A1C9A60135  F:  "
-            "\\\\?\\Volume{3869c291-31b8-11e8-9b12-ecf4bb487fed}\\");
-  EXPECT_EQ(lines[5], "  +1.000s  connected  0C45:643F USB Composite Device");
+  EXPECT_THAT(std::vector(lines.begin(), lines.begin() + 6),
+              ElementsAre("3 devices at the start", "+0.000s  the PC as it stands", "  no change",
+                          "+1.000s  a Kingston stick goes into port 2",
+                          "  +1.000s  attached   0951:1666 Kingston Technology Company USB Mass Storage Device  "
+                          "serial 60A44C413FD1B2A1C9A60135  F:  \\\\?\\Volume{3869c291-31b8-11e8-9b12-ecf4bb487fed}\\",
+                          "  +1.000s  connected  0C45:643F USB Composite Device"));
   // What left still says where it was mounted.
-  EXPECT_THAT(lines, testing::Contains(testing::AllOf(HasSubstr("+6.000s  removed    0951:1666"),
-                                                      HasSubstr("serial 60A44C413FD1B2A1C9A60135"),
-                                                      HasSubstr("  F:  "))));
-  EXPECT_THAT(
-      ComingsAndGoings(JsonLines(Output({"watch", "--json", "--script", script}))),
-      ElementsAre("1000 KDeviceAttached 0951:1666 F:\\", "6000 KDeviceRemoved 0951:1666 F:\\"));
+  EXPECT_THAT(lines,
+              testing::Contains(testing::AllOf(HasSubstr("+6.000s  removed    0951:1666"),
+                                               HasSubstr("serial 60A44C413FD1B2A1C9A60135"), HasSubstr("  F:  "))));
+  EXPECT_THAT(ComingsAndGoings(JsonLines(Output({"watch", "--json", "--script", script}))),
+              ElementsAre("1000 KDeviceAttached 0951:1666 F:\\", "6000 KDeviceRemoved 0951:1666 F:\\"));
 }
 
 // For every script at hand: text and JSON tell the same events in the order in which clients hear
 // of them, and what is attached is what the port devices grow by.
 TEST(WatchCommand, TellsEveryScriptInOrder) {
-  const std::map<std::string, int> order{{"KDeviceAttached", 0},
-                                         {"KDeviceConnected", 1},
-                                         {"KDeviceRemoved", 2},
-                                         {"KDeviceModified", 3}};
-  const std::regex eventLine(
-      "  \\+[0-9]+\\.[0-9]{3}s  (attached|connected|removed|modified) +"
-      "([0-9A-F]{4}:[0-9A-F]{4}).*");
-  ASSERT_TRUE(std::filesystem::is_directory(ScriptsFolder()));
+  const std::vector<std::string> order{"attached", "connected", "removed", "modified"};
+  const std::regex eventLine("  \\+[0-9]+\\.[0-9]{3}s  ([a-z]+) +([0-9A-F]{4}:[0-9A-F]{4}).*");
   int scripts = 0;
   for (const auto& entry : std::filesystem::directory_iterator(ScriptsFolder())) {
     SCOPED_TRACE(entry.path().string());
     ++scripts;
     const Json script = LoadJson(entry.path());
-    const std::vector<std::string> args{"watch", "--machine", MachineOf(script), "--script",
-                                        entry.path().string()};
-    std::vector<std::string> told;
+    std::vector<std::string> args{"watch", "--machine", MachineOf(script), "--script", entry.path().string()};
+    std::vector<std::string> told, toldAsJson;
     std::size_t steps = 0;
     for (const std::string& line : Lines(Output(args))) {
       std::smatch match;
-      if (std::regex_match(line, match, eventLine)) {
-        told.push_back(match[1].str() + " " + match[2].str());
-      } else if (line.starts_with("+")) {
-        ++steps;
-      }
+      if (std::regex_match(line, match, eventLine)) told.push_back(match[1].str() + " " + match[2].str());
+      steps += line.starts_with("+") ? 1 : 0;
     }
     EXPECT_EQ(steps, script.at("steps").size());
     EXPECT_GE(told.size(), 3u);
 
-    std::vector<std::string> args2 = args;
-    args2.push_back("--json");
-    std::vector<std::string> toldAsJson;
+    args.push_back("--json");
     std::vector<std::string> stepNames;
-    std::pair<std::string, int> latest;
-    for (const Json& line : JsonLines(Output(args2))) {
+    auto latest = order.begin();
+    for (const Json& line : JsonLines(Output(args))) {
       if (!line.contains("step")) continue;
-      const std::string step = line.at("step");
-      if (stepNames.empty() || stepNames.back() != step) stepNames.push_back(step);
-      if (line.at("event").is_null()) continue;
-      const std::string event = line.at("event");
-      const std::pair now(step, order.at(event));
-      if (latest.first == now.first) {
-        EXPECT_LE(latest.second, now.second);
+      if (stepNames.empty() || stepNames.back() != line.at("step")) {
+        stepNames.push_back(line.at("step"));
+        latest = order.begin();
       }
-      latest = now;
-      std::string word = event.substr(std::string("KDevice").size());
-      word[0] = static_cast<char>(word[0] - 'A' + 'a');
-      toldAsJson.push_back(word + " " + IdOf(line));
+      if (line.at("event").is_null()) continue;
+      std::string event = line.at("event").get<std::string>().substr(std::string("KDevice").size());
+      event[0] = static_cast<char>(event[0] - 'A' + 'a');
+      latest = std::find(latest, order.end(), event);  // found only where it does not go back
+      ASSERT_NE(latest, order.end()) << line;
+      toldAsJson.push_back(event + " " + IdOf(line));
     }
     EXPECT_EQ(toldAsJson, told);
     EXPECT_EQ(stepNames.size(), steps);
@@ -125,10 +106,6 @@ TEST(WatchCommand, TellsEveryScriptInOrder) {
 
 TEST(WatchCommand, WatchesAPcWithoutController) {
   const TemporaryFile machine("{}");
-  const TemporaryFile script(R"({"steps": [{"at": 61005}, {"at": 61005, "name": "\u001b"}]})");
-  const Result bad = RunClient({"watch", "--machine", machine.Path(), "--script", script.Path()});
-  EXPECT_EQ(bad.code, kRefused);  // each step needs its kind
-
   const TemporaryFile waits(
       R"({"steps": [{"at": 61005, "wait": true}, {"at": 61005, "name": "\u001b", "wait": true}]})");
   EXPECT_EQ(Output({"watch", "--machine", machine.Path(), "--script", waits.Path()}),

@@ -39,47 +39,34 @@ TEST(Writer, EscapesWhatATerminalWouldObey) {
 }
 
 TEST(Writer, FitsALineIntoItsColumns) {
-  const auto repeated = [](std::u16string_view text, std::size_t times) {
-    std::u16string all;
-    for (std::size_t i = 0; i < times; ++i) all += text;
-    return all;
-  };
-  const std::u16string disk = u"\U0001F5B4";
+  const auto times = [](std::size_t count, char16_t unit) { return std::u16string(count, unit); };
+  std::u16string disks;
+  while (disks.size() < 160) disks += u"\U0001F5B4";
   const struct {
     std::u16string head, middle, tail;
     std::string line;
   } cases[] = {
       {u"head ", u"middle", u" tail", "head middle tail\n"},
-      {repeated(u"h", 30), repeated(u"m", 40), repeated(u"t", 10),
+      {times(30, u'h'), times(40, u'm'), times(10, u't'),
        std::string(30, 'h') + std::string(40, 'm') + std::string(10, 't') + "\n"},
-      {repeated(u"h", 30), repeated(u"m", 41), repeated(u"t", 10),
+      {times(30, u'h'), times(41, u'm'), times(10, u't'),
        std::string(30, 'h') + std::string(39, 'm') + "…" + std::string(10, 't') + "\n"},
-      {repeated(u"h", 60), u"Mass Storage Device", u" tail",
-       std::string(60, 'h') + "Mass Storage D… tail\n"},
+      {times(60, u'h'), u"Mass Storage Device", u" tail", std::string(60, 'h') + "Mass Storage D… tail\n"},
       // No blank is left in front of the ellipsis.
-      {repeated(u"h", 61), u"Mass Storage Device", u" tail",
-       std::string(61, 'h') + "Mass Storage… tail\n"},
+      {times(61, u'h'), u"Mass Storage Device", u" tail", std::string(61, 'h') + "Mass Storage… tail\n"},
       // The tail stays as long as there is room for the ellipsis.
-      {repeated(u"h", 73), u"middle", u"tail", std::string(73, 'h') + "mi…tail\n"},
-      {repeated(u"h", 75), u"middle", u"tail", std::string(75, 'h') + "…tail\n"},
-      {repeated(u"h", 76), u"middle", u"tail", std::string(76, 'h') + "mid…\n"},
-      {repeated(u"h", 100), u"", u"", std::string(79, 'h') + "…\n"},
+      {times(73, u'h'), u"middle", u"tail", std::string(73, 'h') + "mi…tail\n"},
+      {times(75, u'h'), u"middle", u"tail", std::string(75, 'h') + "…tail\n"},
+      {times(76, u'h'), u"middle", u"tail", std::string(76, 'h') + "mid…\n"},
+      {times(100, u'h'), u"", u"", std::string(79, 'h') + "…\n"},
       // Columns are code points, and an escaped character has four.
-      {u"", repeated(disk, 80), u"", std::string()},
-      {u"", repeated(u"\x1B", 20), u"", std::string()},
+      {u"", disks, u"", ""},
+      {u"", times(20, u'\x1B'), u"", ""},
   };
   for (const auto& [head, middle, tail, line] : cases) {
-    const std::string written =
-        Written([&, h = head, m = middle, t = tail](Writer& out) { out.FittedLine(h, m, t); });
-    if (!line.empty()) {
-      EXPECT_EQ(written, line);
-    } else {
-      EXPECT_EQ(written.find("…"), std::string::npos) << written;
-    }
+    const std::string written = Written([&, h = head, m = middle, t = tail](Writer& out) { out.FittedLine(h, m, t); });
+    EXPECT_TRUE(line.empty() ? written.find("…") == written.npos : written == line) << written;
   }
-}
-
-TEST(Writer, TidiesPadding) {
   EXPECT_EQ(Tidied(u"  USB   SanDisk 3.2Gen1  "), u"USB SanDisk 3.2Gen1");
   EXPECT_EQ(Tidied(u"    "), u"");
 }

@@ -1,14 +1,8 @@
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
-#include <cstdint>
 #include <new>
-#include <ostream>
 #include <string>
-#include <vector>
 
-#include "platform/simulated/simulated_pc.h"
-#include "platform/simulated/steps.h"
 #include "tests/support/desk_pc.h"
 #include "tests/support/failing_memory.h"
 #include "tree/publication.h"
@@ -16,85 +10,67 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::OpenCounts;
-using testing_support::FailingAllocation;
-using testing_support::WellFedHost;
-
 struct Newcomer {
-  const char* what;
-  Plug plug;
+  Change plug;
   const char* lists;  // of the first build that sees it
   // Of one behind a build that failed after it had seen it: a device that is added in two builds
   // without a commit between them is attached twice.
   const char* listsOfSecond;
-
-  friend void PrintTo(const Newcomer& change, std::ostream* out) { *out << change.what; }
 };
 
 // The lists of the build after one that ran out of memory.
 std::string BuildAfterFailure(const Machine& machine, const Newcomer& change, std::uint64_t allocation, bool& failed) {
-  SimulatedPc pc(machine);
-  WellFedHost host(pc);
-  CZKUMUsbTreeBuilder builder(host);
-  EXPECT_TRUE(builder.Build());
-  builder.CommitDeviceCache();
-  EXPECT_EQ(pc.Apply(StepOf(change.plug)), u"");
-  const NodePtr root = builder.Root();
-  std::vector<DeviceList> lists;
-  for (std::size_t kind = 0; kind < 4; ++kind) lists.push_back(*builder.GetDeviceList(kind));
-
+  Desk<WellFedHost> desk(machine);
+  EXPECT_TRUE(desk.builder.Build());
+  desk.builder.CommitDeviceCache();
+  desk.Do({change.plug});
+  const NodePtr root = desk.builder.Root();
+  const std::vector<DeviceList> lists = desk.Lists();
   bool thrown = false;
   {
     const FailingAllocation failing(allocation);
     try {
-      builder.Build();
+      desk.builder.Build();
     } catch (const std::bad_alloc&) {  // and nothing else
       thrown = true;
     }
     failed = failing.Failed();
   }
-  const OpenCounts open = pc.Open();
+  const OpenCounts open = desk.pc.Open();
   EXPECT_EQ(open.files + open.imageLists + open.searches, 0u);
   if (thrown) {
-    EXPECT_EQ(builder.Root(), root);
-    for (std::size_t kind = 0; kind < 4; ++kind) {
-      EXPECT_EQ(*builder.GetDeviceList(kind), lists[kind]);
-    }
-    EXPECT_EQ(builder.ConnectedCopy(), lists[0]);
+    EXPECT_EQ(desk.builder.Root(), root);
+    EXPECT_EQ(desk.Lists(), lists);
+    EXPECT_EQ(desk.builder.ConnectedCopy(), lists[0]);
     // The failed build may have taken device records over; every climb ends all the same.
     VisitPreOrder(root, [](const NodePtr& node) {
       EXPECT_TRUE(ReachesRoot(*node) || node->m_nType >= KUDTInfoDevice);
       return true;
     });
-    if (!builder.Build()) return "same";
+    if (!desk.builder.Build()) return "same";
   }
-  EXPECT_TRUE(pc.Misuses().empty());
-  return ListsText(builder);
+  EXPECT_TRUE(desk.pc.Misuses().empty());
+  return ListsText(desk.builder);
 }
 
-class BuildWithoutMemory : public testing::TestWithParam<Newcomer> {};
-
-TEST_P(BuildWithoutMemory, PublishesNothingAndTheNextOneWorks) {
-  Machine machine = BarePc();
-  for (const Plug& plug : {InternalDisk(), ExternalHub(u"HUB", 1), Gadget(u"M1", 1, UsbId(u"HUB")),
-                           Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)}) {
-    ASSERT_EQ(CarryOut(machine, plug), u"");
+TEST(BuildWithoutMemory, PublishesNothingAndTheNextOneWorks) {
+  const Machine machine =
+      Desk<WellFedHost>(BarePc(), {InternalDisk(), ExternalHub(u"HUB", 1), Gadget(u"M1", 1, UsbId(u"HUB")),
+                                   Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)})
+          .pc.Snapshot();
+  const Newcomer newcomers[] = {
+      {Stick(u"S2", 4, u'F'), "M1 S1 CR S2 | S2 | - | S1 CR CR", "M1 S1 CR S2 | S2 S2 | - | S1 CR CR"},
+      {Volume(DiskId(u"CR"), u'F'), "M1 S1 CR | - | - | S1 CR CR", "M1 S1 CR | - | - | S1 CR CR"}};
+  for (const Newcomer& newcomer : newcomers) {
+    std::uint64_t allocation = 1;
+    for (bool failed = true; failed; ++allocation) {
+      EXPECT_THAT(BuildAfterFailure(machine, newcomer, allocation, failed),
+                  testing::AnyOf(newcomer.lists, newcomer.listsOfSecond));
+      ASSERT_FALSE(HasFailure()) << newcomer.lists << ": " << allocation;
+    }
+    EXPECT_GT(allocation, 500u);
   }
-  std::uint64_t allocation = 1;
-  for (bool failed = true; failed; ++allocation) {
-    EXPECT_THAT(BuildAfterFailure(machine, GetParam(), allocation, failed),
-                testing::AnyOf(GetParam().lists, GetParam().listsOfSecond));
-    ASSERT_FALSE(HasFailure()) << allocation;
-  }
-  EXPECT_GT(allocation, 500u);
 }
-
-INSTANTIATE_TEST_SUITE_P(Changes, BuildWithoutMemory,
-                         testing::Values(Newcomer{"Stick", Stick(u"S2", 4, u'F'), "M1 S1 CR S2 | S2 | - | S1 CR CR",
-                                                  "M1 S1 CR S2 | S2 S2 | - | S1 CR CR"},
-                                         Newcomer{"Card", Volume(DiskId(u"CR"), u'F'), "M1 S1 CR | - | - | S1 CR CR",
-                                                  "M1 S1 CR | - | - | S1 CR CR"}),
-                         [](const auto& change) { return std::string(change.param.what); });
 
 }  // namespace
 }  // namespace KelvoUHW

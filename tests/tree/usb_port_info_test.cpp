@@ -24,9 +24,7 @@ TEST(ConnectionRecord, BeginsAtZeroAndIsCounted) {
   ConnectionRecord::KeepForProcessLife(nullptr);
   EXPECT_EQ(ConnectionRecord::KeptCount(), kept);
   // A leak checker that runs at the end of this program must find both of them.
-  for (int i = 0; i < 2; ++i) {
-    ConnectionRecord::KeepForProcessLife(std::make_unique<ConnectionRecord>());
-  }
+  for (int i = 0; i < 2; ++i) ConnectionRecord::KeepForProcessLife(std::make_unique<ConnectionRecord>());
   EXPECT_EQ(ConnectionRecord::KeptCount(), kept + 2);
   EXPECT_EQ(ConnectionRecord::LiveCount(), live + 2);
 }
@@ -38,11 +36,9 @@ TEST(StringDescriptor, TextEndsWithItsLengthOrTheBytes) {
   } const cases[] = {
       {{}, u""},
       {{6}, u""},
-      {{0, 3, 'A', 0}, u""},
       {{3, 3, 'A', 0}, u""},
       {{5, 3, 'A', 0, 'B', 0}, u"A"},
       {{6, 3, 0x34, 0x12, 'B', 0}, u"\u1234B"},
-      {{200, 3, 'A', 0, 'B', 0}, u"AB"},
       {{200, 3, 'A', 0, 'B'}, u"A"},
   };
   for (const auto& c : cases) {
