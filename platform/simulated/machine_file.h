@@ -22,7 +22,8 @@ Machine ParseMachine(std::string_view json, const std::string& file);
 // before them leave. Throws MachineFileError.
 Script ParseScript(std::string_view json, const std::string& file, const Machine& machine);
 
-// The same from a file; one that cannot be read is a MachineFileError too ("FILE: cannot be read: ...").
+// The same from a file; one that cannot be read is a MachineFileError too ("FILE: cannot be read:
+// ...").
 Machine LoadMachine(const std::string& path);
 Script LoadScript(const std::string& path, const Machine& machine);
 
