@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "devinfo/devnode.h"
+#include "devinfo/info_device_linking.h"
 
 namespace KelvoUHW {
 
@@ -31,6 +32,9 @@ Publication::Publication(platform::DeviceManager& manager, InfoDeviceCache& devi
 
 void Publication::Run(DeviceLists& lists) {
   ForgetWhatLeft();
+  // A record that came back still held the children of its first stay, and refused the same nodes
+  // of the second as being there already; those it forgot have made room.
+  LinkToParents(m_devices.Current());
   AttachInterfaceDevices();
 
   TreeIndex index(m_building);
