@@ -288,6 +288,26 @@ TEST(Walk, AHubIsWalkedOnce) {
   }
 }
 
+// Every controller and hub is opened for writing, shared for writing, and nothing else.
+TEST(Walk, OpensWithOneAccess) {
+  class AccessHost final : public ScriptedDriver {
+   public:
+    using ScriptedDriver::ScriptedDriver;
+    platform::Status OpenDevice(const char16_t* path, std::uint32_t access, std::uint32_t share,
+                                platform::FileHandle& handle) noexcept override {
+      EXPECT_EQ(access, 0x40000000u);
+      EXPECT_EQ(share, 2u);
+      ++opens;
+      return ScriptedDriver::OpenDevice(path, access, share, handle);
+    }
+    int opens = 0;
+  };
+  SimulatedPc pc(Busy());
+  AccessHost host(pc);
+  CZKUMTopologyWalker(host).StartWalk();
+  EXPECT_EQ(host.opens, 12);  // ten names, the root hub, the external hub
+}
+
 // Fails every call in turn, once and from then on.
 TEST(Walk, AnyCallMayFail) {
   SimulatedPc pc(Busy());
