@@ -11,6 +11,7 @@
 #include "devinfo/info_device_linking.h"
 #include "devinfo/property_reader.h"
 #include "platform/text.h"
+#include "tree/record_lock.h"
 
 namespace KelvoUHW {
 
@@ -94,7 +95,10 @@ bool InfoDeviceCache::Collect(const NodePtr& treeRoot) {
   ReturnHeldParents();
   FindRemoved();
   HoldBack(AncestorsOfRemoved());
-  LinkToParents(m_current);
+  {
+    const RecordWriteLock lock;
+    LinkToParents(m_current);
+  }
   SortPending(treeRoot);
   return m_nAddedCount > 0 || m_nRemovedCount > 0;
 }

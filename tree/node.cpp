@@ -5,6 +5,7 @@
 
 #include "devinfo/devnode.h"
 #include "platform/text.h"
+#include "tree/record_lock.h"
 
 namespace KelvoUHW {
 
@@ -24,6 +25,8 @@ void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
   record->m_pParent = t_deletions.waiting;
   t_deletions.waiting = record;
   if (t_deletions.running) return;
+  // A build follows parent links while it joins records: none may die under it on another thread.
+  const RecordReadLock lock;
   t_deletions.running = true;
   while (CZKUMUsbTreeNodeImpl* next = t_deletions.waiting) {
     t_deletions.waiting = next->m_pParent;

@@ -12,22 +12,12 @@
 #include <string_view>
 #include <vector>
 
+#include "com/device_types.h"
 #include "devinfo/identifiers.h"
 #include "platform/host.h"
 #include "tree/ring_ptr.h"
 
 namespace KelvoUHW {
-
-enum TUsbDeviceType : std::int32_t {
-  KUDTUnknown = 0,
-  KUDTRoot = 1,
-  KUDTHostController = 2,
-  KUDTHub = 3,
-  KUDTHubPort = 4,
-  KUDTPortDevice = 5,
-  KUDTInfoDevice = 6,
-  KUDTInterfaceDevice = 7,
-};
 
 class CZKUMUsbTreeNodeImpl;
 using NodePtr = RingPtr<CZKUMUsbTreeNodeImpl>;

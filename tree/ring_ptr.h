@@ -89,6 +89,9 @@ class RingPtr : private RingLink {
     }
   }
 
+  // Lets go and never deletes the record.
+  void Abandon() noexcept { Leave(); }
+
   T* Get() const noexcept { return m_pRecord; }
   T* operator->() const noexcept { return m_pRecord; }
   T& operator*() const noexcept { return *m_pRecord; }

@@ -2,6 +2,7 @@
 
 #include "tree/device_forest.h"
 #include "tree/publication.h"
+#include "tree/record_lock.h"
 
 namespace KelvoUHW {
 
@@ -20,8 +21,11 @@ bool CZKUMUsbTreeBuilder::Build() {
     m_walker.Abort();
     return false;
   }
-  Publication(m_host, m_deviceInfo, m_storage.Volumes(), m_walker.m_building, m_walker.m_current)
-      .Run(m_deviceLists);
+  {
+    const RecordWriteLock lock;
+    Publication(m_host, m_deviceInfo, m_storage.Volumes(), m_walker.m_building, m_walker.m_current)
+        .Run(m_deviceLists);
+  }
   m_walker.Commit();
   m_bOwesPublication = false;
   return true;

@@ -1,0 +1,39 @@
+// How a text property reaches the caller.
+#pragma once
+
+#include <string_view>
+
+#include "com/com_error.h"
+#include "platform/com.h"
+#include "tree/record_lock.h"
+
+namespace KelvoUHW {
+
+// A text is first made into a BSTR of its own, which raises E_OUTOFMEMORY when it cannot be, and
+// only then is the out pointer tested. Both are meant: callers see the exception also where they
+// pass null.
+class IntermediateBstr {
+ public:
+  explicit IntermediateBstr(std::u16string_view text);
+  ~IntermediateBstr() { SysFreeString(m_text); }
+  IntermediateBstr(const IntermediateBstr&) = delete;
+  IntermediateBstr& operator=(const IntermediateBstr&) = delete;
+
+  // A second copy for the caller: E_POINTER for null, E_OUTOFMEMORY when the copy cannot be made.
+  HRESULT CopyTo(BSTR* out) const noexcept;
+
+ private:
+  BSTR m_text;
+};
+
+// `read` gives the text, as a view or a string of its own; it is called also where `out` is null.
+template <class Read>
+HRESULT ReadText(BSTR* out, Read read) {
+  return GuardedRaising([&] {
+    if (out) *out = nullptr;
+    const RecordReadLock lock;
+    return IntermediateBstr(read()).CopyTo(out);
+  });
+}
+
+}  // namespace KelvoUHW

@@ -1,0 +1,56 @@
+// The system's COM functions for builds without the system: what libraries link instead of ole32
+// and oleaut32. Callable from every thread.
+//
+// Public source: the published headers oleauto.h and combaseapi.h.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "platform/native/com_interfaces.h"
+
+// A null result means that memory ran out, or that `text` is null (SysAllocString).
+BSTR SysAllocString(const char16_t* text) noexcept;
+BSTR SysAllocStringLen(const char16_t* text, UINT characters) noexcept;
+void SysFreeString(BSTR text) noexcept;  // null is allowed
+UINT SysStringLen(BSTR text) noexcept;   // in characters, 0 for null
+UINT SysStringByteLen(BSTR text) noexcept;
+
+void VariantInit(VARIANT* variant) noexcept;
+// Frees the text or releases the interface that the VARIANT holds.
+HRESULT VariantClear(VARIANT* variant) noexcept;
+// Clears the target, then copies: E_OUTOFMEMORY leaves it empty. DISP_E_BADVARTYPE for a type that
+// VARENUM does not list.
+HRESULT VariantCopy(VARIANT* target, const VARIANT* source) noexcept;
+
+// Enters the calling thread into an apartment: S_OK, S_FALSE when it is in one of that kind, or
+// RPC_E_CHANGED_MODE. Each success is paired with CoUninitialize on the same thread.
+HRESULT CoInitializeEx(void* reserved, DWORD concurrencyModel) noexcept;
+void CoUninitialize() noexcept;
+
+namespace platform::native {
+
+// Texts alive now, and those ever allocated, by SysAllocString and VariantCopy.
+struct BstrCounts {
+  std::int64_t alive = 0;
+  std::int64_t allocated = 0;
+};
+BstrCounts CountBstrs() noexcept;
+
+// From construction to destruction the n-th text this thread allocates, counted from 1, fails, and
+// all behind it succeed. One at a time.
+class FailingBstr {
+ public:
+  explicit FailingBstr(std::uint64_t allocation) noexcept;
+  ~FailingBstr();
+  FailingBstr(const FailingBstr&) = delete;
+  FailingBstr& operator=(const FailingBstr&) = delete;
+  bool Failed() const noexcept;  // whether it came to the failure
+};
+
+// The result of this thread's next CoInitializeEx in place of what it would be.
+void FailNextCoInitialize(HRESULT result) noexcept;
+// How often the calling thread has entered an apartment that it has not left.
+std::uint32_t ApartmentDepth() noexcept;
+
+}  // namespace platform::native

@@ -1,0 +1,22 @@
+#include "platform/system.h"
+
+#include <mutex>
+
+namespace platform {
+
+namespace {
+constinit std::mutex g_mutex;
+constinit System g_system;
+}  // namespace
+
+System CurrentSystem() noexcept {
+  const std::lock_guard lock(g_mutex);
+  return g_system;
+}
+
+void SetCurrentSystem(const System& system) noexcept {
+  const std::lock_guard lock(g_mutex);
+  g_system = system;
+}
+
+}  // namespace platform
