@@ -4,8 +4,10 @@
 #include <utility>
 #include <vector>
 
+#include "com/com_ptr.h"
 #include "com/node_enumerator.h"
 #include "com/text_property.h"
+#include "com/variant_enumerator.h"
 #include "platform/text.h"
 #include "tree/record_lock.h"
 
@@ -162,6 +164,15 @@ HRESULT CZKUMUsbTreeNode::get_Product(BSTR* pVal) {
   if (pVal == nullptr || !m_node) return E_POINTER;
   const RecordReadLock lock;
   return CopyUntested(m_node->m_strProduct, pVal);
+}
+
+// The owner that the enumerator keeps alive is a second object on the same record, not this one.
+// This is meant: whoever holds the enumerator holds the record, and keeps this object himself.
+HRESULT CZKUMUsbTreeNode::MakeCollection(IEnumVARIANT** out,
+                                         const VariantVector& items) const noexcept {
+  ComPtr<IZKUMUsbTreeNode> owner;
+  const HRESULT result = CreateNodeObject(m_node, owner.Put());
+  return FAILED(result) ? result : MakeVariantEnum(out, owner.Get(), &items);
 }
 
 }  // namespace KelvoUHW

@@ -3,6 +3,7 @@
 #pragma once
 
 #include "com/object.h"
+#include "com/variant.h"
 #include "com/zkusb_monitor.h"
 #include "tree/node.h"
 
@@ -40,7 +41,8 @@ class CZKUMUsbTreeNode : public ObjectRoot, public IZKUMUsbTreeNode, public IZKU
   HRESULT STDMETHODCALLTYPE get_Product(BSTR* pVal) override;
 
  protected:
-  const NodePtr& Node() const noexcept { return m_node; }
+  // An enumerator over a collection that this object owns; `*out` is null already where given.
+  HRESULT MakeCollection(IEnumVARIANT** out, const VariantVector& items) const noexcept;
 
  private:
   NodePtr m_node;

@@ -1,0 +1,56 @@
+#include "com/interface_device_node.h"
+
+#include "com/com_ptr.h"
+#include "com/text_property.h"
+#include "com/variant_enumerator.h"
+#include "platform/text.h"
+#include "tree/record_lock.h"
+
+namespace KelvoUHW {
+
+CZKUMInterfaceDevice::~CZKUMInterfaceDevice() = default;
+
+void CZKUMInterfaceDevice::SetImpl(const NodePtr& node) noexcept {
+  CZKUMUsbTreeNode::SetImpl(node);
+  m_device = node.StaticCast<CZKUMInterfaceDeviceImpl>();
+}
+
+HRESULT CZKUMInterfaceDevice::get_VolumeName(BSTR* pVal) {
+  return ReadText(pVal, [&] { return std::u16string_view(m_device->VolumeName); });
+}
+
+HRESULT CZKUMInterfaceDevice::get_VendorId(BSTR* pVal) {
+  return ReadText(pVal, [&] { return std::u16string_view(m_device->StorageVendorId); });
+}
+
+HRESULT CZKUMInterfaceDevice::get_ProductId(BSTR* pVal) {
+  return ReadText(pVal, [&] { return std::u16string_view(m_device->StorageProductId); });
+}
+
+HRESULT CZKUMInterfaceDevice::get_ProductRev(BSTR* pVal) {
+  return ReadText(pVal, [&] { return std::u16string_view(m_device->ProductRev); });
+}
+
+HRESULT CZKUMInterfaceDevice::get_DevicePath(BSTR* pVal) {
+  return ReadText(pVal, [&] { return m_device->DevicePath(); });
+}
+
+HRESULT CZKUMInterfaceDevice::get_MountPoint(BSTR* pVal) {
+  return ReadText(pVal, [&] { return m_device->MountPoint(); });
+}
+
+HRESULT CZKUMInterfaceDevice::get_MountPoints(IEnumVARIANT** ppIUsbTreeNode) {
+  return GuardedRaising([&] {
+    if (ppIUsbTreeNode) *ppIUsbTreeNode = nullptr;
+    m_mountPoints.clear();
+    for (const std::u16string& mountPoint : m_device->MountPoints) {
+      const BSTR copy = platform::MakeBstr(platform::UpToZero(mountPoint));
+      if (copy == nullptr) throw ComError(E_OUTOFMEMORY);
+      Variant element = Variant::OfBstr(copy);
+      m_mountPoints.push_back(std::move(element));
+    }
+    return MakeCollection(ppIUsbTreeNode, m_mountPoints);
+  });
+}
+
+}  // namespace KelvoUHW

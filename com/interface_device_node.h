@@ -1,0 +1,36 @@
+// The node object of a disk or volume.
+#pragma once
+
+#include "com/node_object.h"
+#include "com/variant.h"
+#include "devinfo/interface_device.h"
+
+namespace KelvoUHW {
+
+// Reads of the typed record are not tested, see typed_nodes.h.
+class CZKUMInterfaceDevice : public CZKUMUsbTreeNode, public IZKUMInterfaceDevice {
+ public:
+  using Interfaces = InterfaceMap<IZKUMUsbTreeNode, IZKUMUsbDevice, IZKUMInterfaceDevice>;
+
+  ~CZKUMInterfaceDevice() override;
+  void SetImpl(const NodePtr& node) noexcept override;
+
+  using CZKUMUsbTreeNode::get_ProductId;
+  using CZKUMUsbTreeNode::get_VendorId;
+  HRESULT STDMETHODCALLTYPE get_VolumeName(BSTR* pVal) override;
+  HRESULT STDMETHODCALLTYPE get_VendorId(BSTR* pVal) override;
+  HRESULT STDMETHODCALLTYPE get_ProductId(BSTR* pVal) override;
+  HRESULT STDMETHODCALLTYPE get_ProductRev(BSTR* pVal) override;
+  HRESULT STDMETHODCALLTYPE get_DevicePath(BSTR* pVal) override;
+  HRESULT STDMETHODCALLTYPE get_MountPoint(BSTR* pVal) override;
+  // Refills the one collection of this object, also for a null pointer, and raises E_OUTOFMEMORY
+  // when a text cannot be copied. The enumerator keeps the record, but the object must be kept for
+  // as long as the enumerator is used: it owns the collection. All of it is meant.
+  HRESULT STDMETHODCALLTYPE get_MountPoints(IEnumVARIANT** ppIUsbTreeNode) override;
+
+ private:
+  RingPtr<CZKUMInterfaceDeviceImpl> m_device;
+  VariantVector m_mountPoints;
+};
+
+}  // namespace KelvoUHW
