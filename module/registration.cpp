@@ -1,10 +1,10 @@
 #include "module/registration.h"
 
-#include <new>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "com/com_error.h"
 #include "module/registrar.h"
 #include "platform/text.h"
 
@@ -161,24 +161,20 @@ HRESULT UnregisterLibrary(const RegistrationSystem& system, const std::u16string
 
 // Runs `work` with the module's path under the system's locale.
 template <class Work>
-HRESULT Guarded(const RegistrationSystem& system, Work work) noexcept {
+HRESULT UnderSystemLocale(const RegistrationSystem& system, Work work) noexcept {
   const SystemLocale locale(system.environment);
-  try {
+  return Guarded([&] {
     std::u16string modulePath;
     HRESULT result = ReadModulePath(system.environment, modulePath);
     if (SUCCEEDED(result)) result = work(modulePath);
     return FAILED(result) ? result : S_OK;
-  } catch (const std::bad_alloc&) {
-    return E_OUTOFMEMORY;
-  } catch (...) {
-    return E_FAIL;
-  }
+  });
 }
 
 }  // namespace
 
 HRESULT RegisterServer(const ServerDescription& server, const RegistrationSystem& system) noexcept {
-  return Guarded(system, [&](const std::u16string& modulePath) {
+  return UnderSystemLocale(system, [&](const std::u16string& modulePath) {
     HRESULT result = RunModuleScript(RegisterScript, server, system, modulePath);
     if (SUCCEEDED(result)) result = RunClassScripts(RegisterScript, server, system, modulePath);
     return FAILED(result) ? result : RegisterLibrary(system, modulePath);
@@ -187,7 +183,7 @@ HRESULT RegisterServer(const ServerDescription& server, const RegistrationSystem
 
 HRESULT UnregisterServer(const ServerDescription& server,
                          const RegistrationSystem& system) noexcept {
-  return Guarded(system, [&](const std::u16string& modulePath) {
+  return UnderSystemLocale(system, [&](const std::u16string& modulePath) {
     HRESULT result = RunClassScripts(UnregisterScript, server, system, modulePath);
     if (SUCCEEDED(result)) result = UnregisterLibrary(system, modulePath);
     return FAILED(result) ? result : RunModuleScript(UnregisterScript, server, system, modulePath);
