@@ -1,0 +1,281 @@
+#include "module/registrar.h"
+
+#include <gmock/gmock.h>
+
+#include <random>
+
+#include "module/scripts.h"
+#include "platform/wrappers/failing_registry.h"
+#include "tests/support/registry_lines.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::simulated::SimulatedRegistry;
+using platform::wrappers::FailingRegistry;
+using testing::IsEmpty;
+using testing_support::ExpectAllClosed;
+using testing_support::Lines;
+using testing_support::LinesOf;
+using testing_support::Put;
+
+const std::vector<Replacement> kReplacements = {{u"NAME", u"Some Name"},
+                                                {u"QUOTED", u"it''s"},
+                                                {u"PERCENT", u"100%NAME%"},
+                                                {u"WORDS", u"B { C } D"},
+                                                {u"NONE", u""}};
+
+// "Old" is there before, with values and a subkey of others.
+void FillWithOthers(platform::Registry& registry) {
+  Put(registry, u"Old", u"", u"default");
+  Put(registry, u"Old", u"Value", u"theirs");
+  Put(registry, u"Old\\Foreign\\Deep", u"", u"x");
+}
+const Lines kOthers = {"Old",          "Old  (default) = \"default\"", "Old  Value = \"theirs\"",
+                       "Old\\Foreign", "Old\\Foreign\\Deep",           "Old\\Foreign\\Deep  (default) = \"x\""};
+
+Lines Together(const Lines& more, const Lines& others = kOthers) {
+  Lines all = more;
+  all.insert(all.end(), others.begin(), others.end());
+  return all;
+}
+
+TEST(Registrar, WritesAndRemovesWhatAScriptSays) {
+  const Lines kDeepOld(kOthers.begin() + 3, kOthers.end());
+  const struct {
+    std::u16string script;
+    Lines written, left;  // after registering, and after unregistering then
+  } kCases[] = {
+      {u"", kOthers, kOthers},
+      {u"HKCR { } hkey_classes_root { A }", Together({"A"}), kOthers},
+      {u"HKCR { A = s 'x' B = s y }", Together({"A", "A  (default) = \"x\"", "B", "B  (default) = \"y\""}), kOthers},
+      {u"HKCR { A { B { C } val V = S 'v' } }", Together({"A", "A  V = \"v\"", "A\\B", "A\\B\\C"}), kOthers},
+      // Marks count only where they stand alone; quoted ones and key words in quotes are names.
+      {u"HKCR { A{ = s 'x}' 'NoRemove' { '}' '{' = s '=' } }",
+       {"A{", "A{  (default) = \"x}\"", "NoRemove", "NoRemove\\{", "NoRemove\\{  (default) = \"=\"", "NoRemove\\}",
+        kOthers[0], kOthers[1], kOthers[2], kOthers[3], kOthers[4], kOthers[5]},
+       kOthers},
+      {u"HKCR { 'A''s key' = s 'it''s ''''''' 'B'= s '' }",
+       Together({"A's key", "A's key  (default) = \"it's '''\"", "B", "B  (default) = \"\""}), kOthers},
+      {u"HKCR { '%NAME% 1' = s '%name%: %QUOTED%' }",
+       {kOthers[0], kOthers[1], kOthers[2], kOthers[3], kOthers[4], kOthers[5], "Some Name 1",
+        "Some Name 1  (default) = \"Some Name: it's\""},
+       kOthers},
+      {u"HKCR { A = s '%%%PERCENT%%%' }", Together({"A", "A  (default) = \"%100%NAME%%\""}), kOthers},
+      {u"HKCR { %WORDS% }", Together({"B", "B\\C", "D"}), kOthers},
+      {u"HKCR { A = d 42 B = d '&HfFFFffff' C = b '00fF' D = b '' }",
+       Together({"A", "A  (default) = dword 0x0000002A", "B", "B  (default) = dword 0xFFFFFFFF", "C",
+                 "C  (default) = type 3: 00 FF", "D", "D  (default) = type 3:"}),
+       kOthers},
+      {u"HKCR { noremove A { B NoRemove C val V = s 'v' NoRemove val W = s 'w' } }",
+       Together({"A", "A  V = \"v\"", "A  W = \"w\"", "A\\B", "A\\C"}), Together({"A", "A  W = \"w\"", "A\\C"})},
+      // Keys of others: what they hold is overwritten where it is named; a key that is kept for their
+      // subkey keeps its default value, named values go.
+      {u"HKCR { Old = s 'new' { val Value = s 'mine' Foreign { Mine } } }",
+       {"Old", "Old  (default) = \"new\"", "Old  Value = \"mine\"", kOthers[3], kOthers[4], kOthers[5],
+        "Old\\Foreign\\Mine"},
+       Together({"Old", "Old  (default) = \"new\""}, kDeepOld)},
+      {u"HKCR { ForceRemove old = s 'new' { A } }", {"old", "old  (default) = \"new\"", "old\\A"}, {}},
+      {u"HKCR { Old { Delete FOREIGN } B { Delete A } }", Together({"B", kOthers[0], kOthers[1], kOthers[2]}, {}), {}},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(platform::ToUtf8(test.script));
+    SimulatedRegistry registry;
+    FillWithOthers(registry);
+    EXPECT_EQ(RegisterScript(registry, test.script, kReplacements), S_OK);
+    EXPECT_EQ(LinesOf(registry), test.written);
+    EXPECT_EQ(RegisterScript(registry, test.script, kReplacements), S_OK);
+    EXPECT_EQ(LinesOf(registry), test.written);
+    for (int round = 0; round < 2; ++round) {  // what is gone already is no failure
+      EXPECT_EQ(UnregisterScript(registry, test.script, kReplacements), S_OK);
+      EXPECT_EQ(LinesOf(registry), test.left);
+    }
+    ExpectAllClosed(registry);
+  }
+}
+
+TEST(Registrar, RefusesMalformedScriptsBeforeItWrites) {
+  const std::u16string deep = [] {
+    std::u16string text = u"HKCR { ";
+    for (int i = 0; i < 100'000; ++i) text += u"A { ";
+    return text;
+  }();
+  const std::u16string kCases[] = {
+      u"A",
+      u"HKLM { A }",
+      u"'HKCR' { A }",
+      u"HKCR",
+      u"HKCR {",
+      u"HKCR { A",
+      u"HKCR { A }}",
+      u"HKCR { A } }",
+      u"HKCR A { B }",
+      u"HKCR { { A } }",
+      u"HKCR { A { } { } }",
+      u"HKCR { = s 'x' }",
+      u"HKCR { A = }",
+      u"HKCR { A = s }",
+      u"HKCR { A = s = }",
+      u"HKCR { A = x 'y' }",
+      u"HKCR { A = 's' 'y' }",
+      u"HKCR { A = s'y' }",
+      u"HKCR { A = s 'y }",
+      u"HKCR { A = s 'y'' }",
+      u"HKCR { A = d '' }",
+      u"HKCR { A = d '&H' }",
+      u"HKCR { A = d 12a }",
+      u"HKCR { A = d -1 }",
+      u"HKCR { A = d 4294967296 }",
+      u"HKCR { A = d 99999999999999999999999 }",
+      u"HKCR { A = b '012' }",
+      u"HKCR { A = b '0g' }",
+      u"HKCR { '' }",
+      u"HKCR { ForceRemove '%NONE%' }",
+      u"HKCR { A\\B }",
+      u"HKCR { ForceRemove NoRemove A }",
+      u"HKCR { NoRemove ForceRemove A }",
+      u"HKCR { NoRemove NoRemove A }",
+      u"HKCR { NoRemove Delete A }",
+      u"HKCR { Delete NoRemove A }",
+      u"HKCR { ForceRemove val A = s 'x' }",
+      u"HKCR { Delete A = s 'x' }",
+      u"HKCR { Delete A { B } }",
+      u"HKCR { A { val V } }",
+      u"HKCR { A { val V = } }",
+      u"HKCR { A { val V = s 'x' { } } }",
+      u"HKCR { A = s '%UNKNOWN%' }",
+      u"HKCR { A = s '%NAME' }",
+      std::u16string(u"HKCR { A\0 }", 11),
+      deep,
+  };
+  for (const std::u16string& test : kCases) {
+    SCOPED_TRACE(platform::ToUtf8(test.substr(0, 80)));
+    SimulatedRegistry registry;
+    FillWithOthers(registry);
+    EXPECT_EQ(RegisterScript(registry, test, kReplacements), DISP_E_EXCEPTION);
+    EXPECT_EQ(UnregisterScript(registry, test, kReplacements), DISP_E_EXCEPTION);
+    EXPECT_EQ(LinesOf(registry), kOthers);
+    ExpectAllClosed(registry);
+  }
+  // Deeper than the registry takes it: its error, not ours, and no deeper stack.
+  SimulatedRegistry registry;
+  std::u16string whole = deep;
+  for (int i = 0; i <= 100'000; ++i) whole += u"} ";
+  EXPECT_EQ(RegisterScript(registry, whole, {}), HRESULT_FROM_WIN32(platform::kERROR_INVALID_PARAMETER));
+  EXPECT_EQ(LinesOf(registry).size(), 511u);
+  EXPECT_EQ(UnregisterScript(registry, whole, {}), S_OK);
+  EXPECT_THAT(LinesOf(registry), IsEmpty());
+  ExpectAllClosed(registry);
+}
+
+TEST(Registrar, TakesNoPrefixOfAScriptForTheWhole) {
+  const std::u16string script =
+      u"HKCR { NoRemove A = s 'it''s' { val V = d &H2A ForceRemove '%NAME%' { B } } Delete C } ";
+  const std::size_t end = script.find_last_of(u'}');
+  for (std::size_t length = 0; length <= script.size(); ++length) {
+    SimulatedRegistry registry;
+    const HRESULT result = RegisterScript(registry, script.substr(0, length), kReplacements);
+    EXPECT_EQ(result, length == 0 || length > end ? S_OK : DISP_E_EXCEPTION) << length;
+    EXPECT_EQ(LinesOf(registry).size(), length > end ? 5u : 0u) << length;
+  }
+}
+
+TEST(Registrar, EndsAtTheFirstFailureOfTheRegistry) {
+  const std::u16string script =
+      u"HKCR { A = s 'a' { val V = s 'v' B } ForceRemove Old = s 'o' { C } Delete Gone NoRemove D { E } }";
+  for (const bool removing : {false, true}) {
+    const auto run = [&](platform::Registry& registry) {
+      return removing ? UnregisterScript(registry, script, {}) : RegisterScript(registry, script, {});
+    };
+    const auto prepare = [&](SimulatedRegistry& registry) {
+      FillWithOthers(registry);
+      Put(registry, u"Gone\\Below");
+      if (removing) {
+        EXPECT_EQ(RegisterScript(registry, script, {}), S_OK);
+      }
+    };
+    SimulatedRegistry whole;
+    prepare(whole);
+    FailingRegistry counting(whole);
+    ASSERT_EQ(run(counting), S_OK);
+    const Lines done = LinesOf(whole);
+    std::size_t states = 0;
+    Lines before;
+    for (std::uint64_t call = 1; call <= counting.Calls(); ++call) {
+      SCOPED_TRACE(call);
+      SimulatedRegistry registry, stopped;
+      prepare(registry);
+      prepare(stopped);
+      FailingRegistry failing(registry, {.call = call, .error = 1450});
+      EXPECT_EQ(run(failing), HRESULT_FROM_WIN32(1450));
+      EXPECT_EQ(failing.Calls(), call);  // nothing behind it, and nothing taken back
+      FailingRegistry dead(stopped, {.call = call, .onwards = true, .error = 0});
+      EXPECT_EQ(run(dead), E_FAIL);
+      EXPECT_EQ(LinesOf(registry), LinesOf(stopped));
+      if (LinesOf(registry) != before) ++states;
+      before = LinesOf(registry);
+      ExpectAllClosed(registry);
+      EXPECT_EQ(run(registry), S_OK);
+      EXPECT_EQ(LinesOf(registry), done);
+    }
+    EXPECT_GT(states, 5u);
+  }
+}
+
+TEST(Registrar, RandomScriptsEndAndUndoWhatTheyDo) {
+  static const char16_t* const kWords[] = {u"{",  u"}",    u"}",   u"{",        u"=",           u"s",    u"'x'",
+                                           u"A",  u"B",    u"'C'", u"NoRemove", u"val",         u"%%",   u"d",
+                                           u"12", u"HKCR", u"'",   u"Delete",   u"ForceRemove", u"''''", u"%NAME%"};
+  std::mt19937 random(7);
+  const auto below = [&](std::size_t bound) { return random() % bound; };
+  std::size_t taken = 0;
+  for (int round = 0; round < 20'000; ++round) {
+    std::u16string script = u"HKCR { ";
+    // Every other one is made of whole statements, or hardly any would be taken.
+    const bool whole = round % 2 == 0;
+    std::size_t depth = 1;
+    for (std::size_t i = below(12); i != 0; --i) {
+      if (!whole) {
+        script.append(kWords[below(std::size(kWords))]).append(u" ");
+        continue;
+      }
+      static const char16_t* const kStatements[] = {u"A ", u"ForceRemove B = s 'x' ", u"C = d 1 ", u"val V = s 'v' "};
+      const std::size_t kind = below(5);
+      if (kind == 4 && depth > 1) {
+        script += u"} ";
+        --depth;
+      } else {
+        script += kStatements[kind % 4];
+        if (kind < 3 && below(2) == 0) {
+          script += u"{ ";
+          ++depth;
+        }
+      }
+    }
+    for (; depth != 0; --depth) script += u"} ";
+    SimulatedRegistry registry;
+    const HRESULT result = RegisterScript(registry, script, kReplacements);
+    if (whole) {
+      ASSERT_EQ(result, S_OK) << platform::ToUtf8(script);
+    }
+    if (result == S_OK) {
+      ++taken;
+      const Lines written = LinesOf(registry);
+      EXPECT_EQ(RegisterScript(registry, script, kReplacements), S_OK);
+      EXPECT_EQ(LinesOf(registry), written) << platform::ToUtf8(script);
+      EXPECT_EQ(UnregisterScript(registry, script, kReplacements), S_OK);
+      if (script.find(u"NoRemove") == script.npos) {
+        EXPECT_THAT(LinesOf(registry), IsEmpty()) << platform::ToUtf8(script);
+      }
+    } else {
+      EXPECT_EQ(result, DISP_E_EXCEPTION) << platform::ToUtf8(script);
+      EXPECT_THAT(LinesOf(registry), IsEmpty()) << platform::ToUtf8(script);
+    }
+    ExpectAllClosed(registry);
+    ASSERT_FALSE(HasFailure());
+  }
+  EXPECT_GE(taken, 10'000u);
+}
+
+}  // namespace
+}  // namespace KelvoUHW

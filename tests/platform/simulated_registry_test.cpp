@@ -1,0 +1,207 @@
+#include <gmock/gmock.h>
+
+#include <thread>
+
+#include "platform/wrappers/failing_registry.h"
+#include "tests/support/registry_lines.h"
+
+namespace platform::simulated {
+namespace {
+
+using testing::ElementsAre;
+using testing_support::ExpectAllClosed;
+using testing_support::Lines;
+using testing_support::LinesOf;
+using testing_support::Put;
+
+constexpr std::uint32_t kOk = 0;
+constexpr std::uint32_t kBadPathname = 161;
+
+std::uint32_t Code(Status status) { return status ? kOk : status.error; }
+
+RegistryKeyHandle Opened(SimulatedRegistry& registry, const char16_t* path,
+                         std::uint32_t access = kKEY_READ | kKEY_WRITE) {
+  RegistryKeyHandle key = kNoRegistryKey;
+  EXPECT_TRUE(registry.OpenKey(kHKEY_CLASSES_ROOT, path, access, key));
+  return key;
+}
+
+TEST(SimulatedRegistry, FindsKeysAsTheSystemDoes) {
+  const std::u16string longest(kMaxKeyNameChars, u'n');
+  const std::u16string tooLong = longest + u"n";
+  std::u16string tooDeep;
+  for (int level = 0; level < 512; ++level) tooDeep += u"d\\";
+  const struct {
+    const char* what;
+    std::u16string path;
+    std::uint32_t open, create, remove;  // the codes of opening, of creating and then deleting it
+  } kCases[] = {
+      {"a key", u"Top", kOk, kOk, kERROR_ACCESS_DENIED},
+      {"without case", u"tOP\\sub", kOk, kOk, kOk},
+      {"a backslash at the end", u"Top\\Sub\\", kOk, kOk, kOk},
+      {"not there", u"Top\\Other\\Below", kERROR_FILE_NOT_FOUND, kOk, kOk},
+      {"the root itself", u"", kOk, kOk, kERROR_ACCESS_DENIED},
+      {"a backslash in front", u"\\Top", kBadPathname, kBadPathname, kBadPathname},
+      {"two backslashes", u"Top\\\\Sub", kBadPathname, kBadPathname, kBadPathname},
+      {"the longest name", longest, kERROR_FILE_NOT_FOUND, kOk, kOk},
+      {"a longer name", tooLong, kERROR_INVALID_PARAMETER, kERROR_INVALID_PARAMETER, kERROR_INVALID_PARAMETER},
+      {"too many levels", tooDeep, kERROR_FILE_NOT_FOUND, kERROR_INVALID_PARAMETER, kERROR_FILE_NOT_FOUND},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    SimulatedRegistry registry;
+    Put(registry, u"Top\\Sub");
+    RegistryKeyHandle key = 77;
+    EXPECT_EQ(Code(registry.OpenKey(kHKEY_CLASSES_ROOT, test.path.c_str(), kKEY_READ, key)), test.open);
+    EXPECT_EQ(key != kNoRegistryKey, test.open == kOk);
+    if (test.open == kOk) {
+      EXPECT_TRUE(registry.CloseKey(key));
+    }
+    std::uint32_t disposition = 0;
+    EXPECT_EQ(Code(registry.CreateKey(kHKEY_CLASSES_ROOT, test.path.c_str(), kKEY_READ, key, disposition)),
+              test.create);
+    if (test.create == kOk) {
+      EXPECT_EQ(disposition, test.open == kOk ? kREG_OPENED_EXISTING_KEY : kREG_CREATED_NEW_KEY);
+      EXPECT_TRUE(registry.CloseKey(key));
+    }
+    EXPECT_EQ(Code(registry.DeleteKey(kHKEY_CLASSES_ROOT, test.path.c_str())), test.remove);
+    ExpectAllClosed(registry);
+  }
+}
+
+TEST(SimulatedRegistry, HoldsValuesWithTheirTypes) {
+  SimulatedRegistry registry;
+  Put(registry, u"b");
+  Put(registry, u"A_", u"", u"x = \"y\"");
+  Put(registry, u"A_\\Sub");
+  Put(registry, u"AB");
+  const RegistryKeyHandle key = Opened(registry, u"AB");
+  const std::uint32_t number = 0x2A;
+  const std::uint8_t bytes[] = {1, 0xFF};
+  EXPECT_TRUE(registry.SetValue(key, u"Number", kREG_DWORD, &number, sizeof number));
+  EXPECT_TRUE(registry.SetValue(key, u"number", kREG_DWORD, &number, sizeof number));  // keeps its name
+  EXPECT_TRUE(registry.SetValue(key, nullptr, kREG_SZ, u"ab", 4));                     // no terminator
+  EXPECT_TRUE(registry.SetValue(key, u"Bytes", kREG_BINARY, bytes, sizeof bytes));
+  EXPECT_TRUE(registry.SetValue(key, u"Empty", kREG_SZ, nullptr, 0));
+  EXPECT_EQ(Code(registry.SetValue(key, u"Bad", kREG_SZ, nullptr, 2)), kERROR_INVALID_PARAMETER);
+  EXPECT_THAT(LinesOf(registry), ElementsAre("AB", "AB  (default) = type 1: 61 00 62 00", "AB  Bytes = type 3: 01 FF",
+                                             "AB  Empty = type 1:", "AB  Number = dword 0x0000002A", "A_",
+                                             "A_  (default) = \"x = \"y\"\"", "A_\\Sub", "b"));
+
+  std::uint32_t type = 0, size = 3;
+  std::uint8_t buffer[4] = {9, 9, 9, 9};
+  EXPECT_EQ(Code(registry.QueryValue(key, u"NUMBER", &type, buffer, size)), kERROR_MORE_DATA);
+  EXPECT_THAT(buffer, testing::Each(9));
+  EXPECT_EQ(size, 4u);
+  EXPECT_TRUE(registry.QueryValue(key, u"NUMBER", &type, buffer, size));
+  EXPECT_THAT(buffer, ElementsAre(0x2A, 0, 0, 0));
+  EXPECT_EQ(type, kREG_DWORD);
+  EXPECT_TRUE(registry.QueryValue(key, u"Bytes", nullptr, nullptr, size));
+  EXPECT_EQ(size, 2u);
+  EXPECT_EQ(Code(registry.QueryValue(key, u"None", nullptr, nullptr, size)), kERROR_FILE_NOT_FOUND);
+  EXPECT_TRUE(registry.DeleteValue(key, u"BYTES"));
+  EXPECT_EQ(Code(registry.DeleteValue(key, u"BYTES")), kERROR_FILE_NOT_FOUND);
+
+  RegistryKey owner(registry, key);
+  std::u16string text = u"old";
+  EXPECT_TRUE(owner.Text(u"", text));
+  EXPECT_EQ(text, u"ab");
+  EXPECT_EQ(Code(owner.Text(u"Number", text)), kERROR_INVALID_DATA);
+  EXPECT_TRUE(owner.Text(u"Empty", text));
+  EXPECT_EQ(text, u"");
+}
+
+TEST(SimulatedRegistry, GivesEachHandleOnlyWhatItWasOpenedFor) {
+  SimulatedRegistry registry;
+  Put(registry, u"Key\\Sub", u"", u"text");
+  const RegistryKeyHandle reader = Opened(registry, u"Key", kKEY_READ);
+  const RegistryKeyHandle writer = Opened(registry, u"Key", kKEY_WRITE);
+  const RegistryKeyHandle gone = Opened(registry, u"Key\\Sub");
+  EXPECT_TRUE(registry.DeleteKey(writer, u"Sub"));
+  Put(registry, u"Key\\Sub");  // a new one, of which the old handle knows nothing
+  const RegistryKeyHandle closed = Opened(registry, u"Key");
+  EXPECT_TRUE(registry.CloseKey(closed));
+  const struct {
+    RegistryKeyHandle key;
+    std::uint32_t read, write, below;
+  } kCases[] = {
+      {kHKEY_CLASSES_ROOT, kOk, kOk, kERROR_FILE_NOT_FOUND},
+      {reader, kOk, kERROR_ACCESS_DENIED, kOk},
+      {writer, kERROR_ACCESS_DENIED, kOk, kOk},
+      {gone, kERROR_KEY_DELETED, kERROR_KEY_DELETED, kERROR_KEY_DELETED},
+      {closed, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE},
+      {kNoRegistryKey, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE},
+  };
+  for (const auto& test : kCases) {
+    char16_t name[kMaxKeyNameChars + 1];
+    std::uint32_t size = 0, chars = kMaxKeyNameChars + 1;
+    EXPECT_EQ(Code(registry.SetValue(test.key, u"v", kREG_SZ, u"", 2)), test.write);
+    const std::uint32_t query = Code(registry.QueryValue(test.key, u"v", nullptr, nullptr, size));
+    EXPECT_EQ(query, test.read);
+    EXPECT_EQ(Code(registry.EnumKey(test.key, 0, name, chars)), test.read);
+    EXPECT_EQ(Code(registry.DeleteValue(test.key, u"v")), test.write);
+    RegistryKeyHandle below = kNoRegistryKey;
+    EXPECT_EQ(Code(registry.OpenKey(test.key, u"Sub", kKEY_READ, below)), test.below);
+    registry.CloseKey(below == kNoRegistryKey ? kHKEY_CLASSES_ROOT : below);
+    if (test.key == reader) registry.SetValue(writer, u"v", kREG_SZ, u"", 2);
+    if (test.key == kHKEY_CLASSES_ROOT) registry.SetValue(writer, u"v", kREG_SZ, u"", 2);
+  }
+  std::uint32_t chars = 3;  // "Sub" and its terminator need four
+  char16_t name[4] = u"???";
+  EXPECT_EQ(Code(registry.EnumKey(reader, 0, name, chars)), kERROR_MORE_DATA);
+  EXPECT_EQ(chars, 3u);
+  chars = 4;
+  EXPECT_TRUE(registry.EnumKey(reader, 0, name, chars));
+  EXPECT_EQ(std::u16string(name, chars + 1), std::u16string(u"Sub\0", 4));
+  EXPECT_EQ(Code(registry.EnumKey(reader, 1, name, chars)), kERROR_NO_MORE_ITEMS);
+
+  for (const RegistryKeyHandle key : {reader, writer, gone}) EXPECT_TRUE(registry.CloseKey(key));
+  EXPECT_EQ(Code(registry.CloseKey(gone)), kERROR_INVALID_HANDLE);
+  EXPECT_EQ(Code(registry.CloseKey(0x1000)), kERROR_INVALID_HANDLE);
+  EXPECT_TRUE(registry.CloseKey(kHKEY_CLASSES_ROOT));
+  EXPECT_THAT(registry.Misuses(),
+              ElementsAre(u"second close of HKEY_CLASSES_ROOT\\Key\\Sub", u"close of what never was a key"));
+}
+
+TEST(SimulatedRegistry, DeletesTreesOfAnyDepthAndTakesNoHiddenKeyForGone) {
+  SimulatedRegistry registry;
+  std::u16string deep = u"Tree";
+  for (int level = 0; level < 500; ++level) deep += u"\\d";
+  Put(registry, deep);
+  Put(registry, u"Tree\\Other\\Leaf", u"", u"text");
+  Put(registry, u"Stays");
+  wrappers::FailingRegistry failing(registry);
+  RegistryKey root(failing, kHKEY_CLASSES_ROOT);
+  // The second opening is that of a key that was listed.
+  failing.SetPlan({.call = 3, .error = kERROR_FILE_NOT_FOUND});
+  EXPECT_EQ(Code(root.DeleteTree(u"Tree")), kERROR_ACCESS_DENIED);
+  EXPECT_EQ(failing.Failures(), 1u);
+  failing.SetPlan({});
+  EXPECT_TRUE(root.DeleteTree(u"tree"));
+  EXPECT_EQ(Code(root.DeleteTree(u"Tree")), kERROR_FILE_NOT_FOUND);
+  EXPECT_THAT(LinesOf(registry), ElementsAre("Stays"));
+  root.Close();
+  ExpectAllClosed(registry);
+}
+
+TEST(SimulatedRegistry, TakesThreads) {
+  SimulatedRegistry registry;
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([&registry, i] {
+      const std::u16string path = u"Shared\\Own" + Decimal(i);
+      for (int round = 0; round < 50; ++round) {
+        Put(registry, path, u"", Decimal(round));
+        Put(registry, path + u"\\Sub");
+        EXPECT_TRUE(registry.DeleteKey(kHKEY_CLASSES_ROOT, (path + u"\\Sub").c_str()));
+      }
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(LinesOf(registry, false).size(), 4u);
+  EXPECT_EQ(LinesOf(registry).back(), "Shared\\Own3  (default) = \"49\"");
+  ExpectAllClosed(registry);
+}
+
+}  // namespace
+}  // namespace platform::simulated
