@@ -41,12 +41,21 @@ struct Dismount {
   Text path;
 };
 
+// When the system tells of a step's change.
+enum class BroadcastTime : std::uint8_t {
+  After,
+  Before,  // what the messages set off has run, as far as it goes without waiting, before the
+           // change
+  None,
+};
+
 // A step with nothing in it is a pause: the PC stays as it is.
 struct Step {
   std::uint32_t atMilliseconds =
       0;      // since the script's start; never smaller than the step's before
   Text name;  // for people; may be empty
   std::variant<std::monostate, Plug, Unplug, Mount, Dismount> change;
+  BroadcastTime broadcast = BroadcastTime::After;
 };
 
 using Script = std::vector<Step>;

@@ -46,6 +46,10 @@ Step ReadStep(const JsonValue& value) {
   Step step;
   object.Read("at", step.atMilliseconds);
   object.Read("name", step.name);
+  if (const auto when = object.Find("broadcast")) {
+    step.broadcast = std::array{BroadcastTime::After, BroadcastTime::Before,
+                                BroadcastTime::None}[when->AsChoice({"after", "before", "none"})];
+  }
 
   const char* kind = nullptr;
   std::optional<JsonValue> content;
