@@ -1,14 +1,13 @@
 #include "tree/ring_ptr.h"
 
-#include <mutex>
+#include "platform/process_lock.h"
 
 namespace KelvoUHW {
 
 namespace {
 
-// Constant-initialised and never destroyed in effect: pointers may be released by static
-// destructors.
-constinit std::mutex g_ringMutex;
+// Pointers may be released by static destructors.
+constinit platform::ProcessLock g_ringMutex;
 
 }  // namespace
 

@@ -1,0 +1,27 @@
+# Building Windows programs with MinGW-w64 on another system: where the libraries around the component
+# come from, and what their programs may depend on.
+
+# Programs run on a PC that has nothing but the system's own DLLs.
+target_link_options(zkusb_options INTERFACE -static)
+# Every call of the system in its UTF-16 form, as Windows 7 offers it.
+target_compile_definitions(zkusb_options INTERFACE UNICODE _UNICODE _WIN32_WINNT=0x0601 WINVER=0x0601)
+
+# The header-only libraries of the building system, each linked into a folder of its own: their
+# neighbours in the system's folder belong to another C library.
+function(zkusb_header_library target folder header)
+  find_path(${folder}_parent ${folder}/${header} PATHS /usr/include /usr/local/include
+            NO_CMAKE_FIND_ROOT_PATH REQUIRED)
+  set(own ${CMAKE_BINARY_DIR}/headers/${folder})
+  file(MAKE_DIRECTORY ${own})
+  file(CREATE_LINK ${${folder}_parent}/${folder} ${own}/${folder} SYMBOLIC)
+  add_library(${target} INTERFACE IMPORTED GLOBAL)
+  target_include_directories(${target} INTERFACE ${own})
+endfunction()
+zkusb_header_library(nlohmann_json::nlohmann_json nlohmann json.hpp)
+zkusb_header_library(CLI11::CLI11 CLI CLI.hpp)
+
+if(ZKUSB_BUILD_TESTS)
+  # The test library, from its sources: the building system has it compiled for itself only.
+  find_path(ZKUSB_GOOGLETEST CMakeLists.txt PATHS /usr/src/googletest NO_DEFAULT_PATH REQUIRED)
+  add_subdirectory(${ZKUSB_GOOGLETEST} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
+endif()
