@@ -185,6 +185,29 @@ std::u16string GuidText(const Guid& guid) {
   return text += u'}';
 }
 
+std::optional<Guid> ParseGuid(std::u16string_view text) {
+  // The digits in their order; what stands between them is checked by writing the result again.
+  std::array<std::uint8_t, 16> bytes{};
+  std::size_t digits = 0;
+  for (const char16_t unit : text) {
+    const bool decimal = unit >= u'0' && unit <= u'9';
+    const char16_t upper = ToUpper(unit);
+    if (!decimal && (upper < u'A' || upper > u'F')) continue;
+    if (digits == 2 * bytes.size()) return {};
+    const int value = decimal ? unit - u'0' : upper - u'A' + 10;
+    std::uint8_t& byte = bytes[digits++ / 2];
+    byte = static_cast<std::uint8_t>(byte * 16 + value);
+  }
+  Guid guid;
+  guid.Data1 = std::uint32_t{bytes[0]} << 24 | std::uint32_t{bytes[1]} << 16 |
+               std::uint32_t{bytes[2]} << 8 | bytes[3];
+  guid.Data2 = static_cast<std::uint16_t>(bytes[4] << 8 | bytes[5]);
+  guid.Data3 = static_cast<std::uint16_t>(bytes[6] << 8 | bytes[7]);
+  std::copy(bytes.begin() + 8, bytes.end(), guid.Data4.begin());
+  if (!EqualIgnoringCase(GuidText(guid), text)) return {};
+  return guid;
+}
+
 std::string ToUtf8(std::u16string_view text) {
   std::string bytes;
   bytes.reserve(text.size());

@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -38,6 +39,8 @@ std::u16string Decimal(std::int32_t value, unsigned width = 0);
 
 // "{8-4-4-4-12}" with upper-case digits, 38 characters, as the system prints a GUID.
 std::u16string GuidText(const Guid& guid);
+// The GUID whose text that is, in either case; nothing for any other text.
+std::optional<Guid> ParseGuid(std::u16string_view text);
 
 // UTF-8 with U+FFFD for each unpaired surrogate or malformed byte.
 std::string ToUtf8(std::u16string_view text);

@@ -28,6 +28,24 @@ HRESULT VariantCopy(VARIANT* target, const VARIANT* source) noexcept;
 HRESULT CoInitializeEx(void* reserved, DWORD concurrencyModel) noexcept;
 void CoUninitialize() noexcept;
 
+// Creates an object of a class: first through the class objects that the process registered itself,
+// then through the registry of the current system, by loading the library that InprocServer32 names
+// and asking its DllGetClassObject. REGDB_E_CLASSNOTREG, CO_E_DLLNOTFOUND, CO_E_ERRORINDLL, or what
+// the class says.
+HRESULT CoGetClassObject(REFCLSID clsid, DWORD context, void* reserved, REFIID iid,
+                         void** out) noexcept;
+HRESULT CoCreateInstance(REFCLSID clsid, IUnknown* outer, DWORD context, REFIID iid,
+                         void** out) noexcept;
+// A class object of the process's own, referenced until it is revoked.
+HRESULT CoRegisterClassObject(REFCLSID clsid, IUnknown* classObject, DWORD context, DWORD flags,
+                              DWORD* cookie) noexcept;
+HRESULT CoRevokeClassObject(DWORD cookie) noexcept;
+// Unloads the libraries that answer DllCanUnloadNow with S_OK.
+void CoFreeUnusedLibraries() noexcept;
+// The class of a program identifier such as "KelvoUsbMonitor.UsbTree", from the registry of the
+// current system. CO_E_CLASSSTRING when there is none.
+HRESULT CLSIDFromProgID(const char16_t* progId, CLSID* clsid) noexcept;
+
 namespace platform::native {
 
 // Texts alive now, and those ever allocated, by SysAllocString and VariantCopy.

@@ -1,0 +1,17 @@
+// What a module asks about the process it is loaded into.
+#pragma once
+
+#include "platform/com.h"
+
+namespace platform {
+
+#ifdef _WIN32
+// Tells the platform layer which module the component is; when it is loaded.
+void SetModuleInstance(HINSTANCE instance) noexcept;
+#else
+// Whether the process is ending, so that a library which is unloaded now leaves everything as it
+// is. Callable from every thread.
+bool ProcessEnds() noexcept;
+#endif
+
+}  // namespace platform
