@@ -59,7 +59,13 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
           ->type_name("HEX");
   command("volumes", "The devices that carry volumes, and where they are mounted",
           Command::kVolumes);
-  command("watch", "Play a script and tell what comes and goes", Command::kWatch);
+  double seconds = 0;
+  command("watch", "Play a script and tell what comes and goes", Command::kWatch)
+      ->add_option("--for", seconds, "Watch so long behind the script's end")
+      ->type_name("SECONDS")
+      ->check(CLI::Range(0.0, 86400.0));
+  command("register", "Register the component and show what that writes", Command::kRegister);
+  command("unregister", "Take the registration back and show what goes", Command::kUnregister);
 
   try {
     app.parse(std::vector<std::string>(args.rbegin(), args.rend()));  // it takes them from the back
@@ -75,9 +81,10 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
     options.vendor = ParseId("--vendor", vendor);
     if (!productOption->empty()) options.product = ParseId("--product", product);
   }
-  if (options.command == Command::kWatch && options.scriptFile.empty()) {
-    Refuse("watch needs --script FILE");
+  if (options.command == Command::kWatch && options.scriptFile.empty() && seconds == 0) {
+    Refuse("watch needs --script FILE or --for SECONDS");
   }
+  options.watchMilliseconds = static_cast<std::uint32_t>(seconds * 1000);
   return {options, {}};
 }
 

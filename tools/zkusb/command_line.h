@@ -9,14 +9,15 @@
 
 namespace zkusb {
 
-enum class Command { kTree, kDump, kFind, kVolumes, kWatch };
+enum class Command { kTree, kDump, kFind, kVolumes, kWatch, kRegister, kUnregister };
 
 struct Options {
   Command command = Command::kTree;
   std::string machineFile;  // empty: the built-in machine
   std::string scriptFile;   // empty: none
   bool json = false;
-  std::uint16_t vendor = 0;  // of find
+  std::uint32_t watchMilliseconds = 0;  // of watch: how long behind the script's end
+  std::uint16_t vendor = 0;             // of find
   std::optional<std::uint16_t> product;
 };
 

@@ -5,7 +5,7 @@
 #include <optional>
 
 #include "tools/zkusb/node_view.h"
-#include "tools/zkusb/topology.h"
+#include "tools/zkusb/pc.h"
 #include "tools/zkusb/writer.h"
 
 namespace zkusb {
@@ -19,8 +19,13 @@ bool PrintFound(const NodeView& root, std::uint16_t vendor, std::optional<std::u
 // The devices with a volume or a disk that has a letter, in the same way.
 bool PrintVolumes(const NodeView& root, bool json, Writer& out);
 
-// Takes the script step by step and tells after each what came, went and changed. Throws
-// MachineFileError when the PC refuses a step.
-void Watch(Topology& topology, bool json, Writer& out);
+// Advises a sink and prints every event as it comes, while the script is played and for so long
+// behind its end. Throws std::runtime_error when the PC refuses a step.
+void Watch(Pc& pc, std::uint32_t milliseconds, bool json, Writer& out);
+
+// What registering the component has written.
+void PrintRegistration(const Pc& pc, bool json, Writer& out);
+// Takes the registration back, and prints what went and what stays.
+void PrintUnregistration(Pc& pc, bool json, Writer& out);
 
 }  // namespace zkusb

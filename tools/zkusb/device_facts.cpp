@@ -10,13 +10,13 @@ namespace zkusb {
 
 namespace {
 
-void CollectDevices(const NodeView& node, std::size_t controller, std::vector<std::uint32_t>& ports,
+void CollectDevices(const NodeView& node, std::size_t controller, std::vector<std::int32_t>& ports,
                     std::vector<PlacedDevice>& found) {
-  if (node.Type == NodeType::kPortDevice) {
+  if (node.Type == KUDTPortDevice) {
     found.push_back({&node, controller, ports});
     return;
   }
-  const bool isPort = node.Type == NodeType::kHubPort;
+  const bool isPort = node.Type == KUDTHubPort;
   if (isPort) ports.push_back(node.PortIndex);
   for (const NodeView& child : node.Childs) CollectDevices(child, controller, ports, found);
   if (isPort) ports.pop_back();
@@ -59,7 +59,7 @@ class DiskCollector {
   std::size_t AddDisk(const NodeView& node) {
     const std::size_t disk = FindOrAdd(node.InstanceId);
     m_disks[disk].name = Tidied(node.Info->FriendlyName);
-    if (m_disks[disk].name.empty()) m_disks[disk].name = Tidied(node.DeviceDescr);
+    if (m_disks[disk].name.empty()) m_disks[disk].name = Tidied(node.Description);
     return disk;
   }
 
@@ -87,7 +87,7 @@ class DiskCollector {
 
 std::vector<PlacedDevice> PortDevices(const NodeView& root) {
   std::vector<PlacedDevice> found;
-  std::vector<std::uint32_t> ports;
+  std::vector<std::int32_t> ports;
   std::size_t controller = 0;
   for (const NodeView& child : root.Childs) CollectDevices(child, ++controller, ports, found);
   return found;
@@ -95,7 +95,7 @@ std::vector<PlacedDevice> PortDevices(const NodeView& root) {
 
 bool IsUsbController(const NodeView& controller) {
   // Only a controller that was opened has the name under which it was.
-  return controller.Type == NodeType::kHostController && !controller.LeafName.empty();
+  return controller.Type == KUDTHostController && !controller.LeafName.empty();
 }
 
 bool HasUsbController(const NodeView& root) {

@@ -13,8 +13,8 @@ namespace zkusb {
 // A port device and the way to it. The node belongs to the tree that was searched.
 struct PlacedDevice {
   const NodeView* device;
-  std::size_t controller;            // 1 is the first
-  std::vector<std::uint32_t> ports;  // from the root hub on
+  std::size_t controller;           // 1 is the first
+  std::vector<std::int32_t> ports;  // from the root hub on
 };
 
 // All port devices below a root, in the order of the tree.

@@ -25,7 +25,7 @@ std::u16string VendorText(const NodeView& node) {
 std::u16string ProductText(const NodeView& device) {
   // The friendly name comes late: where a device has none, the component may show that of the
   // device-manager node it read before.
-  for (const std::u16string& text : {Tidied(device.Product), Tidied(device.DeviceDescr)}) {
+  for (const std::u16string& text : {Tidied(device.Product), Tidied(device.Description)}) {
     if (!text.empty()) return text;
   }
   if (device.Info && !device.Info->FriendlyName.empty()) return Tidied(device.Info->FriendlyName);
@@ -46,7 +46,7 @@ std::u16string SerialText(const NodeView& device) {
 std::u16string PlaceText(const PlacedDevice& placed) {
   std::u16string text =
       u"controller " + platform::Decimal(static_cast<std::int32_t>(placed.controller));
-  for (const std::uint32_t port : placed.ports) {
+  for (const std::int32_t port : placed.ports) {
     // Port 0 is what the device manager's storage controllers have instead of ports.
     if (port != 0) text += u", port " + platform::Decimal(static_cast<std::int32_t>(port));
   }

@@ -12,8 +12,6 @@ namespace {
 constexpr std::array<const char*, 8> kTypeNames{
     "KUDTUnknown", "KUDTRoot",       "KUDTHostController", "KUDTHub",
     "KUDTHubPort", "KUDTPortDevice", "KUDTInfoDevice",     "KUDTInterfaceDevice"};
-constexpr std::array<const char*, 3> kStatusNames{"KPortEmpty", "KPortConnected",
-                                                  "KPortUnconfigured"};
 constexpr std::array<const char*, 4> kEventNames{"KDeviceConnected", "KDeviceAttached",
                                                  "KDeviceRemoved", "KDeviceModified"};
 
@@ -56,7 +54,7 @@ void AddVendorName(const NodeView& node, Json& object) {
 void AddProperties(const NodeView& node, Json& object) {
   object["Type"] = kTypeNames.at(static_cast<std::size_t>(node.Type));
   object["InstanceId"] = TextJson(node.InstanceId);
-  object["DeviceDescr"] = TextJson(node.DeviceDescr);
+  object["Description"] = TextJson(node.Description);
   object["SerialNumber"] = TextJson(node.SerialNumber);
   object["VendorId"] = node.VendorId;
   object["ProductId"] = node.ProductId;
@@ -64,20 +62,18 @@ void AddProperties(const NodeView& node, Json& object) {
   object["Vendor"] = TextJson(node.Vendor);
   object["Product"] = TextJson(node.Product);
   switch (node.Type) {
-    case NodeType::kHostController:
+    case KUDTHostController:
       object["LeafName"] = TextJson(node.LeafName);
       break;
-    case NodeType::kHub:
+    case KUDTHub:
       AddVendorName(node, object);
       object["PathName"] = TextJson(node.PathName);
       object["ConnectionName"] = TextJson(node.ConnectionName);
-      object["NumberOfPorts"] = node.NumberOfPorts;
       break;
-    case NodeType::kHubPort:
+    case KUDTHubPort:
       object["PortIndex"] = node.PortIndex;
-      object["Status"] = kStatusNames.at(static_cast<std::size_t>(node.Status));
       break;
-    case NodeType::kPortDevice:
+    case KUDTPortDevice:
       AddVendorName(node, object);
       object["Manufacturer1"] = TextJson(node.Manufacturer1);
       object["Speed"] = node.Speed;
@@ -133,7 +129,7 @@ Json PlacedDeviceJson(const PlacedDevice& placed) {
 
 Json TextJson(std::u16string_view text) { return platform::ToUtf8(text); }
 
-const char* EventName(EventKind kind) noexcept {
+const char* EventName(TDeviceEventType kind) noexcept {
   return kEventNames[static_cast<std::size_t>(kind)];
 }
 

@@ -6,7 +6,6 @@
 
 #include "tools/zkusb/device_facts.h"
 #include "tools/zkusb/node_view.h"
-#include "tools/zkusb/topology.h"
 
 namespace zkusb {
 
@@ -21,6 +20,6 @@ Json PlacedDeviceJson(const PlacedDevice& placed);
 
 Json TextJson(std::u16string_view text);
 // "KDeviceAttached" and the like.
-const char* EventName(EventKind kind) noexcept;
+const char* EventName(TDeviceEventType kind) noexcept;
 
 }  // namespace zkusb

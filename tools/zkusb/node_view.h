@@ -6,23 +6,9 @@
 #include <string>
 #include <vector>
 
-#include "tree/node.h"
+#include "com/device_types.h"
 
 namespace zkusb {
-
-// In the order of the published enumeration.
-enum class NodeType {
-  kUnknown,
-  kRoot,
-  kHostController,
-  kHub,
-  kHubPort,
-  kPortDevice,
-  kInfoDevice,
-  kInterfaceDevice,
-};
-
-enum class PortStatus { kEmpty, kConnected, kUnconfigured };
 
 // What the device manager tells about a device.
 struct InfoView {
@@ -50,9 +36,9 @@ struct StorageView {
 // A copy of one node and of everything below it, under the names that the interfaces publish. What
 // a kind of node does not have is empty, zero or absent.
 struct NodeView {
-  NodeType Type = NodeType::kUnknown;
+  TUsbDeviceType Type = KUDTUnknown;
   std::u16string InstanceId;
-  std::u16string DeviceDescr;
+  std::u16string Description;
   std::u16string DriverKeyName;
   std::u16string SerialNumber;
   std::u16string Vendor;
@@ -64,10 +50,8 @@ struct NodeView {
 
   std::u16string PathName;  // of a hub
   std::u16string ConnectionName;
-  std::uint32_t NumberOfPorts = 0;
 
-  std::uint32_t PortIndex = 0;  // of a port
-  PortStatus Status = PortStatus::kEmpty;
+  std::int32_t PortIndex = 0;  // of a port
 
   std::u16string Manufacturer1;  // of a port device
   std::uint32_t Speed = 0;
@@ -78,10 +62,5 @@ struct NodeView {
 
   std::vector<NodeView> Childs;
 };
-
-// The one place where the commands touch records. The parent is never asked for: all there is to
-// know about a node's place follows from the way down to it. Throws std::runtime_error for a tree
-// of more levels than any PC has.
-NodeView ReadNode(const KelvoUHW::NodePtr& node);
 
 }  // namespace zkusb

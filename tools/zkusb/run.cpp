@@ -6,8 +6,9 @@
 #include "platform/text.h"
 #include "tools/zkusb/command_line.h"
 #include "tools/zkusb/commands.h"
+#include "tools/zkusb/component.h"
 #include "tools/zkusb/device_facts.h"
-#include "tools/zkusb/topology.h"
+#include "tools/zkusb/pc.h"
 #include "tools/zkusb/writer.h"
 
 namespace zkusb {
@@ -18,11 +19,11 @@ void Complain(Writer& errors, std::u16string_view what) {
   errors.Line(std::u16string(u"zkusb: ").append(what));
 }
 
-// Every command but watch looks at the PC once, after the whole script.
-int LookOnce(const Options& options, Topology& topology, Writer& out, Writer& errors) {
-  for (std::size_t step = 0; step < topology.Steps().size(); ++step) topology.Apply(step);
-  topology.Refresh();
-  const std::optional<NodeView> root = topology.Root();
+// The PC is looked at once, after the whole script.
+int LookOnce(const Options& options, Pc& pc, Writer& out, Writer& errors) {
+  pc.ApplyAll();
+  const Component component([](TDeviceEventType, IZKUMUsbTreeNode&) {});
+  const std::optional<NodeView> root = component.Root();
   if (!root || !HasUsbController(*root)) {
     Complain(errors, u"no USB host controller found");
     return kNothingFound;
@@ -32,7 +33,7 @@ int LookOnce(const Options& options, Topology& topology, Writer& out, Writer& er
       PrintTree(*root, options.json, out);
       return kDone;
     case Command::kDump:
-      out.Verbatim(topology.Dump());
+      out.Verbatim(component.Dump());
       return kDone;
     case Command::kFind:
       if (PrintFound(*root, options.vendor, options.product, options.json, out)) return kDone;
@@ -45,10 +46,9 @@ int LookOnce(const Options& options, Topology& topology, Writer& out, Writer& er
       if (PrintVolumes(*root, options.json, out)) return kDone;
       Complain(errors, u"no device carries a volume or a drive letter");
       return kNothingFound;
-    case Command::kWatch:
-      break;
+    default:
+      return kRefused;
   }
-  return kRefused;
 }
 
 int RunCommand(const std::vector<std::string>& args, Writer& out, Writer& errors) {
@@ -57,12 +57,21 @@ int RunCommand(const std::vector<std::string>& args, Writer& out, Writer& errors
     out.Paragraph(platform::FromUtf8(line.information));
     return kDone;
   }
-  Topology topology(line.options->machineFile, line.options->scriptFile);
-  if (line.options->command == Command::kWatch) {
-    Watch(topology, line.options->json, out);
-    return kDone;
+  const Options& options = *line.options;
+  Pc pc(options.machineFile, options.scriptFile);
+  switch (options.command) {
+    case Command::kWatch:
+      Watch(pc, options.watchMilliseconds, options.json, out);
+      return kDone;
+    case Command::kRegister:
+      PrintRegistration(pc, options.json, out);
+      return kDone;
+    case Command::kUnregister:
+      PrintUnregistration(pc, options.json, out);
+      return kDone;
+    default:
+      return LookOnce(options, pc, out, errors);
   }
-  return LookOnce(*line.options, topology, out, errors);
 }
 
 }  // namespace

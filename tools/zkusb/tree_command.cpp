@@ -12,7 +12,8 @@ namespace zkusb {
 
 namespace {
 
-std::u16string Number(std::uint32_t value) {
+template <class Integer>
+std::u16string Number(Integer value) {
   return platform::Decimal(static_cast<std::int32_t>(value));
 }
 
@@ -57,9 +58,9 @@ TextTree DeviceLine(std::u16string head, const NodeView& device) {
 TextTree PortLine(const NodeView& port);
 
 void AddPortLines(const NodeView& hub, TextTree& line) {
-  std::vector<std::uint32_t> empty;
+  std::vector<std::int32_t> empty;
   for (const NodeView& port : hub.Childs) {
-    if (port.Status == PortStatus::kEmpty && port.Childs.empty()) {
+    if (port.Childs.empty()) {
       empty.push_back(port.PortIndex);
     } else {
       line.below.push_back(PortLine(port));
@@ -80,10 +81,10 @@ void AddPortLines(const NodeView& hub, TextTree& line) {
 
 TextTree HubLine(const std::u16string& head, const NodeView& hub) {
   std::u16string name = VendorText(hub);
-  if (name.empty()) name = Tidied(hub.DeviceDescr);
+  if (name.empty()) name = Tidied(hub.Description);
   TextTree line{head + u"hub " + WithBlank(IdText(hub)),
                 std::move(name),
-                u", " + Number(hub.NumberOfPorts) + u" ports",
+                u", " + Number(hub.Childs.size()) + u" ports",
                 {}};
   AddPortLines(hub, line);
   return line;
@@ -91,19 +92,17 @@ TextTree HubLine(const std::u16string& head, const NodeView& hub) {
 
 TextTree PortLine(const NodeView& port) {
   std::u16string head = u"Port " + Number(port.PortIndex) + u": ";
-  if (port.Status == PortStatus::kUnconfigured) head += u"bad device  ";
-  if (port.Childs.empty()) return {std::move(head), {}, {}, {}};
   const NodeView& child = port.Childs.front();
-  if (child.Type == NodeType::kHub) return HubLine(head, child);
+  if (child.Type == KUDTHub) return HubLine(head, child);
   return DeviceLine(head + SpeedText(child.Speed) + u"  ", child);
 }
 
 TextTree ControllerLine(const NodeView& controller) {
-  const std::u16string description = Tidied(controller.DeviceDescr);
+  const std::u16string description = Tidied(controller.Description);
   TextTree line{{}, description.empty() ? controller.InstanceId : description, {}, {}};
   for (const NodeView& hub : controller.Childs) {
     TextTree& below = line.below.emplace_back();
-    below.head = u"Root hub, " + Number(hub.NumberOfPorts) + u" ports";
+    below.head = u"Root hub, " + Number(hub.Childs.size()) + u" ports";
     AddPortLines(hub, below);
   }
   return line;

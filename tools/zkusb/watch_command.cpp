@@ -1,17 +1,20 @@
+#include <algorithm>
 #include <array>
+#include <mutex>
+#include <optional>
 #include <utility>
 
 #include "platform/text.h"
 #include "tools/zkusb/commands.h"
+#include "tools/zkusb/component.h"
 #include "tools/zkusb/device_facts.h"
 #include "tools/zkusb/device_texts.h"
 #include "tools/zkusb/json.h"
+#include "tools/zkusb/node_reader.h"
 
 namespace zkusb {
 
 namespace {
-
-using platform::simulated::Step;
 
 // As wide as the longest, so that the devices stand below each other.
 constexpr std::array<std::u16string_view, 4> kEventWords{u"connected", u"attached ", u"removed  ",
@@ -25,11 +28,9 @@ std::u16string Seconds(std::uint32_t milliseconds) {
   return text.append(u".").append(fraction).append(u"s");
 }
 
-std::u16string EventText(const Step& step, const DeviceEvent& event) {
-  const NodeView& device = event.device;
+std::u16string EventText(TDeviceEventType kind, std::uint32_t at, const NodeView& device) {
   std::vector<std::u16string> parts{
-      u"  " + Seconds(step.atMilliseconds),
-      std::u16string(kEventWords.at(static_cast<std::size_t>(event.kind))),
+      u"  " + Seconds(at), std::u16string(kEventWords.at(static_cast<std::size_t>(kind))),
       Joined({IdText(device), VendorText(device), ProductText(device)}, u" ")};
   const std::u16string serial = SerialText(device);
   if (!serial.empty()) parts.push_back(u"serial " + serial);
@@ -43,51 +44,80 @@ std::u16string EventText(const Step& step, const DeviceEvent& event) {
   return Joined(parts, u"  ");
 }
 
-void TellAsText(const Step& step, bool changed, const std::vector<DeviceEvent>& events,
-                Writer& out) {
-  out.Line(Joined({Seconds(step.atMilliseconds), step.name}, u"  "));
-  for (const DeviceEvent& event : events) out.Line(EventText(step, event));
-  if (events.empty()) out.Line(changed ? u"  no event" : u"  no change");
-}
+// Prints as it goes. Events come on threads of the component, while the thread that plays the
+// script waits; the lock says so to those who check.
+class Watcher {
+ public:
+  Watcher(const Pc& pc, bool json, Writer& out) noexcept : m_pc(pc), m_json(json), m_out(out) {}
 
-void TellAsJson(const Step& step, bool changed, const std::vector<DeviceEvent>& events,
-                Writer& out) {
-  const Json head = {{"at", step.atMilliseconds}, {"step", TextJson(step.name)}};
-  for (const DeviceEvent& event : events) {
-    Json line = head;
-    line["event"] = EventName(event.kind);
-    line.update(DeviceJson(event.device));
-    out.Json(line, false);
+  void Tell(TDeviceEventType kind, IZKUMUsbTreeNode& node) {
+    const NodeView device = ReadNode(node);
+    const auto at = static_cast<std::uint32_t>(m_pc.Now());
+    const std::lock_guard lock(m_mutex);
+    ++m_events;
+    if (m_json) {
+      Json line = {{"at", at}, {"event", EventName(kind)}};
+      line.update(DeviceJson(device));
+      m_out.Json(line, false);
+    } else {
+      m_out.Line(EventText(kind, at, device));
+    }
   }
-  if (!events.empty()) return;
-  Json line = head;
-  line["event"] = nullptr;
-  line["changed"] = changed;
-  out.Json(line, false);
-}
+
+  void TellStart(std::size_t devices) {
+    const std::lock_guard lock(m_mutex);
+    if (m_json) {
+      m_out.Json({{"event", nullptr}, {"devices", devices}}, false);
+    } else {
+      m_out.Line(platform::Decimal(static_cast<std::int32_t>(devices)) +
+                 (devices == 1 ? u" device at the start" : u" devices at the start"));
+    }
+  }
+
+  void BeginStep(const Pc::Step& step) {
+    const std::lock_guard lock(m_mutex);
+    m_events = 0;
+    if (m_json) {
+      m_out.Json({{"at", step.atMilliseconds}, {"step", TextJson(step.name)}}, false);
+    } else {
+      m_out.Line(Joined({Seconds(step.atMilliseconds), step.name}, u"  "));
+    }
+  }
+
+  // For people, a step without events says so; a late one may still come.
+  void EndStep() {
+    const std::lock_guard lock(m_mutex);
+    if (m_events == 0 && !m_json) m_out.Line(u"  no event");
+  }
+
+ private:
+  const Pc& m_pc;
+  const bool m_json;
+  Writer& m_out;
+  std::mutex m_mutex;
+  std::size_t m_events = 0;  // of the running step
+};
 
 }  // namespace
 
-void Watch(Topology& topology, bool json, Writer& out) {
-  topology.Refresh();
-  const std::optional<NodeView> root = topology.Root();
-  const std::size_t devices = root ? PortDevices(*root).size() : 0;
-  if (json) {
-    out.Json({{"event", nullptr}, {"devices", devices}}, false);
-  } else {
-    out.Line(platform::Decimal(static_cast<std::int32_t>(devices)) +
-             (devices == 1 ? u" device at the start" : u" devices at the start"));
+void Watch(Pc& pc, std::uint32_t milliseconds, bool json, Writer& out) {
+  Watcher watcher(pc, json, out);
+  const Component component(
+      [&](TDeviceEventType kind, IZKUMUsbTreeNode& node) { watcher.Tell(kind, node); });
+  const std::optional<NodeView> root = component.Root();
+  watcher.TellStart(root ? PortDevices(*root).size() : 0);
+  const std::uint64_t start = pc.Now();
+  for (std::size_t index = 0; index < pc.Steps().size(); ++index) {
+    const Pc::Step& step = pc.Steps()[index];
+    // What an earlier step set off late comes before this one.
+    const std::uint64_t at = std::max<std::uint64_t>(step.atMilliseconds, start);
+    if (at > pc.Now()) pc.WaitFor(static_cast<std::uint32_t>(at - pc.Now()));
+    watcher.BeginStep(step);
+    pc.Play(index);
+    watcher.EndStep();
   }
-  for (std::size_t index = 0; index < topology.Steps().size(); ++index) {
-    topology.Apply(index);
-    const bool changed = topology.Refresh();
-    const Step& step = topology.Steps()[index];
-    if (json) {
-      TellAsJson(step, changed, topology.Events(), out);
-    } else {
-      TellAsText(step, changed, topology.Events(), out);
-    }
-  }
+  if (milliseconds != 0) pc.WaitFor(milliseconds);
+  pc.Settle();
 }
 
 }  // namespace zkusb

@@ -1,0 +1,76 @@
+#include "tools/zkusb/component.h"
+
+#include <utility>
+
+#include "platform/text.h"
+#include "tools/zkusb/node_reader.h"
+
+namespace zkusb {
+
+using KelvoUHW::ComPtr;
+
+namespace {
+
+std::string CodeText(HRESULT code) {
+  return "0x" + platform::ToUtf8(platform::Hex(static_cast<std::uint32_t>(code), 8));
+}
+
+void Check(HRESULT result, const char* call) {
+  if (FAILED(result)) throw ComponentError(call, result);
+}
+
+template <class Interface>
+ComPtr<Interface> CreateObject(const CLSID& clsid, const char* name) {
+  ComPtr<Interface> object;
+  Check(CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, platform::IidOf<Interface>(),
+                         object.PutVoid()),
+        name);
+  return object;
+}
+
+}  // namespace
+
+ComponentError::ComponentError(const std::string& call, HRESULT code)
+    : std::runtime_error(call + " failed with " + CodeText(code)) {}
+
+Apartment::Apartment() {
+  Check(CoInitializeEx(nullptr, COINIT_MULTITHREADED), "entering the multithreaded apartment");
+}
+
+Component::Component(EventSink::Handler handler) {
+  m_notifier =
+      CreateObject<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier, "creating ZKUMEventNotifier");
+  m_tree = CreateObject<IZKUMUsbTree>(CLSID_ZKUMUsbTree, "creating ZKUMUsbTree");
+  const auto container = m_notifier.As<IConnectionPointContainer>();
+  if (!container) throw ComponentError("asking for the connection points", E_NOINTERFACE);
+  Check(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, m_point.Put()),
+        "FindConnectionPoint");
+  const ComPtr<IUnknown> sink = EventSink::Create(std::move(handler));
+  const HRESULT advised = m_point->Advise(sink.Get(), &m_cookie);
+  if (SUCCEEDED(advised)) return;
+  // A failed first report leaves the sink advised.
+  if (m_cookie != 0) m_point->Unadvise(m_cookie);
+  throw ComponentError("Advise", advised);
+}
+
+Component::~Component() { m_point->Unadvise(m_cookie); }
+
+ComPtr<IZKUMUsbTreeNode> Component::RootNode() const {
+  ComPtr<IZKUMUsbTreeNode> root;
+  const HRESULT result = m_tree->get_RootNode(root.Put());
+  if (result != E_POINTER) Check(result, "RootNode");
+  return root;
+}
+
+std::optional<NodeView> Component::Root() const {
+  const ComPtr<IZKUMUsbTreeNode> root = RootNode();
+  if (!root) return std::nullopt;
+  return ReadNode(*root.Get());
+}
+
+std::u16string Component::Dump() const {
+  const ComPtr<IZKUMUsbTreeNode> root = RootNode();
+  return root ? ReadDump(*root.Get()) : std::u16string();
+}
+
+}  // namespace zkusb

@@ -1,0 +1,55 @@
+// The component as a client has it: two objects created through COM, and nothing else.
+#pragma once
+
+#include <optional>
+#include <stdexcept>
+#include <string>
+
+#include "com/com_ptr.h"
+#include "com/zkusb_monitor.h"
+#include "tools/zkusb/event_sink.h"
+#include "tools/zkusb/node_view.h"
+
+namespace zkusb {
+
+// A call of the component that failed, with its name and its code.
+class ComponentError : public std::runtime_error {
+ public:
+  ComponentError(const std::string& call, HRESULT code);
+};
+
+// The multithreaded apartment of the calling thread, for as long as it lives.
+class Apartment {
+ public:
+  Apartment();
+  ~Apartment() { CoUninitialize(); }
+  Apartment(const Apartment&) = delete;
+  Apartment& operator=(const Apartment&) = delete;
+};
+
+// Makes both objects and advises a sink: from then on the tree is there and `handler` is called,
+// first for every connected device before the constructor returns, then for what comes and goes, on
+// threads of the component. One thread; throws ComponentError.
+class Component {
+ public:
+  explicit Component(EventSink::Handler handler);
+  ~Component();
+  Component(const Component&) = delete;
+  Component& operator=(const Component&) = delete;
+
+  // Nothing as long as no build has found anything.
+  std::optional<NodeView> Root() const;
+  // The component's own text for the root; empty when there is none.
+  std::u16string Dump() const;
+
+ private:
+  KelvoUHW::ComPtr<IZKUMUsbTreeNode> RootNode() const;
+
+  Apartment m_apartment;
+  KelvoUHW::ComPtr<IZKUMEventNotifier> m_notifier;
+  KelvoUHW::ComPtr<IZKUMUsbTree> m_tree;
+  KelvoUHW::ComPtr<IConnectionPoint> m_point;
+  DWORD m_cookie = 0;
+};
+
+}  // namespace zkusb

@@ -1,0 +1,49 @@
+// The commands register and unregister.
+#include <algorithm>
+
+#include "tools/zkusb/commands.h"
+#include "tools/zkusb/json.h"
+
+namespace zkusb {
+
+namespace {
+
+void PrintLines(const std::vector<std::u16string>& lines, std::u16string_view before, Writer& out) {
+  for (const std::u16string& line : lines) out.Line(std::u16string(before).append(line));
+}
+
+Json LinesJson(const std::vector<std::u16string>& lines) {
+  Json list = Json::array();
+  for (const std::u16string& line : lines) list.push_back(TextJson(line));
+  return list;
+}
+
+}  // namespace
+
+void PrintRegistration(const Pc& pc, bool json, Writer& out) {
+  const std::vector<std::u16string> written = pc.RegistryLines();
+  if (json) {
+    out.Json({{"written", LinesJson(written)}}, true);
+  } else {
+    PrintLines(written, {}, out);
+  }
+}
+
+void PrintUnregistration(Pc& pc, bool json, Writer& out) {
+  const std::vector<std::u16string> before = pc.RegistryLines();
+  pc.Unregister();
+  const std::vector<std::u16string> left = pc.RegistryLines();
+  std::vector<std::u16string> removed;
+  std::copy_if(before.begin(), before.end(), std::back_inserter(removed),
+               [&](const std::u16string& line) {
+                 return std::find(left.begin(), left.end(), line) == left.end();
+               });
+  if (json) {
+    out.Json({{"removed", LinesJson(removed)}, {"left", LinesJson(left)}}, true);
+    return;
+  }
+  PrintLines(removed, u"removed  ", out);
+  PrintLines(left, u"left     ", out);
+}
+
+}  // namespace zkusb
