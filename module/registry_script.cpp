@@ -37,7 +37,7 @@ class Tokens {
 
   const Token& Current() const { return m_current; }
   Token Take() {
-    Token token = std::move(m_current);
+    Token token = std::exchange(m_current, {});
     Advance();
     return token;
   }

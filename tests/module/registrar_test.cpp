@@ -97,7 +97,7 @@ TEST(Registrar, WritesAndRemovesWhatAScriptSays) {
 TEST(Registrar, RefusesMalformedScriptsBeforeItWrites) {
   const std::u16string deep = [] {
     std::u16string text = u"HKCR { ";
-    for (int i = 0; i < 100'000; ++i) text += u"A { ";
+    for (int i = 0; i < 20'000; ++i) text += u"A { ";
     return text;
   }();
   const std::u16string kCases[] = {
@@ -160,7 +160,7 @@ TEST(Registrar, RefusesMalformedScriptsBeforeItWrites) {
   // Deeper than the registry takes it: its error, not ours, and no deeper stack.
   SimulatedRegistry registry;
   std::u16string whole = deep;
-  for (int i = 0; i <= 100'000; ++i) whole += u"} ";
+  for (int i = 0; i <= 20'000; ++i) whole += u"} ";
   EXPECT_EQ(RegisterScript(registry, whole, {}), HRESULT_FROM_WIN32(platform::kERROR_INVALID_PARAMETER));
   EXPECT_EQ(LinesOf(registry).size(), 511u);
   EXPECT_EQ(UnregisterScript(registry, whole, {}), S_OK);
@@ -229,7 +229,7 @@ TEST(Registrar, RandomScriptsEndAndUndoWhatTheyDo) {
   std::mt19937 random(7);
   const auto below = [&](std::size_t bound) { return random() % bound; };
   std::size_t taken = 0;
-  for (int round = 0; round < 20'000; ++round) {
+  for (int round = 0; round < 4'000; ++round) {
     std::u16string script = u"HKCR { ";
     // Every other one is made of whole statements, or hardly any would be taken.
     const bool whole = round % 2 == 0;
@@ -274,7 +274,7 @@ TEST(Registrar, RandomScriptsEndAndUndoWhatTheyDo) {
     ExpectAllClosed(registry);
     ASSERT_FALSE(HasFailure());
   }
-  EXPECT_GE(taken, 10'000u);
+  EXPECT_GT(taken, 2'000u);
 }
 
 }  // namespace

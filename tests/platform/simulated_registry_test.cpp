@@ -180,6 +180,8 @@ TEST(SimulatedRegistry, DeletesTreesOfAnyDepthAndTakesNoHiddenKeyForGone) {
   EXPECT_TRUE(root.DeleteTree(u"tree"));
   EXPECT_EQ(Code(root.DeleteTree(u"Tree")), kERROR_FILE_NOT_FOUND);
   EXPECT_THAT(LinesOf(registry), ElementsAre("Stays"));
+  EXPECT_TRUE(registry.DeleteKey(kHKEY_CLASSES_ROOT, u"Stays"));
+  EXPECT_EQ(Code(registry.DeleteKey(kHKEY_CLASSES_ROOT, u"")), kERROR_ACCESS_DENIED);  // even an empty root
   root.Close();
   ExpectAllClosed(registry);
 }
