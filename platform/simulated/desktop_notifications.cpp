@@ -52,7 +52,7 @@ Status SimulatedDesktop::RegisterDeviceNotificationW(WindowHandle recipient, con
                                                      NotificationHandle& notification) noexcept {
   notification = 0;
   auto lock = m_state->Guard();
-  if (const Status ordered = m_state->Begin(lock, DesktopCall::RegisterDeviceNotification);
+  if (const Status ordered = m_state->Begin(lock, DesktopCall::RegisterDeviceNotificationW);
       !ordered) {
     return ordered;
   }

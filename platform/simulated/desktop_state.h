@@ -2,7 +2,7 @@
 #pragma once
 
 #include <deque>
-#include <list>
+#include <functional>
 #include <map>
 #include <string>
 #include <unordered_map>
@@ -41,9 +41,8 @@ struct MessageQueue {
 };
 
 struct SimulatedDesktop::State {
-  explicit State(ClockMode clockMode) : mode(clockMode), scheduler(clockMode) {}
+  explicit State(ClockMode mode) : scheduler(mode) {}
 
-  const ClockMode mode;
   mutable Scheduler scheduler;  // its lock guards everything below
 
   CallOrders orders;
@@ -54,6 +53,7 @@ struct SimulatedDesktop::State {
   std::unordered_set<char16_t*> localBuffers;
   WindowHandle lastWindow = 0x10000;
   NotificationHandle lastRegistration = 0x2000;
+  std::function<LResult(const MSG&)> defaultProcedure;
   std::vector<SleepFacts> sleeps;
   std::vector<const void*> pins;
   std::vector<BoxFacts> boxes;

@@ -1,5 +1,5 @@
 #include <atomic>
-#include <exception>
+#include <new>
 #include <utility>
 
 #include "platform/simulated/desktop_state.h"
@@ -27,34 +27,36 @@ Status SimulatedDesktop::State::Begin(Scheduler::Lock& lock, DesktopCall call) {
 }
 
 bool SimulatedDesktop::StartThread(ThreadRoutine routine, std::uint32_t, void* argument) noexcept {
-  const auto lock = m_state->Guard();
-  if (m_state->orders.Next(DesktopCall::StartThread).error) return false;
-  return m_state->scheduler.Start([this, routine, argument] {
-    const auto misuse = [&] {
-      const auto guard = m_state->Guard();
-      m_state->misuses.emplace_back(u"an exception left a thread");
-    };
+  const auto run = [this, routine, argument] {
     try {
       routine(argument);
     } catch (const ThreadEnd&) {
     } catch (...) {
-      misuse();
+      const auto guard = m_state->Guard();
+      m_state->misuses.emplace_back(u"an exception left a thread");
     }
     const auto guard = m_state->Guard();
     m_state->DropThread(CurrentThreadId());
-  });
+  };
+  const auto lock = m_state->Guard();
+  if (m_state->orders.Next(DesktopCall::StartThread).error) return false;
+  try {
+    return m_state->scheduler.Start(run);
+  } catch (const std::bad_alloc&) {
+    return false;
+  }
 }
 
 void SimulatedDesktop::Sleep(std::uint32_t milliseconds) {
   auto lock = m_state->Guard();
   const std::uint64_t now = m_state->scheduler.Now();
-  if (m_state->mode == ClockMode::Virtual) {
+  if (m_state->scheduler.Mode() == ClockMode::Virtual) {
     m_state->sleeps.push_back({CurrentThreadId(), milliseconds, now});
   }
   Scheduler::Waiter waiter;
   std::optional<std::uint64_t> until = now + milliseconds;
   if (milliseconds == kForever) until.reset();
-  if (m_state->scheduler.Block(lock, waiter, until) == Scheduler::Woken::ByEnd) throw ThreadEnd();
+  if (!m_state->scheduler.Block(lock, waiter, until)) throw ThreadEnd();
 }
 
 std::uint32_t SimulatedDesktop::CurrentThreadId() noexcept {
@@ -109,6 +111,16 @@ ClientThread::ClientThread(SimulatedDesktop& desktop) : m_desktop(desktop) {
 ClientThread::~ClientThread() {
   const auto lock = m_desktop.m_state->Guard();
   m_desktop.m_state->scheduler.Uncount();
+}
+
+WaitOutside::WaitOutside(SimulatedDesktop& desktop) : m_desktop(desktop) {
+  const auto lock = m_desktop.m_state->Guard();
+  m_desktop.m_state->scheduler.Uncount();
+}
+
+WaitOutside::~WaitOutside() {
+  const auto lock = m_desktop.m_state->Guard();
+  m_desktop.m_state->scheduler.Count();
 }
 
 }  // namespace platform::simulated

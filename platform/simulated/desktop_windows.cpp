@@ -86,7 +86,7 @@ void SimulatedDesktop::State::DropThread(std::uint32_t thread) {
 
 Status SimulatedDesktop::RegisterClassW(const WNDCLASSW& windowClass) noexcept {
   auto lock = m_state->Guard();
-  if (const Status ordered = m_state->Begin(lock, DesktopCall::RegisterClass); !ordered) {
+  if (const Status ordered = m_state->Begin(lock, DesktopCall::RegisterClassW); !ordered) {
     return ordered;
   }
   if (windowClass.lpszClassName == nullptr || windowClass.lpfnWndProc == nullptr) {
@@ -105,7 +105,7 @@ Status SimulatedDesktop::RegisterClassW(const WNDCLASSW& windowClass) noexcept {
 Status SimulatedDesktop::CreateWindowExW(const CREATESTRUCTW& creation, WindowHandle& window) {
   window = 0;
   auto lock = m_state->Guard();
-  if (const Status ordered = m_state->Begin(lock, DesktopCall::CreateWindow); !ordered) {
+  if (const Status ordered = m_state->Begin(lock, DesktopCall::CreateWindowExW); !ordered) {
     return ordered;
   }
   const std::u16string name = creation.lpszClass != nullptr ? creation.lpszClass : u"";
@@ -177,7 +177,7 @@ std::intptr_t SimulatedDesktop::SetWindowUserData(WindowHandle window,
 std::int32_t SimulatedDesktop::GetMessageW(MSG& message, WindowHandle window, std::uint32_t first,
                                            std::uint32_t last) {
   auto lock = m_state->Guard();
-  if (!m_state->Begin(lock, DesktopCall::GetMessage)) return -1;
+  if (!m_state->Begin(lock, DesktopCall::GetMessageW)) return -1;
   if (window != 0 || first != 0 || last != 0) return -1;
   MessageQueue& queue = m_state->queues[CurrentThreadId()];
   for (;;) {
@@ -216,7 +216,14 @@ LResult SimulatedDesktop::DispatchMessageW(const MSG& message) {
   return m_state->Run(lock, message);
 }
 
-LResult SimulatedDesktop::DefWindowProcW(WindowHandle, std::uint32_t message, WParam, LParam) {
+LResult SimulatedDesktop::DefWindowProcW(WindowHandle window, std::uint32_t message, WParam wParam,
+                                         LParam lParam) {
+  std::function<LResult(const MSG&)> procedure;
+  {
+    const auto lock = m_state->Guard();
+    procedure = m_state->defaultProcedure;
+  }
+  if (procedure) return procedure({window, message, wParam, lParam});
   return message == kWM_NCCREATE ? 1 : 0;
 }
 

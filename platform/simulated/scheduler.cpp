@@ -1,109 +1,130 @@
 #include "platform/simulated/scheduler.h"
 
 #include <algorithm>
-#include <system_error>
+#include <exception>
 #include <utility>
 
 namespace platform::simulated {
 
 Scheduler::Milliseconds Scheduler::Now() const {
   if (m_mode == ClockMode::Virtual) return m_virtualNow;
-  return static_cast<Milliseconds>(std::chrono::duration_cast<std::chrono::milliseconds>(
-                                       std::chrono::steady_clock::now() - m_start)
-                                       .count());
+  const auto passed = std::chrono::steady_clock::now() - m_start;
+  return static_cast<Milliseconds>(
+      std::chrono::duration_cast<std::chrono::milliseconds>(passed).count());
 }
 
-Scheduler::Woken Scheduler::Block(Lock& lock, Waiter& waiter, std::optional<Milliseconds> until,
-                                  Turn turn) {
-  if (m_ended) return Woken::ByEnd;
+void Scheduler::FallAsleep(Waiter& waiter, std::optional<Milliseconds> until, Turn turn) {
+  waiter.m_blocked = true;
+  waiter.m_goes = false;
+  waiter.m_until = until;
+  waiter.m_turn = turn;
+  m_sleepers.push_back(&waiter);
+}
+
+void Scheduler::Await(Lock& lock, Waiter& waiter) {
+  const auto over = [&] { return waiter.m_goes || m_ended; };
+  if (m_mode == ClockMode::Real && waiter.m_until) {
+    const auto until = m_start + std::chrono::milliseconds(*waiter.m_until);
+    waiter.m_wake.wait_until(lock, until, over);
+  } else {
+    waiter.m_wake.wait(lock, over);
+  }
+  // Whoever wakes a thread counts it as running, or time could move before it does.
+  if (!waiter.m_goes) ++m_running;
+  waiter.m_blocked = false;
+  m_sleepers.remove(&waiter);
+}
+
+bool Scheduler::Block(Lock& lock, Waiter& waiter, std::optional<Milliseconds> until, Turn turn) {
+  if (m_ended) return false;
   const bool counted = m_counted.contains(std::this_thread::get_id());
-  waiter.woken = false;
-  const auto place = m_sleepers.insert(m_sleepers.end(), {&waiter, until, turn});
+  FallAsleep(waiter, until, turn);
   if (counted) --m_running;
   AdvanceWhenAllWait();
-
-  const auto woken = [&] { return waiter.woken || m_ended; };
-  Woken result = Woken::ByOther;
-  if (m_mode == ClockMode::Real && until) {
-    if (!waiter.wake.wait_until(lock, m_start + std::chrono::milliseconds(*until), woken)) {
-      result = Woken::ByTime;
-    }
-  } else {
-    waiter.wake.wait(lock, woken);
-    // Nobody but the clock takes the moment away.
-    if (waiter.woken && until && !place->until) result = Woken::ByTime;
-  }
-  m_sleepers.erase(place);
-  // Whoever wakes a thread counts it as running, or time could move before it does.
-  if (!waiter.woken) {
-    ++m_running;
-    if (m_ended) result = Woken::ByEnd;
-  }
+  Await(lock, waiter);
   if (!counted) {
     --m_running;
     AdvanceWhenAllWait();
   }
-  return result;
+  return !m_ended;
+}
+
+void Scheduler::Go(Waiter& waiter) {
+  waiter.m_goes = true;
+  ++m_running;
+  waiter.m_wake.notify_one();
 }
 
 void Scheduler::Wake(Waiter& waiter) {
-  if (waiter.woken || m_ended) return;
-  waiter.woken = true;
-  ++m_running;
-  waiter.wake.notify_one();
+  if (!waiter.m_blocked || waiter.m_goes || m_ended) return;
+  if (m_mode == ClockMode::Real) {
+    Go(waiter);
+    return;
+  }
+  waiter.m_until = std::min(waiter.m_until.value_or(m_virtualNow), m_virtualNow);
+  AdvanceWhenAllWait();
 }
 
 void Scheduler::AdvanceWhenAllWait() {
   if (m_running != 0 || m_ended) return;
-  Sleeper* next = nullptr;
-  for (Sleeper& sleeper : m_sleepers) {
-    if (!sleeper.until || sleeper.waiter->woken) continue;
+  Waiter* next = nullptr;
+  for (Waiter* sleeper : m_sleepers) {
+    if (!sleeper->m_until || sleeper->m_goes) continue;
     if (next == nullptr ||
-        std::pair(*sleeper.until, sleeper.turn) < std::pair(*next->until, next->turn)) {
-      next = &sleeper;
+        std::pair(*sleeper->m_until, sleeper->m_turn) < std::pair(*next->m_until, next->m_turn)) {
+      next = sleeper;
     }
   }
   if (next == nullptr) {
-    if (!m_settling.empty()) Wake(*m_settling.front());
-    return;
+    const auto settling =
+        std::find_if(m_settling.begin(), m_settling.end(),
+                     [](const Waiter* waiter) { return waiter->m_blocked && !waiter->m_goes; });
+    if (settling != m_settling.end()) Go(**settling);
+  } else if (m_mode == ClockMode::Virtual) {
+    m_virtualNow = std::max(m_virtualNow, *next->m_until);
+    Go(*next);
   }
-  if (m_mode == ClockMode::Real) return;
-  m_virtualNow = std::max(m_virtualNow, *next->until);
-  next->until.reset();
-  Wake(*next->waiter);
 }
 
-bool Scheduler::Settle(Lock& lock) {
+void Scheduler::Settle(Lock& lock) {
   Waiter waiter;
   m_settling.push_back(&waiter);
-  const Woken woken = Block(lock, waiter, std::nullopt);
+  Block(lock, waiter, std::nullopt);
   m_settling.remove(&waiter);
+}
+
+void Scheduler::Run(const std::function<void()>& body, Waiter& turn) {
+  Lock lock(m_mutex);
+  m_counted.emplace(std::this_thread::get_id(), Kind::Started);
+  if (m_mode == ClockMode::Virtual) Await(lock, turn);
+  if (!m_ended) {
+    lock.unlock();
+    body();
+    lock.lock();
+  }
+  m_counted.erase(std::this_thread::get_id());
+  m_finished.push_back(std::this_thread::get_id());
+  --m_running;
+  --m_started;
   AdvanceWhenAllWait();
-  return woken != Woken::ByEnd;
 }
 
 bool Scheduler::Start(std::function<void()> body) {
   if (m_ended) return false;
   Reap();
+  std::shared_ptr<Waiter> turn;
   try {
-    m_threads.emplace_back([this, body = std::move(body)] {
-      {
-        const Lock lock(m_mutex);
-        m_counted.emplace(std::this_thread::get_id(), Kind::Started);
-      }
-      body();
-      const Lock lock(m_mutex);
-      m_counted.erase(std::this_thread::get_id());
-      m_finished.push_back(std::this_thread::get_id());
-      --m_running;
-      --m_started;
-      AdvanceWhenAllWait();
-    });
-  } catch (const std::system_error&) {
+    turn = std::make_shared<Waiter>();
+    // In line from here on, so that threads begin in the order in which they were started.
+    if (m_mode == ClockMode::Virtual) FallAsleep(*turn, m_virtualNow, Turn::InOrder);
+    m_threads.emplace_back([this, turn, body = std::move(body)] { Run(body, *turn); });
+  } catch (const std::exception&) {  // neither memory nor a thread
+    m_sleepers.remove(turn.get());
     return false;
   }
-  ++m_running;
   ++m_started;
+  if (m_mode == ClockMode::Real) ++m_running;
+  AdvanceWhenAllWait();
   return true;
 }
 
@@ -135,7 +156,7 @@ void Scheduler::Uncount() {
 
 void Scheduler::End() {
   m_ended = true;
-  for (const Sleeper& sleeper : m_sleepers) sleeper.waiter->wake.notify_all();
+  for (Waiter* sleeper : m_sleepers) sleeper->m_wake.notify_all();
 }
 
 void Scheduler::Join() {

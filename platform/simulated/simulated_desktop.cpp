@@ -29,18 +29,26 @@ std::optional<std::u16string> TextOrNothing(const char16_t* text) {
 
 }  // namespace
 
-SimulatedDesktop::SimulatedDesktop(ClockMode mode) : m_state(std::make_unique<State>(mode)) {}
+SimulatedDesktop::SimulatedDesktop(ClockMode mode) : m_state(std::make_unique<State>(mode)) {
+  const auto lock = m_state->Guard();
+  if (mode == ClockMode::Virtual) m_state->scheduler.Count();
+}
 
 SimulatedDesktop::~SimulatedDesktop() {
   EndProcess();
   for (char16_t* buffer : m_state->localBuffers) delete[] buffer;
 }
 
-ClockMode SimulatedDesktop::Mode() const noexcept { return m_state->mode; }
+ClockMode SimulatedDesktop::Mode() const noexcept { return m_state->scheduler.Mode(); }
 
 std::uint64_t SimulatedDesktop::Now() const {
   const auto lock = m_state->Guard();
   return m_state->scheduler.Now();
+}
+
+void SimulatedDesktop::SetDefaultProcedure(std::function<LResult(const MSG&)> procedure) {
+  const auto lock = m_state->Guard();
+  m_state->defaultProcedure = std::move(procedure);
 }
 
 void SimulatedDesktop::Order(const CallOrder& order) {
@@ -55,7 +63,7 @@ std::uint64_t SimulatedDesktop::Calls(DesktopCall call) const {
 
 DesktopCounts SimulatedDesktop::Counts() const {
   const auto lock = m_state->Guard();
-  return {m_state->scheduler.Running(), m_state->classes.size(), m_state->windows.size(),
+  return {m_state->scheduler.Started(), m_state->classes.size(), m_state->windows.size(),
           m_state->registrations.size(), m_state->localBuffers.size()};
 }
 
@@ -105,7 +113,7 @@ std::vector<std::u16string> SimulatedDesktop::Misuses() const {
 
 InstanceHandle SimulatedDesktop::GetModuleHandleW(const char16_t* name) noexcept {
   auto lock = m_state->Guard();
-  if (!m_state->Begin(lock, DesktopCall::GetModuleHandle)) return 0;
+  if (!m_state->Begin(lock, DesktopCall::GetModuleHandleW)) return 0;
   return name == nullptr ? kProgramInstance : 0;
 }
 
@@ -113,7 +121,7 @@ InstanceHandle SimulatedDesktop::GetModuleHandleW(const char16_t* name) noexcept
 GraphicsHandle SimulatedDesktop::LoadCursorW(InstanceHandle instance,
                                              std::uint16_t number) noexcept {
   auto lock = m_state->Guard();
-  if (!m_state->Begin(lock, DesktopCall::LoadCursor)) return 0;
+  if (!m_state->Begin(lock, DesktopCall::LoadCursorW)) return 0;
   return instance == 0 && number >= kIDC_ARROW ? 0x10000 + number : 0;
 }
 
@@ -126,7 +134,7 @@ GraphicsHandle SimulatedDesktop::GetStockObject(std::int32_t object) noexcept {
 std::uint32_t SimulatedDesktop::FormatMessageW(std::uint32_t flags, std::uint32_t code,
                                                std::uint32_t language, char16_t*& text) noexcept {
   auto lock = m_state->Guard();
-  if (!m_state->Begin(lock, DesktopCall::FormatMessage)) return 0;
+  if (!m_state->Begin(lock, DesktopCall::FormatMessageW)) return 0;
   if (flags != (kFORMAT_MESSAGE_ALLOCATE_BUFFER | kFORMAT_MESSAGE_FROM_SYSTEM) ||
       language != kLANG_USER_DEFAULT) {
     return 0;

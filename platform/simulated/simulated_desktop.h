@@ -2,19 +2,25 @@
 //
 // One SimulatedDesktop is one process from its start to its end. Everything in it may be used from
 // every thread; one lock guards it, which is never held while a window procedure or a thread's
-// routine runs. Threads that are started through the seam belong to the process and are counted:
-// virtual time moves only when all of them wait (see scheduler.h). A client thread counts while it
-// keeps a ClientThread.
+// routine runs.
+//
+// Threads that are started through the seam are counted, and so is, on virtual time, the thread
+// that makes the desktop, and each client thread while it keeps a ClientThread. Virtual time moves,
+// and another thread goes on, only when all of them wait (see scheduler.h): a counted thread lets
+// the others go on with RunFor, Settle or Broadcast, and keeps a WaitOutside while it waits for
+// anything that is not in here, such as the end of a client thread.
 //
 // The end. EndProcess, and the destructor, wake every thread that waits, wait until those that were
 // started here have returned, and let nobody wait again. A process that ends runs nothing of a
 // thread's code any more; here a thread has to leave its own stack, so what waits in Sleep or
 // GetMessageW, or would, throws ThreadEnd, and the thread's last catch, or the thread's start here,
-// takes it. Its destructors run, which they would not on Windows.
+// takes it. Its destructors run, which they would not on Windows. A thread that was started and has
+// not had its turn never runs.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -100,6 +106,8 @@ class SimulatedDesktop final : public Threads, public Desktop {
   void Settle();
 
   void Order(const CallOrder& order);
+  // What DefWindowProcW does from here on; it may throw. None: what the system does.
+  void SetDefaultProcedure(std::function<LResult(const MSG&)> procedure);
   std::uint64_t Calls(DesktopCall call) const;
 
   // Sent to that window: runs in its owner thread while it pumps; its result, or nothing when there
@@ -163,17 +171,30 @@ class SimulatedDesktop final : public Threads, public Desktop {
 
  private:
   friend class ClientThread;
+  friend class WaitOutside;
   struct State;
   std::unique_ptr<State> m_state;
 };
 
-// While it lives, the calling thread counts: virtual time stands still unless it waits too.
+// While it lives, the calling thread counts.
 class ClientThread {
  public:
   explicit ClientThread(SimulatedDesktop& desktop);
   ~ClientThread();
   ClientThread(const ClientThread&) = delete;
   ClientThread& operator=(const ClientThread&) = delete;
+
+ private:
+  SimulatedDesktop& m_desktop;
+};
+
+// While it lives, the calling thread, a counted one, does not count.
+class WaitOutside {
+ public:
+  explicit WaitOutside(SimulatedDesktop& desktop);
+  ~WaitOutside();
+  WaitOutside(const WaitOutside&) = delete;
+  WaitOutside& operator=(const WaitOutside&) = delete;
 
  private:
   SimulatedDesktop& m_desktop;

@@ -1,0 +1,79 @@
+// Threads side by side on the real clock; what they do is small, so that they meet often.
+#include <thread>
+
+#include "monitor/usb_event_receiver.h"
+#include "tests/support/monitor_process.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::simulated::VolumeBroadcast;
+
+constexpr std::uint32_t kArrival = platform::kDBT_DEVICEARRIVAL;
+
+TEST(MonitorStress, FourThreadsShareTheLock) {
+  MonitorProcess process(ClockMode::Real);
+  CThreadLock lock;
+  std::uint64_t shared = 0;  // guarded by the lock and nothing else
+  std::atomic<bool> inside = false;
+  constexpr std::uint64_t kRounds = 2000;
+  const auto work = [&](std::uint64_t seed) {
+    for (std::uint64_t round = 0; round < kRounds; ++round) {
+      const ThreadLockGuard guard(lock);
+      if (inside.exchange(true)) ADD_FAILURE() << "two threads inside";
+      ++shared;
+      if ((round + seed) % 7 == 0) {
+        const ThreadLockGuard again(lock);
+        ++shared;
+      }
+      inside = false;
+      lock.Unlock();  // and once more below, which has no effect when another thread got it
+      std::this_thread::yield();
+    }
+  };
+  std::vector<std::thread> threads;
+  for (std::uint64_t seed = 0; seed < 4; ++seed) threads.emplace_back(work, seed);
+  for (std::thread& thread : threads) thread.join();
+  std::uint64_t expected = 4 * kRounds;
+  for (std::uint64_t seed = 0; seed < 4; ++seed) {
+    for (std::uint64_t round = 0; round < kRounds; ++round) expected += (round + seed) % 7 == 0 ? 1 : 0;
+  }
+  EXPECT_EQ(shared, expected);
+}
+
+TEST(MonitorStress, StartsAndTearsDownInFreshProcesses) {
+  constexpr std::size_t kProcesses = 200;
+  constexpr std::size_t kBroadcasts = 8;
+  std::size_t calls = 0;
+  std::size_t registered = 0;
+  const std::int32_t locks = ModuleLockCount();
+  for (std::size_t number = 0; number < kProcesses; ++number) {
+    MonitorProcess process(ClockMode::Real);
+    RecordingTarget target(process.desktop);
+    auto receiver = std::make_unique<CZKUMUsbEventReceiver>();
+    // Whether the window is there in time is a matter of luck on the real clock.
+    registered += receiver->Start(&target) ? 1 : 0;
+    std::thread sender([&] {
+      for (std::size_t i = 0; i < kBroadcasts; ++i) {
+        process.desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0));
+        process.desktop.Broadcast(NamedBroadcast(kArrival, 5, kWatchedPath));
+      }
+    });
+    // Half of them tear down amid the broadcasts.
+    if (number % 2 == 0) sender.join();
+    if (number % 4 == 0) StopReceiving();
+    receiver.reset();
+    if (sender.joinable()) sender.join();
+    process.desktop.Settle();
+    calls += target.Calls().size();
+    EXPECT_EQ(process.desktop.Counts().registrations, 0u);
+    EXPECT_EQ(target.References(), 1);
+  }
+  EXPECT_EQ(ModuleLockCount(), locks);
+  // At least the volumes of the processes that stopped before they tore down.
+  EXPECT_GE(calls, kProcesses / 4 * kBroadcasts / 2);
+  EXPECT_GE(registered, 1u);
+}
+
+}  // namespace
+}  // namespace KelvoUHW

@@ -1,0 +1,124 @@
+// A simulated process for tests of the monitor, and a target that event threads can call.
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <cstring>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "com/module_lock.h"
+#include "monitor/process_state.h"
+#include "platform/device_broadcast.h"
+#include "platform/simulated/simulated_desktop.h"
+#include "platform/system.h"
+#include "platform/text.h"
+
+namespace KelvoUHW {
+
+using platform::simulated::ClockMode;
+using platform::simulated::DesktopCall;
+using platform::simulated::DeviceBroadcast;
+using platform::simulated::SimulatedDesktop;
+
+// From its start to its end, which every test of the monitor has to come to without a misuse.
+class MonitorProcess {
+ public:
+  explicit MonitorProcess(ClockMode mode = ClockMode::Virtual) : desktop(mode) {
+    ForgetMonitorState();
+    platform::System system;
+    system.threads = &desktop;
+    system.desktop = &desktop;
+    platform::SetCurrentSystem(system);
+  }
+  ~MonitorProcess() {
+    desktop.EndProcess();
+    for (const std::u16string& misuse : desktop.Misuses()) ADD_FAILURE() << platform::ToUtf8(misuse);
+    EXPECT_EQ(desktop.Counts().threads, 0u);
+    EXPECT_EQ(desktop.Counts().localBuffers, 0u);
+    ForgetMonitorState();
+    platform::SetCurrentSystem({});
+  }
+
+  // A thread of the process that runs `body` in its turn.
+  void Launch(std::function<void()> body) {
+    auto owned = std::make_unique<std::function<void()>>(std::move(body));
+    const auto run = [](void* argument) {
+      const std::unique_ptr<std::function<void()>> mine(static_cast<std::function<void()>*>(argument));
+      (*mine)();
+    };
+    ASSERT_TRUE(desktop.StartThread(run, 0, owned.get()));
+    owned.release();
+  }
+
+  SimulatedDesktop desktop;
+};
+
+// Remembers each call; on one thread at a time, as the lock promises.
+class RecordingTarget final : public IZKUMPrivateNotifier {
+ public:
+  struct Call {
+    std::uint64_t at = 0;
+    ULONG delay = 0;
+    BYTE fire = 0;
+    std::uint32_t apartments = 0;
+    friend bool operator==(const Call&, const Call&) = default;
+  };
+
+  explicit RecordingTarget(SimulatedDesktop& desktop) : m_desktop(desktop) {}
+  ~RecordingTarget() { EXPECT_EQ(m_references, 1) << "references of others"; }
+
+  std::vector<Call> Calls() const {
+    const std::lock_guard lock(m_mutex);
+    return m_calls;
+  }
+  std::int32_t References() const { return m_references; }
+  // Runs inside each call.
+  std::function<void()> onCall;
+
+  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID, void** object) override {
+    *object = nullptr;
+    return E_NOINTERFACE;
+  }
+  ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
+  ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
+  HRESULT STDMETHODCALLTYPE NotifyDeviceChange(ULONG delay, BYTE fire) override {
+    {
+      const std::lock_guard lock(m_mutex);
+      m_calls.push_back({m_desktop.Now(), delay, fire, platform::native::ApartmentDepth()});
+    }
+    if (onCall) onCall();
+    return S_OK;
+  }
+
+ private:
+  SimulatedDesktop& m_desktop;
+  std::atomic<std::int32_t> m_references = 1;
+  mutable std::mutex m_mutex;
+  std::vector<Call> m_calls;
+};
+
+inline constexpr char16_t kWatchedPath[] =
+    u"\\\\?\\USB#VID_05AC&PID_1291#0a1b2c#{a5dcbf10-6530-11d2-901f-00c04fb951ed}";
+
+// A broadcast with a name, cut to `bytes` where that is not 0; its size field says what is left.
+inline DeviceBroadcast NamedBroadcast(std::uint32_t event, std::uint32_t type, const std::u16string& name,
+                                      std::size_t bytes = 0) {
+  DeviceBroadcast broadcast = platform::simulated::InterfaceBroadcast(event, {}, name);
+  if (bytes != 0) broadcast.record.resize(bytes);
+  const auto size = static_cast<std::uint32_t>(broadcast.record.size());
+  std::memcpy(broadcast.record.data(), &size, sizeof size);
+  if (broadcast.record.size() >= 8) std::memcpy(broadcast.record.data() + 4, &type, sizeof type);
+  return broadcast;
+}
+
+inline platform::LParam RecordOf(const DeviceBroadcast& broadcast) {
+  return broadcast.record.empty() ? 0 : reinterpret_cast<platform::LParam>(broadcast.record.data());
+}
+
+}  // namespace KelvoUHW
