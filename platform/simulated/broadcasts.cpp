@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <iterator>
 #include <map>
 #include <unordered_map>
 #include <unordered_set>
@@ -15,40 +14,44 @@
 namespace platform::simulated {
 namespace {
 
-// Number of parents above each device, by lowered id. Ends in a circle of parents, too.
-class Depths {
+// The order in which the devices of a machine start: that of the file, but each behind its parents.
+class StartOrder {
  public:
-  explicit Depths(const Machine& machine) {
-    for (const Device& device : machine.devices) m_parents[ToLower(device.id)] = device.parent;
+  explicit StartOrder(const Machine& machine) {
+    std::unordered_map<Text, const Device*> devices;
+    for (const Device& device : machine.devices) devices.emplace(ToLower(device.id), &device);
+    for (const Device& device : machine.devices) {
+      std::vector<Text> chain;
+      // Ends in a circle of parents, too.
+      for (auto node = devices.find(ToLower(device.id));
+           node != devices.end() && !m_ranks.contains(node->first) &&
+           chain.size() <= devices.size();
+           node = devices.find(ToLower(node->second->parent))) {
+        chain.push_back(node->first);
+      }
+      for (auto id = chain.rbegin(); id != chain.rend(); ++id) m_ranks.emplace(*id, m_ranks.size());
+    }
   }
   std::size_t Of(const Text& id) const {
-    std::size_t depth = 0;
-    for (auto node = m_parents.find(ToLower(id));
-         node != m_parents.end() && depth < m_parents.size();
-         node = m_parents.find(ToLower(node->second))) {
-      ++depth;
-    }
-    return depth;
+    const auto rank = m_ranks.find(ToLower(id));
+    return rank == m_ranks.end() ? m_ranks.size() : rank->second;
   }
 
  private:
-  std::unordered_map<Text, Text> m_parents;
+  std::unordered_map<Text, std::size_t> m_ranks;
 };
 
-// The interfaces of `machine` that `other` lacks, those of parents before those of children.
+// The interfaces of `machine` that `other` lacks, in the order in which their devices start.
 std::vector<const Interface*> InterfacesOnlyIn(const Machine& machine, const Machine& other) {
   NameSet there;
   for (const Interface& entry : other.interfaces) there.Add(entry.path);
-  std::vector<std::pair<std::size_t, const Interface*>> found;
-  const Depths depths(machine);
+  const StartOrder order(machine);
+  std::multimap<std::size_t, const Interface*> found;
   for (const Interface& entry : machine.interfaces) {
-    if (!there.Has(entry.path)) found.emplace_back(depths.Of(entry.device), &entry);
+    if (!there.Has(entry.path)) found.emplace(order.Of(entry.device), &entry);
   }
-  std::stable_sort(found.begin(), found.end(),
-                   [](const auto& a, const auto& b) { return a.first < b.first; });
   std::vector<const Interface*> interfaces;
-  std::transform(found.begin(), found.end(), std::back_inserter(interfaces),
-                 [](const auto& entry) { return entry.second; });
+  for (const auto& [rank, entry] : found) interfaces.push_back(entry);
   return interfaces;
 }
 

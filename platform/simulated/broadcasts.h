@@ -22,8 +22,9 @@ DeviceBroadcast VolumeBroadcast(std::uint32_t event, char16_t letter, std::uint1
 
 // What the system sends for the difference between two states of a PC, in its order:
 //  1. drive letters that lost their volume, or show another one now, one message a letter;
-//  2. device interfaces that went, those of children before those of their parents;
-//  3. device interfaces that came, those of parents before those of their children;
+//  2. device interfaces that went, in the reverse of the order below;
+//  3. device interfaces that came, in the order of the file's devices, but those of a parent before
+//     those of its children;
 //  4. drive letters that got a volume, which are assigned when the volume's interface is there;
 //  5. once, that nodes of the device manager came or went.
 // A letter that belongs to a drive before and after is told as a change of the medium. Folders in

@@ -49,6 +49,7 @@ bool SimulatedDesktop::StartThread(ThreadRoutine routine, std::uint32_t, void* a
 
 void SimulatedDesktop::Sleep(std::uint32_t milliseconds) {
   auto lock = m_state->Guard();
+  m_state->Begin(lock, DesktopCall::Sleep);
   const std::uint64_t now = m_state->scheduler.Now();
   if (m_state->scheduler.Mode() == ClockMode::Virtual) {
     m_state->sleeps.push_back({CurrentThreadId(), milliseconds, now});

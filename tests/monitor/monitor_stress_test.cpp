@@ -1,4 +1,6 @@
 // Threads side by side on the real clock; what they do is small, so that they meet often.
+#include <barrier>
+#include <chrono>
 #include <thread>
 
 #include "monitor/usb_event_receiver.h"
@@ -12,33 +14,35 @@ using platform::simulated::VolumeBroadcast;
 constexpr std::uint32_t kArrival = platform::kDBT_DEVICEARRIVAL;
 
 TEST(MonitorStress, FourThreadsShareTheLock) {
+  constexpr std::size_t kThreads = 4;
+  constexpr std::uint64_t kRounds = 100;
   MonitorProcess process(ClockMode::Real);
   CThreadLock lock;
   std::uint64_t shared = 0;  // guarded by the lock and nothing else
   std::atomic<bool> inside = false;
-  constexpr std::uint64_t kRounds = 2000;
-  const auto work = [&](std::uint64_t seed) {
-    for (std::uint64_t round = 0; round < kRounds; ++round) {
-      const ThreadLockGuard guard(lock);
-      if (inside.exchange(true)) ADD_FAILURE() << "two threads inside";
-      ++shared;
-      if ((round + seed) % 7 == 0) {
-        const ThreadLockGuard again(lock);
-        ++shared;
-      }
-      inside = false;
-      lock.Unlock();  // and once more below, which has no effect when another thread got it
-      std::this_thread::yield();
-    }
-  };
+  std::barrier begin(kThreads);
   std::vector<std::thread> threads;
-  for (std::uint64_t seed = 0; seed < 4; ++seed) threads.emplace_back(work, seed);
-  for (std::thread& thread : threads) thread.join();
-  std::uint64_t expected = 4 * kRounds;
-  for (std::uint64_t seed = 0; seed < 4; ++seed) {
-    for (std::uint64_t round = 0; round < kRounds; ++round) expected += (round + seed) % 7 == 0 ? 1 : 0;
+  for (std::size_t i = 0; i < kThreads; ++i) {
+    threads.emplace_back([&] {
+      begin.arrive_and_wait();
+      for (std::uint64_t round = 0; round < kRounds; ++round) {
+        const ThreadLockGuard guard(lock);
+        if (inside.exchange(true)) ADD_FAILURE() << "two threads inside";
+        ++shared;
+        {
+          const ThreadLockGuard again(lock);
+          ++shared;
+        }
+        std::this_thread::sleep_for(std::chrono::microseconds(100));
+        inside = false;
+        lock.Unlock();  // and once more by the guard, which is nothing to the next owner
+        std::this_thread::yield();
+      }
+    });
   }
-  EXPECT_EQ(shared, expected);
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(shared, 2 * kThreads * kRounds);
+  EXPECT_GE(process.desktop.Calls(DesktopCall::Sleep), kThreads - 1) << "nobody had to wait";
 }
 
 TEST(MonitorStress, StartsAndTearsDownInFreshProcesses) {

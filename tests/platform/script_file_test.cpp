@@ -34,8 +34,8 @@ TEST(ScriptFile, ReadsEveryKindOfStep) {
       "ports": [{"hub": "usb#hub#1", "index": 2, "driverKey": "k2", "speed": "high"}]}},
     {"at": 5, "mount": {"volume": "\\\\?\\Volume{1}\\", "path": "E:\\"}},
     {"at": 5, "dismount": {"volume": "\\\\?\\Volume{1}\\", "path": "E:\\"}},
-    {"at": 7, "wait": true},
-    {"at": "0x64", "unplug": "usb\\b\\1"}]})",
+    {"at": 7, "wait": true, "broadcast": "none"},
+    {"at": "0x64", "unplug": "usb\\b\\1", "broadcast": "before"}]})",
                                     "s.json", ParseMachine(kScriptMachine, "pc.json"));
   ASSERT_EQ(script.size(), 5u);
   EXPECT_EQ(script[0].name, u"in");
@@ -50,6 +50,9 @@ TEST(ScriptFile, ReadsEveryKindOfStep) {
   EXPECT_TRUE(std::holds_alternative<std::monostate>(script[3].change));
   EXPECT_EQ(script[4].atMilliseconds, 100u);
   EXPECT_EQ(std::get<Unplug>(script[4].change).device, u"usb\\b\\1");
+  EXPECT_EQ(script[0].broadcast, BroadcastTime::After);
+  EXPECT_EQ(script[3].broadcast, BroadcastTime::None);
+  EXPECT_EQ(script[4].broadcast, BroadcastTime::Before);
 }
 
 TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
@@ -61,6 +64,7 @@ TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
       {R"({"at": 1})", R"(steps[0]: needs one of "plug", "unplug", "mount", "dismount", "wait")"},
       {R"({"wait": true, "unplug": "A"})", R"(steps[0]: has both "unplug" and "wait")"},
       {R"({"wait": false})", "steps[0].wait: must be true"},
+      {R"({"wait": true, "broadcast": "late"})", R"(steps[0].broadcast: must be one of "after", "before", "none")"},
       {R"({"wait": true, "when": 1})", R"(steps[0]: unknown member "when")"},
       {wait + R"({"at": 8, "wait": true})", "steps[1].at: 8 goes back (the step before is at 9)"},
       {wait + R"({"wait": true})", "steps[1].at: 0 goes back (the step before is at 9)"},

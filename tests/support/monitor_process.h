@@ -6,7 +6,6 @@
 #include <atomic>
 #include <cstring>
 #include <functional>
-#include <memory>
 #include <mutex>
 #include <string>
 #include <utility>
@@ -18,6 +17,7 @@
 #include "platform/simulated/simulated_desktop.h"
 #include "platform/system.h"
 #include "platform/text.h"
+#include "tests/support/launch.h"
 
 namespace KelvoUHW {
 
@@ -45,16 +45,7 @@ class MonitorProcess {
     platform::SetCurrentSystem({});
   }
 
-  // A thread of the process that runs `body` in its turn.
-  void Launch(std::function<void()> body) {
-    auto owned = std::make_unique<std::function<void()>>(std::move(body));
-    const auto run = [](void* argument) {
-      const std::unique_ptr<std::function<void()>> mine(static_cast<std::function<void()>*>(argument));
-      (*mine)();
-    };
-    ASSERT_TRUE(desktop.StartThread(run, 0, owned.get()));
-    owned.release();
-  }
+  void Launch(std::function<void()> body) { testing_support::Launch(desktop, std::move(body)); }
 
   SimulatedDesktop desktop;
 };
