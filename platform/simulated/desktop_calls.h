@@ -23,8 +23,7 @@ enum class DesktopCall : std::uint8_t {
   FormatMessageW,
   Sleep,
 };
-inline constexpr std::size_t kDesktopCalls =
-    static_cast<std::size_t>(DesktopCall::Sleep) + 1;
+inline constexpr std::size_t kDesktopCalls = static_cast<std::size_t>(DesktopCall::Sleep) + 1;
 
 // What happens to the n-th call of an operation, counted from 1 and from the process's start: first
 // it takes that long (StartThread and the calls that cannot block take no time), then it fails with

@@ -101,6 +101,7 @@ TEST(MessageWindow, AnswersZeroForDeviceMessagesAndForExceptions) {
   }
   EXPECT_EQ(process.desktop.SendToWindow(window, kWM_USER, 0, 0), 9);
   process.desktop.SetDefaultProcedure({});
+  EXPECT_TRUE(process.desktop.Boxes().empty()) << "the texts are dropped";
   for (const std::uint32_t event : {0u, 7u, 0x8000u, 0x8001u, 0x8002u, 0x8003u, 0x8004u, 0x8005u, 0xFFFFu}) {
     EXPECT_EQ(process.desktop.SendToWindow(window, kWM_DEVICECHANGE, event, RecordOf(watched)), 0) << event;
   }

@@ -41,7 +41,7 @@ struct Monitor {
     std::vector<std::uint64_t> delays;
     const auto calls = target.Calls();
     for (std::size_t i = before; i < calls.size(); ++i) {
-      EXPECT_EQ(calls[i], (RecordingTarget::Call{start + calls[i].delay, calls[i].delay, TRUE, 1}));
+      EXPECT_EQ(calls[i], (RecordingTarget::Call{start + calls[i].delay, calls[i].delay, TRUE, true}));
       delays.push_back(calls[i].delay);
     }
     return delays;
@@ -180,7 +180,7 @@ TEST(UsbEventReceiver, StartFailsWithoutThreadOrWindow) {
     EXPECT_EQ(process.desktop.Broadcast(NamedBroadcast(kArrival, kInterface, kWatchedPath)), 0u);
     EXPECT_EQ(process.desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0)), 1u);
     process.desktop.Settle();
-    EXPECT_THAT(target.Calls(), ElementsAre(RecordingTarget::Call{100, 0, TRUE, 1}));
+    EXPECT_THAT(target.Calls(), ElementsAre(RecordingTarget::Call{100, 0, TRUE, true}));
   }
   // The object is late, too: looked for every ten milliseconds. And a module that cannot be pinned
   // is locked for good.
@@ -215,17 +215,20 @@ TEST(UsbEventReceiver, LosesABroadcastWithoutAThreadOrAnApartment) {
   EXPECT_THAT(monitor.target.Calls(), IsEmpty());
   EXPECT_EQ(desktop.Calls(DesktopCall::StartThread), 2u) << "tried again";
 
-  std::uint32_t depth = 9;
+  // A thread in an apartment of the other kind cannot enter ours, and stays in its own.
+  HRESULT own = E_FAIL;
   ++g_nEventThreads;
   LockModule();
   monitor.process.Launch([&] {
-    platform::native::FailNextCoInitialize(E_OUTOFMEMORY);
+    EXPECT_EQ(CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED), S_OK);
     CZKUMUsbEventReceiver::NotifyThreadProc(nullptr);
-    depth = platform::native::ApartmentDepth();
+    own = CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED);
+    CoUninitialize();
+    CoUninitialize();
   });
   desktop.Settle();
   EXPECT_THAT(monitor.target.Calls(), IsEmpty());
-  EXPECT_EQ(depth, 0u);
+  EXPECT_EQ(own, S_FALSE);
   EXPECT_EQ(ModuleLockCount(), locks);
 
   // Neither keeps the lock or the next broadcast; an exception of the target does not, either.
@@ -251,8 +254,8 @@ TEST(UsbEventReceiver, RunsEventThreadsOneAtATimeAndNotInTheirOrder) {
   desktop.Settle();
   // The second volume asks at 0, 50 and 100.
   using Call = RecordingTarget::Call;
-  EXPECT_THAT(monitor.target.Calls(),
-              ElementsAre(Call{start, 0, TRUE, 1}, Call{start + 100, 0, TRUE, 1}, Call{start + 3000, 3000, TRUE, 1}));
+  EXPECT_THAT(monitor.target.Calls(), ElementsAre(Call{start, 0, TRUE, true}, Call{start + 100, 0, TRUE, true},
+                                                  Call{start + 3000, 3000, TRUE, true}));
 }
 
 TEST(UsbEventReceiver, TeardownTakesBackAllButTheWindow) {

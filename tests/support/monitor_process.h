@@ -57,7 +57,7 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
     std::uint64_t at = 0;
     ULONG delay = 0;
     BYTE fire = 0;
-    std::uint32_t apartments = 0;
+    bool apartment = false;  // in the multithreaded one
     friend bool operator==(const Call&, const Call&) = default;
   };
 
@@ -79,9 +79,12 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
   ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
   ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
   HRESULT STDMETHODCALLTYPE NotifyDeviceChange(ULONG delay, BYTE fire) override {
+    // A thread that is in it already is told so.
+    const HRESULT entered = CoInitializeEx(nullptr, COINIT_MULTITHREADED);
+    if (SUCCEEDED(entered)) CoUninitialize();
     {
       const std::lock_guard lock(m_mutex);
-      m_calls.push_back({m_desktop.Now(), delay, fire, platform::native::ApartmentDepth()});
+      m_calls.push_back({m_desktop.Now(), delay, fire, entered == S_FALSE});
     }
     if (onCall) onCall();
     return S_OK;
