@@ -22,7 +22,7 @@ class Descent {
   bool Done() const noexcept { return m_lists.empty(); }
 
   // The next node of the innermost list; empty at its end and where it breaks off.
-  ComPtr<IZKUMUsbTreeNode> Next() noexcept {
+  ComPtr<IZKUMUsbTreeNode> Next() {
     ComPtr<IZKUMUsbTreeNode> node;
     VARIANT_BOOL more = VARIANT_FALSE;
     const ComPtr<IZKUMUsbTreeNodeEnumerator>& list = m_lists.back();

@@ -42,8 +42,7 @@ HRESULT CZKUMNodeEnumerator::MoveNext(VARIANT_BOOL* pbSuccess) noexcept {
 }
 
 HRESULT CZKUMNodeEnumerator::GetCurrent(IZKUMUsbTreeNode** ppIUsbTreeNode) noexcept {
-  if (ppIUsbTreeNode == nullptr) return E_POINTER;
-  *ppIUsbTreeNode = nullptr;
+  if (ppIUsbTreeNode) *ppIUsbTreeNode = nullptr;
   if (m_nCurrent < 0 || static_cast<std::size_t>(m_nCurrent) >= m_items->size()) return E_FAIL;
   const Variant& item = (*m_items)[static_cast<std::size_t>(m_nCurrent)];
   if ((item.vt != VT_UNKNOWN && item.vt != VT_DISPATCH) || item.punkVal == nullptr) return E_FAIL;

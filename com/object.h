@@ -67,10 +67,20 @@ HRESULT QueryByMap(Object* object, REFIID iid, void** out) noexcept {
   return S_OK;
 }
 
+// One object in the module's lock count.
+class ModuleReference {
+ protected:
+  ModuleReference() noexcept { LockModule(); }
+  ModuleReference(const ModuleReference&) = delete;
+  ModuleReference& operator=(const ModuleReference&) = delete;
+  ~ModuleReference() { UnlockModule(); }
+};
+
 // The most derived class of an object whose class is `Class`: counts its references, interlocked,
-// and itself towards the module's lock count.
+// and itself towards the module's lock count. The module is let go last, behind all that the object
+// holds: nothing may unload it while an object is being taken apart.
 template <class Class>
-class ComObject final : public Class {
+class ComObject final : private ModuleReference, public Class {
  public:
   // An object with one reference, which is the caller's; null with the code on failure. The count
   // is above zero while FinalConstruct runs, so that it may hand itself out and take itself back.
@@ -101,11 +111,10 @@ class ComObject final : public Class {
   }
 
  private:
-  ComObject() { LockModule(); }
+  ComObject() = default;
   ~ComObject() override {
     this->m_nRef = Class::kDead;
     this->FinalRelease();
-    UnlockModule();
   }
 };
 

@@ -60,15 +60,18 @@ HRESULT CZKUMPortDevice::get_InterfaceDescriptors(IEnumVARIANT** ppIIiterfaceDes
 // the kind it is handed back without a reference and without a test of the out pointer.
 HRESULT CZKUMPortDevice::get_FirstChildOfType(IZKUMUsbTreeNode* pNode, TUsbDeviceType nType,
                                               IZKUMUsbTreeNode** ppNodeOfType) noexcept {
-  if (pNode == nullptr) return E_POINTER;
-  TUsbDeviceType kind = KUDTUnknown;
-  const HRESULT result = pNode->get_Type(&kind);
-  if (FAILED(result)) return nType == KUDTUnknown ? result : S_FALSE;
-  if (kind == nType) {
-    *ppNodeOfType = pNode;
-    return S_OK;
-  }
-  return Guarded([&] { return FindBelow(*pNode, nType, ppNodeOfType); });
+  // The node may be one of the caller's own, which may throw.
+  return Guarded([&] {
+    if (pNode == nullptr) return E_POINTER;
+    TUsbDeviceType kind = KUDTUnknown;
+    const HRESULT result = pNode->get_Type(&kind);
+    if (FAILED(result)) return nType == KUDTUnknown ? result : S_FALSE;
+    if (kind == nType) {
+      *ppNodeOfType = pNode;
+      return S_OK;
+    }
+    return FindBelow(*pNode, nType, ppNodeOfType);
+  });
 }
 
 }  // namespace KelvoUHW
