@@ -1,0 +1,241 @@
+// The two kinds of lists: nodes, and values.
+#include <gtest/gtest.h>
+
+#include <array>
+#include <memory>
+#include <string>
+
+#include "com/node_enumerator.h"
+#include "com/variant_enumerator.h"
+#include "platform/critical_section.h"
+#include "tests/support/client_node.h"
+#include "tests/support/com_objects.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::native::FailCriticalSection;
+using platform::native::FailingBstr;
+
+using NodeEnumerator = ComObjects;
+
+ComPtr<IZKUMUsbTreeNodeEnumerator> EnumeratorOver(VariantVector elements) {
+  auto items = std::make_unique<VariantVector>(std::move(elements));
+  ComPtr<IZKUMUsbTreeNodeEnumerator> list;
+  EXPECT_EQ(CreateNodeEnumerator(items, list.Put()), S_OK);
+  EXPECT_EQ(items, nullptr);
+  return list;
+}
+
+bool Move(IZKUMUsbTreeNodeEnumerator* list) {
+  VARIANT_BOOL more = 0x5A5A;
+  EXPECT_EQ(list->MoveNext(&more), S_OK);
+  EXPECT_TRUE(more == VARIANT_TRUE || more == VARIANT_FALSE) << more;
+  return more == VARIANT_TRUE;
+}
+
+TEST_F(NodeEnumerator, IsMadeOfAVectorThatItTakesOver) {
+  std::unique_ptr<VariantVector> items;
+  auto* list = Mark<IZKUMUsbTreeNodeEnumerator>();
+  EXPECT_EQ(CreateNodeEnumerator(items, &list), E_POINTER);
+  EXPECT_EQ(list, nullptr);
+  EXPECT_EQ(CreateNodeEnumerator(items, nullptr), E_POINTER);
+
+  ClientNode node(KUDTHub);
+  items = std::make_unique<VariantVector>();
+  items->push_back(Variant::OfUnknown(static_cast<IZKUMUsbTreeNode*>(&node)));
+  EXPECT_EQ(CreateNodeEnumerator(items, nullptr), E_POINTER);
+  FailCriticalSection(1, E_ACCESSDENIED);
+  list = Mark<IZKUMUsbTreeNodeEnumerator>();
+  EXPECT_EQ(CreateNodeEnumerator(items, &list), E_ACCESSDENIED);
+  EXPECT_EQ(list, nullptr);
+  ASSERT_TRUE(items);
+  EXPECT_EQ(node.references, 1u);
+}
+
+TEST_F(NodeEnumerator, WalksOnceAndGoesOnBehindTheEnd) {
+  EXPECT_FALSE(Move(EnumeratorOver({}).Get()));
+
+  SampleTree sample;
+  ClientNode other(KUDTHub);
+  ++other.references;
+  VariantVector elements;
+  elements.push_back(Variant::OfUnknown(Wrap(sample.hub).Detach()));
+  elements.push_back(Variant::OfUnknown(nullptr));
+  elements.push_back(Variant::OfLong(3));
+  elements.push_back(Variant::OfUnknown(static_cast<IZKUMUsbTreeNode*>(&other)));
+  elements.back().vt = VT_DISPATCH;
+  const auto list = EnumeratorOver(std::move(elements));
+
+  const auto current = [&] {
+    IZKUMUsbTreeNode* node = Mark<IZKUMUsbTreeNode>();
+    const HRESULT result = list->GetCurrent(&node);
+    EXPECT_EQ(node == nullptr, FAILED(result));
+    ComPtr<IZKUMUsbTreeNode>::Attach(node);
+    // The element is looked at before the pointer is.
+    if (node != &other) {
+      EXPECT_EQ(list->GetCurrent(nullptr), FAILED(result) ? result : E_POINTER);
+    }
+    return CodeName(result);
+  };
+  const std::array<const char*, 5> expected = {"S_OK", "E_FAIL", "E_FAIL", "S_OK", "E_FAIL"};
+  EXPECT_EQ(current(), "E_FAIL");
+  for (std::size_t i = 0; i < expected.size(); ++i) {
+    EXPECT_EQ(Move(list.Get()), i < 4);
+    EXPECT_EQ(current(), expected[i]) << i;
+    EXPECT_EQ(current(), expected[i]) << i;
+  }
+  for (int i = 0; i < 100; ++i) EXPECT_FALSE(Move(list.Get()));
+  EXPECT_EQ(other.references, 2u);
+}
+
+// An object that is taken apart still counts: nothing may unload the module before it is done.
+TEST_F(NodeEnumerator, LetsTheModuleGoLast) {
+  struct Witness final : IUnknown {
+    HRESULT QueryInterface(REFIID, void**) override { return E_NOINTERFACE; }
+    ULONG AddRef() override { return 2; }
+    ULONG Release() override {
+      objectsAtRelease = ModuleLockCount();
+      return 1;
+    }
+    std::int32_t objectsAtRelease = 0;
+  } witness;
+  VariantVector elements;
+  elements.push_back(Variant::OfUnknown(&witness));
+  auto list = EnumeratorOver(std::move(elements));
+  const std::int32_t objects = ModuleLockCount();
+  list.Reset();
+  EXPECT_EQ(witness.objectsAtRelease, objects);
+}
+
+class Collection : public ComObjects {
+ protected:
+  Collection() {
+    for (const char16_t* text : {u"a", u"b", u"c"}) items.push_back(Variant::OfBstr(platform::MakeBstr(text)));
+  }
+  ComPtr<IEnumVARIANT> Make(const VariantVector* vector) {
+    ComPtr<IEnumVARIANT> made;
+    EXPECT_EQ(MakeVariantEnum(made.Put(), static_cast<IZKUMUsbTreeNode*>(&owner), vector), S_OK);
+    return made;
+  }
+  // "CODE fetched: texts"; elements behind those fetched must be as they were.
+  static std::string Next(IEnumVARIANT* list, ULONG celt) {
+    std::array<VARIANT, 6> out;
+    for (VARIANT& element : out) element.vt = 0x5A5A;
+    ULONG fetched = 0x5A5A;
+    const HRESULT result = list->Next(celt, out.data(), &fetched);
+    std::string text = CodeName(result) + " " + std::to_string(fetched) + ":";
+    for (ULONG i = 0; i < out.size(); ++i) {
+      if (i < fetched) {
+        EXPECT_EQ(out[i].vt, VT_BSTR);
+        text += " " + platform::ToUtf8(platform::BstrText(out[i].bstrVal));
+        VariantClear(&out[i]);
+      } else {
+        EXPECT_TRUE(out[i].vt == 0x5A5A || out[i].vt == VT_EMPTY) << i;
+      }
+    }
+    return text;
+  }
+
+  VariantVector items;
+  ClientNode owner{KUDTHub};
+};
+
+TEST_F(Collection, NextSkipResetAndCloneInTurn) {
+  const struct {
+    char step;  // N(ext), S(kip), R(eset), C(lone): go on with the clone
+    ULONG count;
+    const char* expected;
+  } rows[] = {
+      {'N', 0, "S_OK 0:"},       {'N', 1, "S_OK 1: a"}, {'N', 5, "S_FALSE 2: b c"}, {'N', 1, "S_FALSE 0:"},
+      {'N', 0, "S_OK 0:"},       {'S', 0, "S_OK"},      {'S', 1, "S_FALSE"},        {'R', 0, "S_OK"},
+      {'N', 3, "S_OK 3: a b c"}, {'R', 0, "S_OK"},      {'S', 1, "S_OK"},           {'N', 1, "S_OK 1: b"},
+      {'C', 0, "S_OK"},          {'N', 1, "S_OK 1: c"}, {'C', 0, "S_OK"},           {'N', 1, "S_FALSE 0:"},
+      {'R', 0, "S_OK"},          {'S', 3, "S_OK"},      {'R', 0, "S_OK"},           {'S', 0xFFFFFFFF, "S_FALSE"},
+      {'N', 1, "S_FALSE 0:"},    {'R', 0, "S_OK"},      {'S', 2, "S_OK"},           {'N', 2, "S_FALSE 1: c"}};
+  auto list = Make(&items);
+  for (const auto& row : rows) {
+    std::string outcome;
+    if (row.step == 'N') outcome = Next(list.Get(), row.count);
+    if (row.step == 'S') outcome = CodeName(list->Skip(row.count));
+    if (row.step == 'R') outcome = CodeName(list->Reset());
+    if (row.step == 'C') {
+      ComPtr<IEnumVARIANT> clone;
+      outcome = CodeName(list->Clone(clone.Put()));
+      list->Skip(9);  // which the clone does not notice
+      list = clone;
+    }
+    EXPECT_EQ(outcome, row.expected) << (&row - rows);
+  }
+}
+
+TEST_F(Collection, RefusesWhatItCannotDo) {
+  const auto list = Make(&items);
+  std::array<VARIANT, 2> out{};
+  ULONG fetched = 0x5A5A;
+  EXPECT_EQ(list->Next(2, out.data(), nullptr), E_POINTER);
+  EXPECT_EQ(list->Next(1, nullptr, nullptr), E_POINTER);
+  EXPECT_EQ(list->Next(1, nullptr, &fetched), E_POINTER);
+  EXPECT_EQ(fetched, 0u);
+  EXPECT_EQ(list->Next(1, out.data(), nullptr), S_OK);
+  VariantClear(out.data());
+  EXPECT_EQ(list->Clone(nullptr), E_POINTER);
+  EXPECT_EQ(MakeVariantEnum(nullptr, nullptr, &items), E_POINTER);
+
+  auto* made = Mark<IEnumVARIANT>();
+  FailCriticalSection(1, E_ACCESSDENIED);
+  EXPECT_EQ(list->Clone(&made), E_ACCESSDENIED);
+  EXPECT_EQ(made, nullptr);
+  FailCriticalSection(1, E_ACCESSDENIED);
+  made = Mark<IEnumVARIANT>();
+  EXPECT_EQ(MakeVariantEnum(&made, nullptr, &items), E_ACCESSDENIED);
+  EXPECT_EQ(made, nullptr);
+
+  const auto without = Make(nullptr);
+  EXPECT_EQ(Next(without.Get(), 1), "E_FAIL 0:");
+  EXPECT_EQ(without->Reset(), E_FAIL);
+}
+
+TEST_F(Collection, WalksWhatItsVectorHoldsNow) {
+  const auto list = Make(&items);
+  EXPECT_EQ(Next(list.Get(), 2), "S_OK 2: a b");
+  items.clear();
+  EXPECT_EQ(Next(list.Get(), 1), "S_FALSE 0:");
+  EXPECT_EQ(list->Skip(1), S_FALSE);
+  for (const char16_t* text : {u"x", u"y", u"z"}) items.push_back(Variant::OfBstr(platform::MakeBstr(text)));
+  EXPECT_EQ(Next(list.Get(), 5), "S_FALSE 1: z");
+  EXPECT_EQ(list->Reset(), S_OK);
+  EXPECT_EQ(Next(list.Get(), 1), "S_OK 1: x");
+}
+
+TEST_F(Collection, ACopyThatFailsTakesTheOthersOfItsCallBack) {
+  const auto list = Make(&items);
+  for (std::uint64_t allocation = 1; allocation <= 3; ++allocation) {
+    ASSERT_EQ(list->Reset(), S_OK);
+    std::array<VARIANT, 3> out;
+    for (VARIANT& element : out) element.vt = 0x5A5A;
+    ULONG fetched = 0x5A5A;
+    {
+      const FailingBstr failing(allocation);
+      EXPECT_EQ(list->Next(3, out.data(), &fetched), E_OUTOFMEMORY);
+    }
+    EXPECT_EQ(fetched, 0u);
+    for (std::size_t i = 0; i < out.size(); ++i) EXPECT_EQ(out[i].vt, i < allocation ? VT_EMPTY : 0x5A5A) << i;
+    // The one that failed comes next.
+    EXPECT_EQ(Next(list.Get(), 1), std::string("S_OK 1: ") + "abc"[allocation - 1]);
+  }
+}
+
+TEST_F(Collection, KeepsItsOwner) {
+  auto list = Make(&items);
+  EXPECT_EQ(owner.references, 2u);
+  ComPtr<IEnumVARIANT> clone;
+  ASSERT_EQ(list->Clone(clone.Put()), S_OK);
+  EXPECT_EQ(owner.references, 3u);
+  list.Reset();
+  clone.Reset();
+  EXPECT_EQ(owner.references, 1u);
+}
+
+}  // namespace
+}  // namespace KelvoUHW

@@ -1,0 +1,122 @@
+// IZKUMPortDevice::FirstChildOfType, over the component's nodes and over nodes of a client's own.
+#include "com/first_child.h"
+
+#include <gtest/gtest.h>
+
+#include <new>
+#include <string>
+
+#include "tests/support/client_node.h"
+#include "tests/support/com_objects.h"
+
+namespace KelvoUHW {
+namespace {
+
+class FirstChildOfType : public ComObjects {
+ protected:
+  // "CODE id"; "same": the node passed in. References must be those that the result calls for.
+  std::string Search(IZKUMUsbTreeNode* node, TUsbDeviceType kind) {
+    const ULONG before = References(node);
+    IZKUMUsbTreeNode* found = Mark<IZKUMUsbTreeNode>();
+    const std::string code = CodeName(searcher->get_FirstChildOfType(node, kind, &found));
+    EXPECT_EQ(References(node), before);
+    if (found == Mark<IZKUMUsbTreeNode>()) return code + " untouched";
+    if (found == node) return code + " same";
+    const std::string id = InstanceId(found);
+    EXPECT_EQ(found->Release(), 0u);
+    return code + " " + id;
+  }
+
+  SampleTree sample;
+  ComPtr<IZKUMPortDevice> searcher = Wrap(sample.device).As<IZKUMPortDevice>();
+};
+
+TEST_F(FirstChildOfType, FindsTheFirstInPreOrder) {
+  const NodePtr tree = MakeNode<CZKUMUsbTreeRootImpl>(
+      u"root", {MakeNode<CZKUMHubDeviceImpl>(
+                    u"h1", {MakeNode<CZKUMHubPortImpl>(u"p1", {}, 1u),
+                            MakeNode<CZKUMHubDeviceImpl>(u"h2", {MakeNode<CZKUMHostControllerImpl>(u"c1")})}),
+                MakeNode<CZKUMHostControllerImpl>(u"c2")});
+  const auto root = Wrap(tree);
+  const struct {
+    TUsbDeviceType kind;
+    const char* expected;
+  } rows[] = {{KUDTRoot, "S_OK same"},
+              {KUDTHub, "S_OK S_OK h1"},
+              {KUDTHubPort, "S_OK S_OK p1"},
+              {KUDTHostController, "S_OK S_OK c1"},
+              {KUDTInterfaceDevice, "S_FALSE untouched"},
+              {KUDTUnknown, "S_FALSE untouched"}};
+  for (const auto& row : rows) EXPECT_EQ(Search(root.Get(), row.kind), row.expected) << row.kind;
+  EXPECT_EQ(searcher->get_FirstChildOfType(root.Get(), KUDTHub, nullptr), E_POINTER);
+  EXPECT_EQ(searcher->get_FirstChildOfType(root.Get(), KUDTInterfaceDevice, nullptr), S_FALSE);
+  EXPECT_EQ(searcher->get_FirstChildOfType(nullptr, KUDTHub, nullptr), E_POINTER);
+}
+
+TEST_F(FirstChildOfType, DepthIsNoLimit) {
+  NodePtr chain = MakeNode<CZKUMHostControllerImpl>(u"deepest");
+  for (int depth = 0; depth < 1000; ++depth) chain = MakeNode<CZKUMHubDeviceImpl>(u"hub", {chain});
+  const NodePtr root = MakeNode<CZKUMUsbTreeRootImpl>(u"root", {chain});
+  EXPECT_EQ(Search(Wrap(root).Get(), KUDTHostController), "S_OK S_OK deepest");
+  EXPECT_EQ(Search(Wrap(root).Get(), KUDTHubPort), "S_FALSE untouched");
+}
+
+// The tree of a client: below top (root) are middle (hub), last (controller) and odd, below middle is leaf (port).
+TEST_F(FirstChildOfType, NodesOfAClientMayFailAnywhere) {
+  ClientNode leaf(KUDTHubPort), middle(KUDTHub, {&leaf}), last(KUDTHostController), odd(KUDTUnknown),
+      top(KUDTRoot, {&middle, &last, &odd});
+  const struct {
+    const char* what;
+    ClientNode* failing;  // null: none
+    ClientNode::Method method;
+    TUsbDeviceType kind;
+    HRESULT result;
+    ClientNode* found;
+  } rows[] = {
+      {"nothing fails", nullptr, ClientNode::kType, KUDTHubPort, S_OK, &leaf},
+      {"nothing fails", nullptr, ClientNode::kType, KUDTUnknown, S_OK, &odd},
+      {"the kind of the first node", &top, ClientNode::kType, KUDTHubPort, S_FALSE, nullptr},
+      {"the same, searched for unknown", &top, ClientNode::kType, KUDTUnknown, E_ABORT, nullptr},
+      {"the first list", &top, ClientNode::kChilds, KUDTHubPort, S_FALSE, nullptr},
+      {"the first step", &top, ClientNode::kMoveNext, KUDTHubPort, S_FALSE, nullptr},
+      {"the first child", &top, ClientNode::kGetCurrent, KUDTHostController, S_FALSE, nullptr},
+      // Below, it ends the search there and not beside it.
+      {"a child's kind", &middle, ClientNode::kType, KUDTHostController, S_OK, &last},
+      {"the same, searched for its own", &middle, ClientNode::kType, KUDTHubPort, S_FALSE, nullptr},
+      // Searched for unknown it ends the list.
+      {"a child's kind", &middle, ClientNode::kType, KUDTUnknown, S_FALSE, nullptr},
+      {"a child's list", &middle, ClientNode::kChilds, KUDTHostController, S_OK, &last},
+      {"a step below a child", &middle, ClientNode::kMoveNext, KUDTHostController, S_OK, &last},
+      {"a grandchild", &middle, ClientNode::kGetCurrent, KUDTHostController, S_OK, &last},
+  };
+  ClientNode* const nodes[] = {&leaf, &middle, &last, &odd, &top};
+  for (const auto& row : rows) {
+    SCOPED_TRACE(row.what);
+    const auto failOne = [&](const HRESULT& failure) {
+      for (ClientNode* node : nodes) node->before = [](ClientNode::Method) { return S_OK; };
+      if (row.failing == nullptr) return;
+      row.failing->before = [&, failure](ClientNode::Method method) -> HRESULT {
+        if (method != row.method) return S_OK;
+        if (failure == E_OUTOFMEMORY) throw std::bad_alloc();
+        return failure;
+      };
+    };
+    failOne(E_ABORT);
+    IZKUMUsbTreeNode* found = Mark<IZKUMUsbTreeNode>();
+    EXPECT_EQ(searcher->get_FirstChildOfType(&top, row.kind, &found), row.result);
+    EXPECT_EQ(found, row.found ? static_cast<IZKUMUsbTreeNode*>(row.found) : Mark<IZKUMUsbTreeNode>());
+    if (row.found) row.found->Release();
+    for (const ClientNode* node : nodes) EXPECT_EQ(node->references, 1u);
+
+    // One that throws ends the search for good.
+    if (row.failing == nullptr) continue;
+    failOne(E_OUTOFMEMORY);
+    found = Mark<IZKUMUsbTreeNode>();
+    EXPECT_EQ(searcher->get_FirstChildOfType(&top, row.kind, &found), E_OUTOFMEMORY);
+    EXPECT_EQ(found, Mark<IZKUMUsbTreeNode>());
+    for (const ClientNode* node : nodes) EXPECT_EQ(node->references, 1u);
+  }
+}
+
+}  // namespace
+}  // namespace KelvoUHW

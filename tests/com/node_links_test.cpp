@@ -1,0 +1,121 @@
+// The way from node to node: Parent, Childs, InSubtreeDevicesOfType.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <string>
+
+#include "platform/critical_section.h"
+#include "tests/support/com_objects.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::native::FailCriticalSection;
+
+class NodeLinks : public ComObjects {
+ protected:
+  SampleTree sample;
+};
+
+// The parent's object owns the parent's record by itself. The record here belongs to nobody else.
+TEST_F(NodeLinks, ParentOwnsItsRecordAndTakesItAlong) {
+  auto* parent = new CZKUMHubDeviceImpl;
+  parent->m_strDevInstId = u"parent";
+  const NodePtr child = MakeNode<CZKUMHubPortImpl>(u"child", {}, 1u);
+  child->m_pParent = parent;
+  parent->m_childs.push_back(child);
+  const auto object = Wrap(child);
+  const std::size_t ring = child.RingSize();
+
+  IZKUMUsbTreeNode* out = Mark<IZKUMUsbTreeNode>();
+  // Without an object nobody has taken the record over.
+  FailCriticalSection(1, E_ACCESSDENIED);
+  EXPECT_EQ(object->get_Parent(&out), E_ACCESSDENIED);
+  EXPECT_EQ(out, nullptr);
+  ASSERT_EQ(child->m_pParent, parent);
+  EXPECT_EQ(child.RingSize(), ring);
+
+  ASSERT_EQ(object->get_Parent(&out), S_OK);
+  EXPECT_EQ(References(out), 1u);
+  EXPECT_EQ(InstanceId(out), "S_OK parent");
+  EXPECT_TRUE(ComPtr<IUnknown>(out).As<IZKUMHubDevice>());
+  EXPECT_EQ(child.RingSize(), ring);
+  EXPECT_EQ(out->Release(), 0u);
+  // The dying record took its child's way up along.
+  EXPECT_EQ(child->m_pParent, nullptr);
+  EXPECT_EQ(child.RingSize(), ring - 1);
+  EXPECT_EQ(object->get_Parent(&out), E_POINTER);
+}
+
+TEST_F(NodeLinks, WhatIsAnsweredInTheirPlace) {
+  ComObject<CZKUMUsbTreeNode>* created = nullptr;
+  ASSERT_EQ(ComObject<CZKUMUsbTreeNode>::Create(created), S_OK);
+  const auto empty = ComPtr<IZKUMUsbTreeNode>::Attach(created);
+  const auto root = Wrap(sample.root);
+  for (const auto& node : {empty, root}) {
+    IZKUMUsbTreeNode* parent = Mark<IZKUMUsbTreeNode>();
+    EXPECT_EQ(node->get_Parent(&parent), E_POINTER);
+    EXPECT_EQ(parent, nullptr);
+    EXPECT_EQ(node->get_Parent(nullptr), E_POINTER);
+    EXPECT_EQ(node->get_Childs(nullptr), E_POINTER);
+    EXPECT_EQ(node->get_InSubtreeDevicesOfType(KUDTRoot, nullptr), E_POINTER);
+  }
+  auto* list = Mark<IZKUMUsbTreeNodeEnumerator>();
+  EXPECT_EQ(empty->get_Childs(&list), E_POINTER);
+  EXPECT_EQ(list, nullptr);
+  list = Mark<IZKUMUsbTreeNodeEnumerator>();
+  EXPECT_EQ(empty->get_InSubtreeDevicesOfType(KUDTUnknown, &list), E_POINTER);
+  EXPECT_EQ(list, nullptr);
+
+  // A child without a record, which no walk of the topology makes.
+  sample.root->m_childs.insert(sample.root->m_childs.begin() + 1, NodePtr());
+  list = Mark<IZKUMUsbTreeNodeEnumerator>();
+  EXPECT_EQ(root->get_Childs(&list), E_POINTER);
+  EXPECT_EQ(list, nullptr);
+  sample.root->m_childs.erase(sample.root->m_childs.begin() + 1);
+}
+
+// The n-th object that is made cannot be: the children's, then the list's own.
+TEST_F(NodeLinks, ListsWithoutTheirObjects) {
+  const auto root = Wrap(sample.root);
+  const std::size_t ring = sample.controller.RingSize();
+  const HRESULT expected[] = {E_POINTER, E_POINTER, E_ACCESSDENIED, S_OK};
+  for (std::uint64_t call = 1; call <= std::size(expected); ++call) {
+    for (const bool subtree : {false, true}) {
+      FailCriticalSection(call, E_ACCESSDENIED);
+      ComPtr<IZKUMUsbTreeNodeEnumerator> list;
+      // Kind 0 is in the sample once, so the subtree comes to its list one object sooner.
+      const HRESULT result =
+          subtree ? root->get_InSubtreeDevicesOfType(KUDTUnknown, list.Put()) : root->get_Childs(list.Put());
+      EXPECT_EQ(result, expected[std::min<std::size_t>(call - (subtree ? 0 : 1), 3)]) << call << subtree;
+      EXPECT_EQ(static_cast<bool>(list), result == S_OK);
+      FailCriticalSection(0, S_OK);
+    }
+    EXPECT_EQ(sample.controller.RingSize(), ring);
+  }
+}
+
+TEST_F(NodeLinks, SubtreesAreListedInPreOrderWithTheirTop) {
+  const NodePtr h1 =
+      MakeNode<CZKUMHubDeviceImpl>(u"h1", {MakeNode<CZKUMHubPortImpl>(u"p1", {MakeNode<CZKUMHubDeviceImpl>(u"h2")}, 1u),
+                                           MakeNode<CZKUMHubPortImpl>(u"p2", {}, 2u)});
+  const NodePtr tree = MakeNode<CZKUMUsbTreeRootImpl>(
+      u"root", {h1, MakeNode<CZKUMHubDeviceImpl>(u"h3"), MakeNode<CZKUMUsbTreeNodeImpl>(u"plain")});
+  const struct {
+    const NodePtr& top;
+    TUsbDeviceType kind;
+    const char* ids;
+  } rows[] = {{tree, KUDTRoot, "root"},     {tree, KUDTHub, "h1 h2 h3"}, {h1, KUDTHub, "h1 h2"},
+              {tree, KUDTHubPort, "p1 p2"}, {h1, KUDTRoot, ""},          {tree, KUDTUnknown, "plain"}};
+  for (const auto& row : rows) {
+    ComPtr<IZKUMUsbTreeNodeEnumerator> list;
+    ASSERT_EQ(Wrap(row.top)->get_InSubtreeDevicesOfType(row.kind, list.Put()), S_OK);
+    EXPECT_EQ(WalkIds(list.Get()), row.ids);
+  }
+  ComPtr<IZKUMUsbTreeNodeEnumerator> childs;
+  ASSERT_EQ(Wrap(tree)->get_Childs(childs.Put()), S_OK);
+  EXPECT_EQ(WalkIds(childs.Get()), "h1 h3 plain");
+}
+
+}  // namespace
+}  // namespace KelvoUHW
