@@ -163,6 +163,11 @@ struct SampleTree {
   RingPtr<CZKUMUsbTreeNodeImpl> plain = MakeNode<CZKUMUsbTreeNodeImpl>(u"plain");
   RingPtr<CZKUMUsbTreeRootImpl> root = MakeNode<CZKUMUsbTreeRootImpl>(u"root", {controller, plain});
 
+  // The name of the node of a kind.
+  static const char* NameOf(TUsbDeviceType kind) {
+    static constexpr const char* names[] = {"plain", "root", "controller", "hub", "port", "device", "info", "disk"};
+    return names[kind];
+  }
   std::vector<NodePtr> Nodes() const { return {root, plain, controller, hub, port, device, info, disk}; }
 };
 
