@@ -168,6 +168,29 @@ INSTANTIATE_TEST_SUITE_P(Machines, ComMemory,
                            return name;
                          });
 
+// A list that cannot be made ends the search in it, and what does not come out of a search is not touched.
+TEST_F(ComObjects, SearchWithoutMemory) {
+  const SampleTree sample;
+  const auto root = Wrap(sample.root);
+  const auto searcher = Wrap(sample.device).As<IZKUMPortDevice>();
+  HRESULT result = E_FAIL;
+  std::uint64_t allocation = 0;
+  while (result != S_OK) {
+    IZKUMUsbTreeNode* found = Mark<IZKUMUsbTreeNode>();
+    const std::int32_t objects = ModuleLockCount();
+    {
+      const FailingAllocation failing(++allocation);
+      result = searcher->get_FirstChildOfType(root.Get(), KUDTInterfaceDevice, &found);
+      ASSERT_EQ(failing.Failed(), result != S_OK) << allocation;
+    }
+    ASSERT_TRUE(result == S_OK || result == S_FALSE || result == E_OUTOFMEMORY) << CodeName(result);
+    ASSERT_EQ(found == Mark<IZKUMUsbTreeNode>(), result != S_OK);
+    if (result == S_OK) found->Release();
+    ASSERT_EQ(ModuleLockCount(), objects);
+  }
+  EXPECT_GT(allocation, 20u);
+}
+
 // A mount point that cannot be copied is the one thing that raises and is no text property.
 TEST_F(ComObjects, MountPointsThatCannotBeCopied) {
   SampleTree sample;
