@@ -1,0 +1,115 @@
+// Clients on threads of their own read and release while builds replace the tree. Made for the thread sanitizer.
+#include <gtest/gtest.h>
+
+#include <array>
+#include <atomic>
+#include <cstddef>
+#include <iostream>
+#include <string_view>
+#include <thread>
+#include <vector>
+
+#include "tests/support/desk_pc.h"
+#include "tests/support/object_reader.h"
+#include "tests/support/tree_desk.h"
+
+namespace KelvoUHW {
+namespace {
+
+using Node = ComPtr<IZKUMUsbTreeNode>;
+using Nodes = ComPtr<IZKUMUsbTreeNodeEnumerator>;
+
+constexpr int kReaders = 4;
+constexpr int kBuilds = 1000;
+constexpr int kEnd = -1;
+
+struct Seen {
+  std::size_t walks = 0;
+  std::size_t nodes = 0;
+  std::size_t texts = 0;  // that are not empty
+  std::size_t failures = 0;
+};
+
+// One client. It keeps some nodes for a while, so that trees are released long after they were replaced.
+class Reader {
+ public:
+  explicit Reader(IZKUMUsbTree& tree) : m_tree(tree) {}
+
+  // A walk behind each publication, as clients do that are told of it: while the next build runs.
+  void Run(const std::atomic<int>& publications) {
+    for (int seen = publications; seen != kEnd; publications.wait(seen), seen = publications) Walk();
+    for (Node& node : m_kept) node.Reset();
+  }
+  const Seen& Result() const { return m_seen; }
+
+ private:
+  void Walk() {
+    Node root;
+    Expect(m_tree.get_RootNode(root.Put()));
+    ++m_seen.walks;
+    m_seen.nodes += testing_support::WalkChilds(root, [&](const Node& node) {
+      testing_support::ReadProperties(node, [&](const char*, HRESULT result, auto value) {
+        // The device-manager data of a device that came between two passes is not there yet.
+        if (result != E_FAIL) Expect(result);
+        if constexpr (std::is_same_v<decltype(value), std::u16string_view>) m_seen.texts += !value.empty();
+      });
+      if (++m_read % 16 == 0 && testing_support::DumpOf(node).empty()) ++m_seen.failures;
+      if (m_read % 32 == 0) m_kept[m_read / 32 % m_kept.size()] = node;
+    });
+    Nodes list;
+    Expect(root->get_InSubtreeDevicesOfType(KUDTInfoDevice, list.Put()));
+    Expect(m_tree.get_PortDevicesWithVendorId(0x0781, list.Put()));
+    Expect(m_tree.get_VendorProductDevices(0x0781, 0x5567, list.Put()));
+    Expect(m_tree.get_PortDevicesWithVolume(list.Put()));
+  }
+  void Expect(HRESULT result) { m_seen.failures += result != S_OK; }
+
+  IZKUMUsbTree& m_tree;
+  Seen m_seen;
+  std::array<Node, 16> m_kept;
+  std::size_t m_read = 0;
+};
+
+TEST(TreeThreads, ClientsReadAndReleaseWhileBuildsReplaceTheTree) {
+  const Machine machine = Desk<WellFedHost>(BarePc(), {ExternalHub(u"HUB", 1), Gadget(u"M1", 1, UsbId(u"HUB")),
+                                                       Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)})
+                              .pc.Snapshot();
+  TreeDesk desk(machine);
+  ASSERT_EQ(desk.Rebuild(), S_OK);
+
+  std::vector<Reader> readers(kReaders, Reader(*desk.tree.Get()));
+  std::atomic<int> publications = 0;
+  int published = 0;
+  {
+    std::vector<std::jthread> threads;
+    for (Reader& reader : readers) threads.emplace_back([&] { reader.Run(publications); });
+    // A stick on a root port and one behind the hub come and go in turn, so every build meets a change.
+    for (int build = 0; build < kBuilds && !HasFailure(); ++build) {
+      const bool behindHub = build % 4 >= 2;
+      const Text serial = behindHub ? u"S3" : u"S2";
+      if (build % 2 == 0) {
+        desk.Do(Stick(serial, behindHub ? 2 : 4, u'F', behindHub ? UsbId(u"HUB") : kRootHubId));
+      } else {
+        desk.Do(Unplug{UsbId(serial)});
+      }
+      published += desk.Rebuild() == S_OK;
+      publications = published;
+      publications.notify_all();
+    }
+    publications = kEnd;
+    publications.notify_all();
+  }
+  EXPECT_EQ(published, kBuilds);
+  std::cout << published << " publications";
+  for (const Reader& reader : readers) {
+    const Seen& seen = reader.Result();
+    std::cout << ", " << seen.walks << " walks over " << seen.nodes << " nodes";
+    EXPECT_EQ(seen.failures, 0u);
+    EXPECT_GE(seen.nodes, 1000u);
+    EXPECT_GE(seen.texts, seen.nodes);
+  }
+  std::cout << '\n';
+}
+
+}  // namespace
+}  // namespace KelvoUHW
