@@ -35,7 +35,7 @@ class Reader {
  public:
   explicit Reader(IZKUMUsbTree& tree) : m_tree(tree) {}
 
-  // A walk behind each publication, as clients do that are told of it: while the next build runs.
+  // A walk whenever it is told of a publication: while the next builds run.
   void Run(const std::atomic<int>& publications) {
     for (int seen = publications; seen != kEnd; publications.wait(seen), seen = publications) Walk();
     for (Node& node : m_kept) node.Reset();
@@ -83,16 +83,22 @@ TEST(TreeThreads, ClientsReadAndReleaseWhileBuildsReplaceTheTree) {
   {
     std::vector<std::jthread> threads;
     for (Reader& reader : readers) threads.emplace_back([&] { reader.Run(publications); });
-    // A stick on a root port and one behind the hub come and go in turn, so every build meets a change.
+    // In turn these come and go, so every build meets a change: a stick on a root port, one behind the hub, and a third
+    // slot of the reader with its card, a new child of a device that stays.
+    Plug slot;
+    AddDisk(slot, DiskId(u"CR", 2), UsbId(u"CR"));
+    AddVolume(slot, DiskId(u"CR", 2), u'G');
+    const struct {
+      Plug comes;
+      Text goes;
+    } changes[] = {{Stick(u"S2", 4, u'F'), UsbId(u"S2")},
+                   {Stick(u"S3", 2, u'F', UsbId(u"HUB")), UsbId(u"S3")},
+                   {slot, DiskId(u"CR", 2)}};
     for (int build = 0; build < kBuilds && !HasFailure(); ++build) {
-      const bool behindHub = build % 4 >= 2;
-      const Text serial = behindHub ? u"S3" : u"S2";
-      if (build % 2 == 0) {
-        desk.Do(Stick(serial, behindHub ? 2 : 4, u'F', behindHub ? UsbId(u"HUB") : kRootHubId));
-      } else {
-        desk.Do(Unplug{UsbId(serial)});
-      }
+      const auto& [comes, goes] = changes[static_cast<std::size_t>(build) / 2 % std::size(changes)];
+      desk.Do(build % 2 == 0 ? Change(comes) : Change(Unplug{goes}));
       published += desk.Rebuild() == S_OK;
+      if (build % 3 != 0) continue;
       publications = published;
       publications.notify_all();
     }
