@@ -1,7 +1,8 @@
 #include "bench/allocation_count.h"
 
-#include <cstdlib>
 #include <new>
+
+#include "tests/support/heap.h"
 
 namespace {
 
@@ -21,8 +22,8 @@ void ResumeAllocationCount() noexcept { t_paused = false; }
 // The other forms of operator new end up here, but for the over-aligned one, which nobody uses.
 void* operator new(std::size_t size) {
   if (!t_paused) ++t_allocations;
-  if (void* memory = std::malloc(size == 0 ? 1 : size)) return memory;
+  if (void* memory = heap::Take(size)) return memory;
   throw std::bad_alloc();
 }
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+void operator delete(void* memory) noexcept { heap::Give(memory); }
+void operator delete(void* memory, std::size_t) noexcept { heap::Give(memory); }

@@ -27,7 +27,7 @@ TEST(InterfaceDevice, Dumps) {
   CZKUMInterfaceDeviceImpl disk;  // its descriptor is never received
   disk.m_strDevInstId = u"USBSTOR\\DISK\\1";
   EXPECT_EQ(disk.m_nType, KUDTInterfaceDevice);
-  EXPECT_EQ(disk.InterfaceData.cbSize, 28u);
+  EXPECT_EQ(disk.InterfaceData.cbSize, sizeof(platform::SP_DEVICE_INTERFACE_DATA));
   EXPECT_EQ(disk.MountPoint(), u"");
   EXPECT_EQ(DumpOf(disk),
             u"before|\r\n>  Interface ++++++++++++++++++++++++++++\r\n"

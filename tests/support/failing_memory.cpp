@@ -1,7 +1,8 @@
 #include "tests/support/failing_memory.h"
 
-#include <cstdlib>
 #include <new>
+
+#include "tests/support/heap.h"
 
 // Allocations until the one that fails; 0: none fails.
 static thread_local std::uint64_t t_countdown = 0;
@@ -9,7 +10,7 @@ static thread_local bool t_paused = false;
 
 void* operator new(std::size_t bytes) {
   if (t_countdown != 0 && !t_paused && --t_countdown == 0) throw std::bad_alloc();
-  if (void* memory = std::malloc(bytes == 0 ? 1 : bytes)) return memory;
+  if (void* memory = heap::Take(bytes)) return memory;
   throw std::bad_alloc();
 }
 void* operator new(std::size_t bytes, const std::nothrow_t&) noexcept {
@@ -19,8 +20,8 @@ void* operator new(std::size_t bytes, const std::nothrow_t&) noexcept {
     return nullptr;
   }
 }
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+void operator delete(void* memory) noexcept { heap::Give(memory); }
+void operator delete(void* memory, std::size_t) noexcept { heap::Give(memory); }
 
 namespace KelvoUHW {
 
