@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <charconv>
+#include <filesystem>
 #include <fstream>
 #include <system_error>
 
@@ -168,7 +169,9 @@ std::string ReadFileBytes(const std::string& path) {
     const std::error_code error(errno, std::generic_category());
     throw MachineFileError(path + ": cannot be read: " + error.message());
   };
-  std::ifstream file(path, std::ios::binary);
+  // The path is UTF-8 on every system.
+  std::ifstream file(std::filesystem::path(std::u8string(path.begin(), path.end())),
+                     std::ios::binary);
   if (!file) fail();
   std::string bytes;
   std::string block(std::size_t{1} << 16, '\0');

@@ -1,5 +1,7 @@
 #include <streambuf>
 
+#include "platform/simulated/machine_file.h"
+#include "platform/simulated/simulated_pc.h"
 #include "tests/tools/client.h"
 
 namespace zkusb {
@@ -112,6 +114,35 @@ TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
     EXPECT_THAT(Output({"--help"}), HasSubstr("  " + line));
   }
   EXPECT_THAT(Output({"find", "--help"}), HasSubstr("--product HEX"));
+}
+
+TEST(CommandLine, LooksAtThePcItRunsOnUnlessAMachineIsNamed) {
+  const std::string vm = MachineFile("vmware-win7");
+  platform::simulated::SimulatedPc thisPc(platform::simulated::LoadMachine(vm));
+  const auto run = [&](const std::vector<std::string>& args) {
+    std::ostringstream out;
+    std::ostringstream err;
+    const int code = Run(args, out, err, &thisPc);
+    return Result{code, out.str(), err.str()};
+  };
+  EXPECT_EQ(run({"tree"}).out, Output({"tree", "--machine", vm}));
+  const std::string dell = MachineFile("dell-precision");
+  EXPECT_EQ(run({"tree", "--machine", dell}).out, Output({"tree", "--machine", dell}));
+  // A script changes machines that were loaded, never the PC of the person who asks.
+  const Result refused = run({"watch", "--script", "any.json"});
+  EXPECT_EQ(refused.code, kRefused);
+  EXPECT_EQ(refused.err, "zkusb: any.json: needs the machine that it changes (--machine FILE)\n");
+}
+
+TEST(CommandLine, TakesFileNamesInUtf8) {
+  const std::filesystem::path copy =
+      std::filesystem::path(testing::TempDir()) / std::filesystem::path(u8"zkusb-\u00E9\u4E2D.json");
+  const std::string original = MachineFile("vmware-win7");
+  std::filesystem::copy_file(original, copy, std::filesystem::copy_options::overwrite_existing);
+  const std::u8string name = copy.u8string();
+  EXPECT_EQ(Output({"tree", "--machine", std::string(name.begin(), name.end())}),
+            Output({"tree", "--machine", original}));
+  std::filesystem::remove(copy);
 }
 
 TEST(CommandLine, NoticesThatTheOutputIsLost) {

@@ -35,7 +35,8 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
   // That there is one is checked below: here, a misspelt one would not be named.
   app.require_subcommand(0, 1);
   app.set_version_flag("--version", "zkusb " ZKUSB_VERSION, "Print the version and exit");
-  app.add_option("--machine", options.machineFile, "Machine file of the PC (default: built in)")
+  app.add_option("--machine", options.machineFile,
+                 "Machine file of the PC (default: this PC on Windows, else one that is built in)")
       ->type_name("FILE");
   app.add_option("--script", options.scriptFile,
                  "Steps for watch to play; the others look after all of them")

@@ -13,7 +13,7 @@ enum class Command { kTree, kDump, kFind, kVolumes, kWatch, kRegister, kUnregist
 
 struct Options {
   Command command = Command::kTree;
-  std::string machineFile;  // empty: the built-in machine
+  std::string machineFile;  // empty: this PC or the built-in machine
   std::string scriptFile;   // empty: none
   bool json = false;
   std::uint32_t watchMilliseconds = 0;  // of watch: how long behind the script's end

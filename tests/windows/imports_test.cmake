@@ -1,0 +1,24 @@
+# Every program and DLL runs on a PC that has nothing but the system's own DLLs.
+#
+#   cmake -DOBJDUMP=objdump -DFILES=a.exe;b.dll -P imports_test.cmake
+cmake_minimum_required(VERSION 3.25)
+
+set(system_dlls advapi32 cfgmgr32 kernel32 msvcrt ole32 oleaut32 setupapi shell32 shlwapi user32 gdi32)
+
+foreach(file IN LISTS FILES)
+  execute_process(COMMAND ${OBJDUMP} -p ${file} OUTPUT_VARIABLE dump COMMAND_ERROR_IS_FATAL ANY)
+  string(REGEX MATCHALL "DLL Name: [^\n]+" imports "${dump}")
+  if(NOT imports)
+    message(SEND_ERROR "${file}: imports nothing, so it has not been read")
+  endif()
+  foreach(import IN LISTS imports)
+    string(REGEX REPLACE "DLL Name: (.*)" "\\1" name "${import}")
+    string(TOLOWER "${name}" name)
+    string(REGEX REPLACE "\\.dll$" "" name "${name}")
+    if(NOT name IN_LIST system_dlls)
+      message(SEND_ERROR "${file} imports ${name}.dll")
+    endif()
+  endforeach()
+  list(JOIN imports ", " imports)
+  message("${file}: ${imports}")
+endforeach()
