@@ -12,6 +12,11 @@ void SetModuleInstance(HINSTANCE instance) noexcept;
 // Whether the process is ending, so that a library which is unloaded now leaves everything as it
 // is. Callable from every thread.
 bool ProcessEnds() noexcept;
+
+namespace native {
+// Called when a system is set, which a program does once it runs.
+void WatchForProcessEnd() noexcept;
+}  // namespace native
 #endif
 
 }  // namespace platform

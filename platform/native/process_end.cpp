@@ -9,11 +9,17 @@ namespace {
 
 constinit std::atomic<bool> g_processEnds = false;
 
-// Handlers of exit run before any library is finalised, and not when one is unloaded alone.
-[[maybe_unused]] const int g_registered = std::atexit([] { g_processEnds = true; });
-
 }  // namespace
 
 bool ProcessEnds() noexcept { return g_processEnds; }
+
+namespace native {
+// Handlers of exit run before any library is finalised, provided that they were registered after
+// the program began, and not when a library is unloaded alone.
+void WatchForProcessEnd() noexcept {
+  static const int s_registered = std::atexit([] { g_processEnds = true; });
+  static_cast<void>(s_registered);
+}
+}  // namespace native
 
 }  // namespace platform

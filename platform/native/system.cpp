@@ -2,6 +2,8 @@
 
 #include <mutex>
 
+#include "platform/process_end.h"
+
 namespace platform {
 
 namespace {
@@ -15,6 +17,7 @@ System CurrentSystem() noexcept {
 }
 
 void SetCurrentSystem(const System& system) noexcept {
+  native::WatchForProcessEnd();
   const std::lock_guard lock(g_mutex);
   g_system = system;
 }

@@ -1,4 +1,5 @@
-// Runs the client inside of the test, over machine files as they are or changed by the test.
+// Runs the client as a program of its own, since the component stays in a process that has used it,
+// over machine files as they are or changed by the test.
 #pragma once
 
 #include <gmock/gmock.h>
@@ -12,24 +13,16 @@
 #include <string>
 #include <vector>
 
+#include "tests/support/program.h"
 #include "tools/zkusb/run.h"
 
 namespace zkusb {
 
 using Json = nlohmann::ordered_json;
 
-struct Result {
-  int code = 0;
-  std::string out;
-  std::string err;
-};
+using Result = ProgramResult;
 
-inline Result RunClient(const std::vector<std::string>& args) {
-  std::ostringstream out;
-  std::ostringstream err;
-  const int code = Run(args, out, err);
-  return {code, out.str(), err.str()};
-}
+inline Result RunClient(const std::vector<std::string>& args) { return RunProgram(ZKUSB_PROGRAM, args); }
 
 // What a run prints that is expected to do what it is asked.
 inline std::string Output(const std::vector<std::string>& args) {

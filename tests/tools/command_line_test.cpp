@@ -1,7 +1,3 @@
-#include <streambuf>
-
-#include "platform/simulated/machine_file.h"
-#include "platform/simulated/simulated_pc.h"
 #include "tests/tools/client.h"
 
 namespace zkusb {
@@ -110,28 +106,10 @@ TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
 
   // Help and version are no failures.
   EXPECT_THAT(Output({"--version"}), testing::MatchesRegex("zkusb .+\\..+\n"));
-  for (const std::string line : {"tree", "dump", "find", "volumes", "watch", "--json"}) {
+  for (const std::string line : {"tree", "dump", "find", "volumes", "watch", "register", "unregister", "--json"}) {
     EXPECT_THAT(Output({"--help"}), HasSubstr("  " + line));
   }
   EXPECT_THAT(Output({"find", "--help"}), HasSubstr("--product HEX"));
-}
-
-TEST(CommandLine, LooksAtThePcItRunsOnUnlessAMachineIsNamed) {
-  const std::string vm = MachineFile("vmware-win7");
-  platform::simulated::SimulatedPc thisPc(platform::simulated::LoadMachine(vm));
-  const auto run = [&](const std::vector<std::string>& args) {
-    std::ostringstream out;
-    std::ostringstream err;
-    const int code = Run(args, out, err, &thisPc);
-    return Result{code, out.str(), err.str()};
-  };
-  EXPECT_EQ(run({"tree"}).out, Output({"tree", "--machine", vm}));
-  const std::string dell = MachineFile("dell-precision");
-  EXPECT_EQ(run({"tree", "--machine", dell}).out, Output({"tree", "--machine", dell}));
-  // A script changes machines that were loaded, never the PC of the person who asks.
-  const Result refused = run({"watch", "--script", "any.json"});
-  EXPECT_EQ(refused.code, kRefused);
-  EXPECT_EQ(refused.err, "zkusb: any.json: needs the machine that it changes (--machine FILE)\n");
 }
 
 TEST(CommandLine, TakesFileNamesInUtf8) {
@@ -146,12 +124,9 @@ TEST(CommandLine, TakesFileNamesInUtf8) {
 }
 
 TEST(CommandLine, NoticesThatTheOutputIsLost) {
-  struct FullDisk : std::streambuf {
-  } full;
-  std::ostream out(&full);
-  std::ostringstream err;
-  EXPECT_EQ(zkusb::Run({"tree"}, out, err), kRefused);
-  EXPECT_EQ(err.str(), "zkusb: the output cannot be written\n");
+  const Result result = RunProgram(ZKUSB_PROGRAM, {"tree"}, "/dev/full");
+  EXPECT_EQ(result.code, kRefused);
+  EXPECT_EQ(result.err, "zkusb: the output cannot be written\n");
 }
 
 }  // namespace

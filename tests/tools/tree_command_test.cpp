@@ -120,16 +120,16 @@ TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
   }));
   const std::string text = Output({"tree", "--machine", file.Path()});
   // The name is shortened, not the mount points.
-  EXPECT_THAT(text, HasSubstr("├─ Port 3: bad device  full speed  0781:5580 San…  "
+  EXPECT_THAT(text, HasSubstr("├─ Port 3: full speed  0781:5580 SanDisk Corpora…  "
                               "[D:, C:\\All sticks\\One]\n"));
-  EXPECT_THAT(text, HasSubstr("├─ Port 5: bad device  low speed  0000:0000 unknown device\n"));
+  EXPECT_THAT(text, HasSubstr("├─ Port 5: low speed  0000:0000 unknown device\n"));
   EXPECT_THAT(text, HasSubstr("└─ Ports 1-2, 4, 6-8: empty\n"));
   EXPECT_LE(WidestLine(text), 80);
 
   const std::string found = Output({"find", "--vendor", "781", "--machine", file.Path()});
   EXPECT_THAT(found, HasSubstr("SanDisk Corporation, \\x1B[2J Stick \\u202E  D:, C:\\All"));
   const Json json = JsonOutput({"find", "--vendor", "781", "--machine", file.Path()});
-  EXPECT_EQ(json.at(0).at("DeviceDescr"), "\u001b[2J   Stick \u202e ");
+  EXPECT_EQ(json.at(0).at("Description"), "\u001b[2J   Stick \u202e ");
   EXPECT_THAT(Output({"dump", "--machine", file.Path()}), HasSubstr("deviceDescr : \u001b[2J   Stick \u202e \r\n"));
 }
 

@@ -6,12 +6,10 @@
 
 #ifdef _WIN32
 #include "platform/windows/console.h"
-#include "platform/windows/windows_host.h"
 
 int main() {
   platform::windows::PassOutputThrough();
-  platform::windows::WindowsHost thisPc;
-  return zkusb::Run(platform::windows::Arguments(), std::cout, std::cerr, &thisPc);
+  return zkusb::Run(platform::windows::Arguments(), std::cout, std::cerr);
 }
 #else
 int main(int argc, char** argv) {

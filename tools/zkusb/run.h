@@ -5,8 +5,6 @@
 #include <string>
 #include <vector>
 
-#include "platform/host.h"
-
 namespace zkusb {
 
 enum ExitCode : int {
@@ -15,9 +13,8 @@ enum ExitCode : int {
   kRefused = 2,  // wrong usage, a bad file, output that cannot be written; the reason is on `err`
 };
 
-// Carries out one command line, given without the program's name, as main does. `thisPc` is what is
-// looked at when no machine file is named; null: a machine that is built in. Never throws.
-int Run(const std::vector<std::string>& args, std::ostream& out, std::ostream& err,
-        platform::Host* thisPc = nullptr);
+// Carries out one command line, given without the program's name, as main does. Once in a process:
+// the component, which is loaded for it, stays. Never throws.
+int Run(const std::vector<std::string>& args, std::ostream& out, std::ostream& err);
 
 }  // namespace zkusb
