@@ -35,13 +35,13 @@ bool Move(IZKUMUsbTreeNodeEnumerator* list) {
 }
 
 TEST_F(NodeEnumerator, IsMadeOfAVectorThatItTakesOver) {
+  ClientNode node(KUDTHub);
   std::unique_ptr<VariantVector> items;
   auto* list = Mark<IZKUMUsbTreeNodeEnumerator>();
   EXPECT_EQ(CreateNodeEnumerator(items, &list), E_POINTER);
   EXPECT_EQ(list, nullptr);
   EXPECT_EQ(CreateNodeEnumerator(items, nullptr), E_POINTER);
 
-  ClientNode node(KUDTHub);
   items = std::make_unique<VariantVector>();
   items->push_back(Variant::OfUnknown(static_cast<IZKUMUsbTreeNode*>(&node)));
   EXPECT_EQ(CreateNodeEnumerator(items, nullptr), E_POINTER);
