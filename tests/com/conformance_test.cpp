@@ -6,10 +6,9 @@
 #include <functional>
 #include <string>
 
-#include "com/usb_tree.h"
-#include "platform/system.h"
 #include "tests/support/com_objects.h"
 #include "tests/support/desk_pc.h"
+#include "tests/support/tree_desk.h"
 
 namespace KelvoUHW {
 namespace {
@@ -69,13 +68,8 @@ std::string Answers(IUnknown* pointer, IUnknown* identity, std::vector<ComPtr<IU
 class Conformance : public ComObjects {
  protected:
   Conformance() {
-    platform::SetCurrentSystem({&pc});
-    EXPECT_EQ(pc.Apply({0, u"", Stick(u"S1", 1, u'E')}), u"");
-    ComObject<CZKUMUsbTree>* created = nullptr;
-    EXPECT_EQ(ComObject<CZKUMUsbTree>::Create(created), S_OK);
-    tree = ComPtr<IUnknown>::Attach(static_cast<IZKUMUsbTree*>(created));
-    EXPECT_EQ(created->BuildTree(), S_OK);
-
+    desk.Do(Stick(u"S1", 1, u'E'));
+    EXPECT_EQ(desk.Rebuild(), S_OK);
     sample.device->m_interfaceDescrs.push_back(MakeRecord<InterfaceEntry>());
     device = Wrap(sample.device);
     disk = Wrap(sample.disk);
@@ -87,11 +81,10 @@ class Conformance : public ComObjects {
     EXPECT_EQ(descriptors->Reset(), S_OK);
     descriptor = ComPtr<IUnknown>::Attach(element.punkVal);
   }
-  ~Conformance() override { platform::SetCurrentSystem({}); }
 
-  SimulatedPc pc{BarePc()};
+  TreeDesk desk{BarePc()};
   SampleTree sample;
-  ComPtr<IUnknown> tree, descriptor;
+  ComPtr<IUnknown> descriptor;
   ComPtr<IZKUMUsbTreeNode> device, disk;
   ComPtr<IZKUMUsbTreeNodeEnumerator> nodes;
   ComPtr<IEnumVARIANT> descriptors, mountPoints;
@@ -116,7 +109,7 @@ TEST_F(Conformance, EveryObjectAnswersForItsInterfacesFromEachOfThem) {
       {"descriptor", descriptor, "IZKUMInterfaceDescr"},
       {"descriptors", ComPtr<IUnknown>(descriptors.Get()), "IEnumVARIANT"},
       {"mount points", ComPtr<IUnknown>(mountPoints.Get()), "IEnumVARIANT"},
-      {"tree", tree, "IZKUMUsbTree IBuildUsbTree"},
+      {"tree", ComPtr<IUnknown>(desk.tree.Get()), "IZKUMUsbTree IBuildUsbTree"},
   };
   for (const auto& row : rows) {
     SCOPED_TRACE(row.what);
@@ -138,7 +131,7 @@ struct AnyOut {
 };
 
 TEST_F(Conformance, WhatIsHandedOutCarriesOneReferenceOfTheCallers) {
-  const auto query = tree.As<IZKUMUsbTree>();
+  IZKUMUsbTree* const query = desk.tree.Get();
   VARIANT_BOOL more = VARIANT_FALSE;
   ASSERT_EQ(nodes->MoveNext(&more), S_OK);
   const struct {
@@ -160,12 +153,12 @@ TEST_F(Conformance, WhatIsHandedOutCarriesOneReferenceOfTheCallers) {
       {"MountPoints", disk.Get(), [&](AnyOut out) { return disk.As<IZKUMInterfaceDevice>()->get_MountPoints(out); }, 1},
       {"GetCurrent", nodes.Get(), [&](AnyOut out) { return nodes->GetCurrent(out); }, 2},
       {"Clone", descriptors.Get(), [&](AnyOut out) { return descriptors->Clone(out); }, 1},
-      {"RootNode", tree.Get(), [&](AnyOut out) { return query->get_RootNode(out); }, 1},
-      {"PortDevicesWithVendorId", tree.Get(),
-       [&](AnyOut out) { return query->get_PortDevicesWithVendorId(0x0781, out); }, 1},
-      {"VendorProductDevices", tree.Get(),
-       [&](AnyOut out) { return query->get_VendorProductDevices(0x0781, 0x5567, out); }, 1},
-      {"PortDevicesWithVolume", tree.Get(), [&](AnyOut out) { return query->get_PortDevicesWithVolume(out); }, 1},
+      {"RootNode", query, [&](AnyOut out) { return query->get_RootNode(out); }, 1},
+      {"PortDevicesWithVendorId", query, [&](AnyOut out) { return query->get_PortDevicesWithVendorId(0x0781, out); },
+       1},
+      {"VendorProductDevices", query, [&](AnyOut out) { return query->get_VendorProductDevices(0x0781, 0x5567, out); },
+       1},
+      {"PortDevicesWithVolume", query, [&](AnyOut out) { return query->get_PortDevicesWithVolume(out); }, 1},
   };
   for (const auto& row : rows) {
     const ULONG before = References(row.callee);

@@ -19,6 +19,7 @@
 #include "devinfo/info_device.h"
 #include "devinfo/interface_device.h"
 #include "platform/text.h"
+#include "tests/support/object_reader.h"
 #include "tree/port_device.h"
 #include "tree/records.h"
 
@@ -131,12 +132,10 @@ inline std::string InstanceId(IUnknown* node) { return TextOf(&Read<&IZKUMUsbTre
 // The instance ids of a list, in order: "a b c".
 inline std::string WalkIds(IZKUMUsbTreeNodeEnumerator* list) {
   std::string ids;
-  VARIANT_BOOL more = VARIANT_FALSE;
-  while (list->MoveNext(&more) == S_OK && more == VARIANT_TRUE) {
-    ComPtr<IZKUMUsbTreeNode> node;
-    EXPECT_EQ(list->GetCurrent(node.Put()), S_OK);
+  testing_support::ForEachNode(*list, [&](HRESULT result, const ComPtr<IZKUMUsbTreeNode>& node) {
+    EXPECT_EQ(result, S_OK);
     if (node) ids += (ids.empty() ? "" : " ") + InstanceId(node.Get()).substr(sizeof "S_OK");
-  }
+  });
   return ids;
 }
 
