@@ -12,7 +12,7 @@
 #include "com/com_ptr.h"
 #include "com/variant.h"
 #include "com/zkusb_monitor.h"
-#include "platform/guid.h"
+#include "platform/text.h"
 
 namespace testing_support {
 
