@@ -59,11 +59,16 @@ CONF
 make_wine_prefix() {
   [ ! -d "$WINEPREFIX" ] || stop_wine
   rm -rf "$WINEPREFIX"
-  mkdir -p "$wine_home"
-  timeout 180 wineboot -i || return 1
+  mkdir -p "$WINEPREFIX"
+  # The server that the first program would start ends with the last one, and refuses a second.
   timeout 30 wineserver -p || return 1
+  timeout 180 wineboot -i || return 1
   # Windows that no display has to show.
   timeout 60 wine reg add 'HKCU\Software\Wine\Drivers' /v Graphics /d null /f
 }
 
-stop_wine() { timeout 30 wineserver -k || true; }
+# Ends the programs of this prefix and its server.
+stop_wine() {
+  timeout 30 wineserver -k || true
+  timeout 30 wineserver -w || true
+}
