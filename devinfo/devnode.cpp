@@ -4,9 +4,9 @@
 #include <array>
 #include <optional>
 #include <string_view>
-#include <unordered_set>
 
 #include "devinfo/received_text.h"
+#include "platform/flat_index.h"
 #include "platform/text.h"
 
 namespace KelvoUHW {
@@ -36,11 +36,11 @@ std::optional<std::u16string> ReadTextProperty(platform::DeviceManager& manager,
 // visited or climbed to twice, so the walk ends on a system that answers in circles.
 template <class Visit>
 void WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
-  std::unordered_set<platform::DevInst> visited;
-  std::unordered_set<platform::DevInst> climbedTo;
+  platform::FlatNumberSet visited;
+  platform::FlatNumberSet climbedTo;
   platform::DevInst node = 0;
   if (!manager.LocateRootDevNode(node) || node == 0) return;
-  while (visited.insert(node).second) {
+  while (visited.Insert(node)) {
     if (visit(node)) return;
     platform::DevInst next = 0;
     // A handle of 0 is no node, whatever the result code says.
@@ -51,7 +51,7 @@ void WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
     while (next = 0, !manager.GetSibling(node, next) || next == 0) {
       platform::DevInst parent = 0;
       if (!manager.GetParent(node, parent) || parent == 0) return;
-      if (!climbedTo.insert(parent).second) return;
+      if (!climbedTo.Insert(parent)) return;
       node = parent;
     }
     node = next;
@@ -96,18 +96,31 @@ platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
 
 platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
   if (!m_filled) Fill();
-  const auto found = m_nodes.find(platform::ToLower(driverKey));
-  return found == m_nodes.end() ? 0 : found->second;
+  const std::u16string key = platform::ToLower(driverKey);
+  const auto found = m_index.First(platform::HashOf(key), [&](auto i) { return KeyOf(i) == key; });
+  return found == platform::FlatIndex::kNone ? 0 : m_nodes[found].handle;
 }
 
 void DriverKeyIndex::Fill() {
   WalkDevNodes(m_manager, [this](platform::DevInst node) {
     if (const auto key = ReadTextProperty(m_manager, node, platform::kCM_DRP_DRIVER)) {
-      m_nodes.try_emplace(platform::ToLower(*key), node);  // the first node with a key has it
+      Add(platform::ToLower(*key), node);
     }
     return false;
   });
   m_filled = true;
+}
+
+// A key that an earlier node has is entered behind that one, and never found.
+void DriverKeyIndex::Add(std::u16string_view key, platform::DevInst node) {
+  m_nodes.push_back({m_keys.size(), key.size(), node});
+  m_keys += key;
+  m_index.Add(platform::HashOf(key), static_cast<platform::FlatIndex::Entry>(m_nodes.size() - 1),
+              [&](auto i) { return KeyOf(i) == key; });
+}
+
+std::u16string_view DriverKeyIndex::KeyOf(platform::FlatIndex::Entry entry) const noexcept {
+  return std::u16string_view(m_keys).substr(m_nodes[entry].keyBegin, m_nodes[entry].keyLength);
 }
 
 }  // namespace KelvoUHW

@@ -1,10 +1,13 @@
 // Device-manager nodes by their handle: description, id, parent; and the search by driver key.
 #pragma once
 
+#include <cstddef>
 #include <string>
-#include <unordered_map>
+#include <string_view>
+#include <vector>
 
 #include "devinfo/identifiers.h"
+#include "platform/flat_index.h"
 #include "platform/host.h"
 
 namespace KelvoUHW {
@@ -39,10 +42,20 @@ class DriverKeyIndex {
   platform::DevInst Find(const std::u16string& driverKey);
 
  private:
+  struct Node {
+    std::size_t keyBegin;  // in m_keys
+    std::size_t keyLength;
+    platform::DevInst handle;
+  };
+
   void Fill();
+  void Add(std::u16string_view key, platform::DevInst node);
+  std::u16string_view KeyOf(platform::FlatIndex::Entry entry) const noexcept;
 
   platform::DeviceManager& m_manager;
-  std::unordered_map<std::u16string, platform::DevInst> m_nodes;  // by lower-cased driver key
+  std::vector<Node> m_nodes;  // in the order of the walk
+  std::u16string m_keys;      // lower-cased, one behind the other
+  platform::FlatIndex m_index;
   bool m_filled = false;
 };
 

@@ -3,13 +3,13 @@
 #include <algorithm>
 #include <array>
 #include <string>
-#include <unordered_set>
 #include <utility>
 
 #include "devinfo/device_set.h"
 #include "devinfo/devnode.h"
 #include "devinfo/info_device_linking.h"
 #include "devinfo/property_reader.h"
+#include "platform/flat_index.h"
 #include "platform/text.h"
 #include "tree/record_lock.h"
 
@@ -54,14 +54,14 @@ class CommonParent {
 };
 
 // The instance ids of a tree. The texts are the nodes' own.
-std::unordered_set<std::u16string_view> InstanceIdsOf(const NodePtr& root) {
-  std::unordered_set<std::u16string_view> ids;
+platform::FlatTextSet InstanceIdsOf(const NodePtr& root) {
+  platform::FlatTextSet ids;
   std::vector<const CZKUMUsbTreeNodeImpl*> waiting;
   if (root) waiting.push_back(root.Get());
   while (!waiting.empty()) {
     const CZKUMUsbTreeNodeImpl* node = waiting.back();
     waiting.pop_back();
-    ids.insert(node->m_strDevInstId);
+    ids.Insert(node->m_strDevInstId);
     for (const NodePtr& child : node->m_childs) waiting.push_back(child.Get());
   }
   return ids;
@@ -147,7 +147,7 @@ bool InfoDeviceCache::ReadNode(platform::DeviceSetHandle set,
 
 void InfoDeviceCache::Keep(const InfoDevicePtr& record) {
   if (m_held.HasHandle(record->m_devInstHandle)) return;  // the held record may return later
-  if (const InfoDevicePtr known = m_previous.FindByHandle(record->m_devInstHandle)) {
+  if (const InfoDevicePtr& known = m_previous.FindByHandle(record->m_devInstHandle)) {
     m_current.Insert(known);
     return;
   }
@@ -184,7 +184,7 @@ void InfoDeviceCache::CreateDiskDriveRecords() {
 void InfoDeviceCache::ReturnHeldParents() {
   InfoDeviceSet children;
   for (const InfoDevicePtr& held : m_held) {
-    const InfoDevicePtr child = m_current.FindByParentId(held->m_strDevInstId, held.Get());
+    const InfoDevicePtr& child = m_current.FindByParentId(held->m_strDevInstId, held.Get());
     if (child) children.Insert(child);
   }
   InfoDeviceSet returning;
@@ -212,13 +212,13 @@ void InfoDeviceCache::FindRemoved() {
 // Each text is looked up once however many records share it.
 InfoDeviceSet InfoDeviceCache::AncestorsOfRemoved() const {
   InfoDeviceSet ancestors;
-  std::unordered_set<std::u16string_view> parentIds;
-  std::unordered_set<std::u16string_view> grandparentIds;
+  platform::FlatTextSet parentIds;
+  platform::FlatTextSet grandparentIds;
   for (const InfoDevicePtr& removed : m_removed) {
-    if (!parentIds.insert(removed->m_strDevInstIdParent).second) continue;
+    if (!parentIds.Insert(removed->m_strDevInstIdParent)) continue;
     for (const InfoDevicePtr& parent : m_current.AllByInstanceId(removed->m_strDevInstIdParent)) {
       ancestors.Insert(parent);
-      if (!grandparentIds.insert(parent->m_strDevInstIdParent).second) continue;
+      if (!grandparentIds.Insert(parent->m_strDevInstIdParent)) continue;
       for (const InfoDevicePtr& grandparent :
            m_current.AllByInstanceId(parent->m_strDevInstIdParent)) {
         ancestors.Insert(grandparent);
@@ -238,16 +238,16 @@ void InfoDeviceCache::HoldBack(const InfoDeviceSet& ancestors) {
 
 // New records wait until the tree shows their device, and count as added from then on.
 void InfoDeviceCache::SortPending(const NodePtr& treeRoot) {
-  const std::unordered_set<std::u16string_view> shown = InstanceIdsOf(treeRoot);
+  const platform::FlatTextSet shown = InstanceIdsOf(treeRoot);
   InfoDeviceSet stillPending;
   InfoDeviceSet nowShown;
   for (const InfoDevicePtr& record : m_pending) {
     if (!m_current.HasRecord(record.Get()) || m_added.HasRecord(record.Get())) continue;
-    (shown.contains(record->m_strDevInstId) ? nowShown : stillPending).Insert(record);
+    (shown.Contains(record->m_strDevInstId) ? nowShown : stillPending).Insert(record);
   }
   InfoDeviceSet added;
   for (const InfoDevicePtr& record : m_added) {
-    if (shown.contains(record->m_strDevInstId)) {
+    if (shown.Contains(record->m_strDevInstId)) {
       added.Insert(record);
     } else {
       stillPending.Insert(record);
@@ -270,7 +270,7 @@ void InfoDeviceCache::Commit() {
 }
 
 void InfoDeviceCache::AttachToParentInfoDevice(const NodePtr& node) const {
-  const InfoDevicePtr parent = m_current.FindByInstanceId(node->m_strDevInstIdParent);
+  const InfoDevicePtr& parent = m_current.FindByInstanceId(node->m_strDevInstIdParent);
   if (parent && parent != node) AddChild(node, parent.Get());
 }
 

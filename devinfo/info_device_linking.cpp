@@ -1,45 +1,57 @@
 #include "devinfo/info_device_linking.h"
 
-#include <string_view>
-#include <unordered_map>
-#include <unordered_set>
-#include <utility>
+#include <cstdint>
 #include <vector>
+
+#include "platform/flat_index.h"
 
 namespace KelvoUHW {
 
 namespace {
 
-using Record = const CZKUMUsbTreeNodeImpl*;
+using platform::FlatIndex;
+using Entry = FlatIndex::Entry;
 
+// A record of the set, which has the pointer, and where its parent stands among all of them.
 struct Link {
-  InfoDevicePtr child;
-  InfoDevicePtr parent;  // empty where the set has none
+  const InfoDevicePtr* child;
+  Entry parent = FlatIndex::kNone;
 };
 
 std::vector<Link> FindParents(const InfoDeviceSet& records) {
   std::vector<Link> links;
   links.reserve(records.size());
-  for (const InfoDevicePtr& child : records) {
-    links.push_back({child, records.FindByInstanceId(child->m_strDevInstIdParent)});
+  for (const InfoDevicePtr& child : records) links.push_back({&child});
+
+  const auto hashOf = [](const InfoDevicePtr& record) {
+    return platform::HashOf(reinterpret_cast<std::uintptr_t>(record.Get()));
+  };
+  FlatIndex places;
+  for (Entry place = 0; place < links.size(); ++place) {
+    places.Add(hashOf(*links[place].child), place, [](Entry) { return false; });
+  }
+  for (Link& link : links) {
+    const InfoDevicePtr& parent = records.FindByInstanceId((*link.child)->m_strDevInstIdParent);
+    if (!parent) continue;
+    link.parent =
+        places.First(hashOf(parent), [&](Entry place) { return *links[place].child == parent; });
   }
   return links;
 }
 
-// The records that are ancestors of themselves. Each has one parent at most, so one walk upwards
-// from each record not yet seen meets every circle once.
-std::unordered_set<Record> FindCircles(const std::vector<Link>& links) {
-  std::unordered_map<Record, Record> parentOf;
-  for (const Link& link : links) parentOf.emplace(link.child.Get(), link.parent.Get());
-
-  std::unordered_set<Record> onCircle;
-  std::unordered_map<Record, Record> seenFrom;  // by the record the walk started at
-  for (const Link& link : links) {
-    const Record start = link.child.Get();
-    Record at = start;
-    while (at != nullptr && seenFrom.try_emplace(at, start).second) at = parentOf.at(at);
-    if (at == nullptr || seenFrom.at(at) != start) continue;
-    while (onCircle.insert(at).second) at = parentOf.at(at);
+// By place, whether the record is an ancestor of itself. Each has one parent at most, so one walk
+// upwards from each record not yet seen meets every circle once.
+std::vector<bool> FindCircles(const std::vector<Link>& links) {
+  std::vector<bool> onCircle(links.size());
+  std::vector<Entry> seenFrom(links.size(), FlatIndex::kNone);  // the record the walk started at
+  for (Entry start = 0; start < links.size(); ++start) {
+    Entry at = start;
+    while (at != FlatIndex::kNone && seenFrom[at] == FlatIndex::kNone) {
+      seenFrom[at] = start;
+      at = links[at].parent;
+    }
+    if (at == FlatIndex::kNone || seenFrom[at] != start) continue;
+    for (; !onCircle[at]; at = links[at].parent) onCircle[at] = true;
   }
   return onCircle;
 }
@@ -48,37 +60,57 @@ std::unordered_set<Record> FindCircles(const std::vector<Link>& links) {
 // instance id, which all that are the same node have.
 class ChildAdder {
  public:
-  void Add(const NodePtr& child, CZKUMUsbTreeNodeImpl& parent) {
-    const auto [known, fresh] = m_childrenOf.try_emplace(&parent);
-    ById& children = known->second;
-    if (fresh) {
-      for (const NodePtr& present : parent.m_childs) {
-        children.emplace(present->m_strDevInstId, present.Get());
-      }
+  explicit ChildAdder(std::size_t parents) : m_known(parents) {}
+
+  // `place` tells the parent from the others.
+  void Add(const NodePtr& child, CZKUMUsbTreeNodeImpl& parent, Entry place) {
+    if (!m_known[place]) {
+      m_known[place] = true;
+      for (const NodePtr& present : parent.m_childs) Remember(*present, place);
     }
-    const auto [first, last] = children.equal_range(child->m_strDevInstId);
-    for (auto present = first; present != last; ++present) {
-      if (present->second->IsSameNode(*child)) return;
+    const auto same = [&](Entry entry) { return IsOf(entry, place, child->m_strDevInstId); };
+    for (Entry entry = m_byId.First(HashOf(place, child->m_strDevInstId), same);
+         entry != FlatIndex::kNone; entry = m_byId.Next(entry)) {
+      if (m_children[entry].child->IsSameNode(*child)) return;
     }
-    children.emplace(child->m_strDevInstId, child.Get());
     parent.m_childs.push_back(child);
     child->m_pParent = &parent;
+    Remember(*child, place);
   }
 
  private:
-  // The texts are the children's own, and the parents keep those alive.
-  using ById = std::unordered_multimap<std::u16string_view, Record>;
-  std::unordered_map<Record, ById> m_childrenOf;
+  struct Child {
+    Entry parent;
+    const CZKUMUsbTreeNodeImpl* child;
+  };
+
+  static std::size_t HashOf(Entry parent, std::u16string_view id) noexcept {
+    return platform::HashOf(parent) ^ platform::HashOf(id);
+  }
+  bool IsOf(Entry entry, Entry parent, std::u16string_view id) const noexcept {
+    return m_children[entry].parent == parent && m_children[entry].child->m_strDevInstId == id;
+  }
+  void Remember(const CZKUMUsbTreeNodeImpl& child, Entry parent) {
+    m_children.push_back({parent, &child});
+    m_byId.Add(HashOf(parent, child.m_strDevInstId), static_cast<Entry>(m_children.size() - 1),
+               [&](Entry entry) { return IsOf(entry, parent, child.m_strDevInstId); });
+  }
+
+  std::vector<bool> m_known;  // parents whose children are in the index
+  std::vector<Child> m_children;
+  FlatIndex m_byId;
 };
 
 }  // namespace
 
 void LinkToParents(const InfoDeviceSet& records) {
   const std::vector<Link> links = FindParents(records);
-  const std::unordered_set<Record> onCircle = FindCircles(links);
-  ChildAdder adder;
-  for (const Link& link : links) {
-    if (link.parent && !onCircle.contains(link.child.Get())) adder.Add(link.child, *link.parent);
+  const std::vector<bool> onCircle = FindCircles(links);
+  ChildAdder adder(links.size());
+  for (Entry place = 0; place < links.size(); ++place) {
+    const Link& link = links[place];
+    if (link.parent == FlatIndex::kNone || onCircle[place]) continue;
+    adder.Add(*link.child, **links[link.parent].child, link.parent);
   }
 }
 

@@ -1,82 +1,141 @@
 #include "devinfo/info_device_set.h"
 
+#include <cstdint>
+
 namespace KelvoUHW {
 
+using platform::FlatIndex;
+using platform::HashOf;
+
+struct InfoDeviceSet::ByRecord {
+  static std::uint64_t Of(const CZKUMUsbTreeNodeImpl& record) noexcept {
+    return reinterpret_cast<std::uintptr_t>(&record);
+  }
+};
+struct InfoDeviceSet::ByHandle {
+  static platform::DevInst Of(const CZKUMUsbTreeNodeImpl& record) noexcept {
+    return record.m_devInstHandle;
+  }
+};
+struct InfoDeviceSet::ByInstanceId {
+  static std::u16string_view Of(const CZKUMUsbTreeNodeImpl& record) noexcept {
+    return record.m_strDevInstId;
+  }
+};
+struct InfoDeviceSet::ByParentId {
+  static std::u16string_view Of(const CZKUMUsbTreeNodeImpl& record) noexcept {
+    return record.m_strDevInstIdParent;
+  }
+};
+
+template <class Key>
+void InfoDeviceSet::Enter(Index<Key>& index, Entry entry) const {
+  const auto value = Key::Of(RecordAt(entry));
+  index.entries.Add(HashOf(value), entry,
+                    [&](Entry other) { return Key::Of(RecordAt(other)) == value; });
+}
+
+template <class Key>
+void InfoDeviceSet::Leave(Index<Key>& index, Entry entry) const noexcept {
+  const auto value = Key::Of(RecordAt(entry));
+  index.entries.Remove(HashOf(value), entry,
+                       [&](Entry other) { return Key::Of(RecordAt(other)) == value; });
+}
+
+template <class Key, class Value>
+InfoDeviceSet::Entry InfoDeviceSet::First(const Value& value) const {
+  auto& index = std::get<Index<Key>>(m_indexes);
+  if (!index.filled) {
+    index.entries.Clear();  // what a filling that ran out of memory left
+    for (Entry entry = 0; entry < m_places.size(); ++entry) {
+      if (!m_places[entry].erased) Enter(index, entry);
+    }
+    index.filled = true;
+  }
+  return index.entries.First(HashOf(value),
+                             [&](Entry entry) { return Key::Of(RecordAt(entry)) == value; });
+}
+
+const InfoDevicePtr& InfoDeviceSet::Found(Entry entry) const noexcept {
+  static const InfoDevicePtr none;
+  return entry == FlatIndex::kNone ? none : *m_places[entry].record;
+}
+
 bool InfoDeviceSet::Insert(const InfoDevicePtr& record) {
-  const auto [slot, added] = m_places.try_emplace(
-      record.Get(),
-      Places{m_records.end(), m_byHandle.end(), m_byInstanceId.end(), m_byParentId.end()});
-  if (!added) return false;
-  Places& places = slot->second;
+  if (HasRecord(record.Get())) return false;
+  constexpr std::size_t kFewErased = 16;
+  if (m_places.size() > 2 * m_records.size() + kFewErased) Renumber();
+  const auto entry = static_cast<Entry>(m_places.size());
+  const auto place = m_records.insert(m_records.end(), record);
   try {
-    places.Record = m_records.insert(m_records.end(), record);
-    const InfoDevicePtr* held = &*places.Record;
-    places.Handle = m_byHandle.emplace(record->m_devInstHandle, held);
-    places.InstanceId = m_byInstanceId.emplace(record->m_strDevInstId, held);
-    places.ParentId = m_byParentId.emplace(record->m_strDevInstIdParent, held);
+    m_places.push_back({place});
+    const auto enter = [&](auto& index) {
+      if (index.filled) Enter(index, entry);
+    };
+    std::apply([&](auto&... index) { (enter(index), ...); }, m_indexes);
   } catch (...) {
-    Remove(places);
-    m_places.erase(slot);
+    // Which of the indexes have the record already does not matter: all are filled anew.
+    m_indexes = {};
+    m_places.resize(entry);
+    m_records.erase(place);
     throw;
   }
   return true;
 }
 
 bool InfoDeviceSet::Erase(const CZKUMUsbTreeNodeImpl* record) {
-  const auto slot = m_places.find(record);
-  if (slot == m_places.end()) return false;
-  const Places places = slot->second;
-  m_places.erase(slot);
-  Remove(places);
+  const Entry entry = First<ByRecord>(ByRecord::Of(*record));
+  if (entry == FlatIndex::kNone) return false;
+  const auto leave = [&](auto& index) {
+    if (index.filled) Leave(index, entry);
+  };
+  std::apply([&](auto&... index) { (leave(index), ...); }, m_indexes);
+  m_places[entry].erased = true;
+  m_records.erase(m_places[entry].record);
   return true;
 }
 
-// The record goes last: the indexes name its texts.
-void InfoDeviceSet::Remove(const Places& places) noexcept {
-  if (places.ParentId != m_byParentId.end()) m_byParentId.erase(places.ParentId);
-  if (places.InstanceId != m_byInstanceId.end()) m_byInstanceId.erase(places.InstanceId);
-  if (places.Handle != m_byHandle.end()) m_byHandle.erase(places.Handle);
-  if (places.Record != m_records.end()) m_records.erase(places.Record);
+// A set that records come to and leave for years must not grow by every one that left.
+void InfoDeviceSet::Renumber() {
+  m_indexes = {};
+  std::erase_if(m_places, [](const Place& place) { return place.erased; });
 }
 
 void InfoDeviceSet::Clear() noexcept {
+  m_indexes = {};
   m_places.clear();
-  m_byParentId.clear();
-  m_byInstanceId.clear();
-  m_byHandle.clear();
   m_records.clear();
 }
 
-bool InfoDeviceSet::HasRecord(const CZKUMUsbTreeNodeImpl* record) const noexcept {
-  return m_places.contains(record);
+bool InfoDeviceSet::HasRecord(const CZKUMUsbTreeNodeImpl* record) const {
+  return First<ByRecord>(ByRecord::Of(*record)) != FlatIndex::kNone;
 }
 
-InfoDevicePtr InfoDeviceSet::FindByHandle(platform::DevInst handle) const {
-  const auto found = m_byHandle.lower_bound(handle);
-  if (found == m_byHandle.end() || found->first != handle) return {};
-  return *found->second;
+const InfoDevicePtr& InfoDeviceSet::FindByHandle(platform::DevInst handle) const {
+  return Found(First<ByHandle>(handle));
 }
 
-InfoDevicePtr InfoDeviceSet::FindByInstanceId(std::u16string_view id) const {
-  const auto found = m_byInstanceId.lower_bound(id);
-  if (found == m_byInstanceId.end() || found->first != id) return {};
-  return *found->second;
+const InfoDevicePtr& InfoDeviceSet::FindByInstanceId(std::u16string_view id) const {
+  return Found(First<ByInstanceId>(id));
 }
 
 std::vector<InfoDevicePtr> InfoDeviceSet::AllByInstanceId(std::u16string_view id) const {
   std::vector<InfoDevicePtr> all;
-  const auto [first, last] = m_byInstanceId.equal_range(id);
-  for (auto place = first; place != last; ++place) all.push_back(*place->second);
+  const auto& index = std::get<Index<ByInstanceId>>(m_indexes).entries;
+  for (Entry entry = First<ByInstanceId>(id); entry != FlatIndex::kNone;
+       entry = index.Next(entry)) {
+    all.push_back(Found(entry));
+  }
   return all;
 }
 
-InfoDevicePtr InfoDeviceSet::FindByParentId(std::u16string_view id,
-                                            const CZKUMUsbTreeNodeImpl* except) const {
-  for (auto place = m_byParentId.lower_bound(id); place != m_byParentId.end() && place->first == id;
-       ++place) {
-    if (place->second->Get() != except) return *place->second;
+const InfoDevicePtr& InfoDeviceSet::FindByParentId(std::u16string_view id,
+                                                   const CZKUMUsbTreeNodeImpl* except) const {
+  const auto& index = std::get<Index<ByParentId>>(m_indexes).entries;
+  for (Entry entry = First<ByParentId>(id); entry != FlatIndex::kNone; entry = index.Next(entry)) {
+    if (&RecordAt(entry) != except) return Found(entry);
   }
-  return {};
+  return Found(FlatIndex::kNone);
 }
 
 }  // namespace KelvoUHW

@@ -3,12 +3,12 @@
 
 #include <cstddef>
 #include <list>
-#include <map>
 #include <string_view>
-#include <unordered_map>
+#include <tuple>
 #include <vector>
 
 #include "devinfo/info_device.h"
+#include "platform/flat_index.h"
 
 namespace KelvoUHW {
 
@@ -16,14 +16,11 @@ namespace KelvoUHW {
 // of insertion, which events follow; so does every question that more than one record could answer.
 //
 // Handle, instance id and parent instance id of a record must not change while it is in a set: the
-// set finds it by them. Questions take logarithmic time, insertion and removal too; erasing leaves
-// iterators to other records valid. One thread at a time.
+// set finds it by them. The first question of a kind takes time for every record, later ones do
+// not, nor do insertion and removal; erasing leaves iterators to other records valid. Any of them
+// may throw std::bad_alloc and leaves the set as it was then. One thread at a time, questions too.
 class InfoDeviceSet {
  public:
-  InfoDeviceSet() = default;
-  InfoDeviceSet(InfoDeviceSet&&) = default;
-  InfoDeviceSet& operator=(InfoDeviceSet&&) = default;
-
   auto begin() const noexcept { return m_records.begin(); }
   auto end() const noexcept { return m_records.end(); }
   std::size_t size() const noexcept { return m_records.size(); }
@@ -36,38 +33,60 @@ class InfoDeviceSet {
   void Clear() noexcept;
 
   // Membership by identity: this very object.
-  bool HasRecord(const CZKUMUsbTreeNodeImpl* record) const noexcept;
+  bool HasRecord(const CZKUMUsbTreeNodeImpl* record) const;
   // Membership by handle: any record of the same device-manager node.
-  bool HasHandle(platform::DevInst handle) const noexcept { return m_byHandle.contains(handle); }
-  // The first record with this handle, or empty.
-  InfoDevicePtr FindByHandle(platform::DevInst handle) const;
+  bool HasHandle(platform::DevInst handle) const { return static_cast<bool>(FindByHandle(handle)); }
 
-  // The first record with exactly this instance id, or empty.
-  InfoDevicePtr FindByInstanceId(std::u16string_view id) const;
+  // What is found is the set's own pointer, which stays until that record is erased; or an empty
+  // one, which stays for good.
+
+  // The first record with this handle.
+  const InfoDevicePtr& FindByHandle(platform::DevInst handle) const;
+  // The first record with exactly this instance id.
+  const InfoDevicePtr& FindByInstanceId(std::u16string_view id) const;
   // Every record with exactly this instance id.
   std::vector<InfoDevicePtr> AllByInstanceId(std::u16string_view id) const;
-  // The first record that names exactly this parent and is not `except`, or empty.
-  InfoDevicePtr FindByParentId(std::u16string_view id, const CZKUMUsbTreeNodeImpl* except) const;
+  // The first record that names exactly this parent and is not `except`.
+  const InfoDevicePtr& FindByParentId(std::u16string_view id,
+                                      const CZKUMUsbTreeNodeImpl* except) const;
 
  private:
+  using Entry = platform::FlatIndex::Entry;
   using Records = std::list<InfoDevicePtr>;
-  // Equal keys stay in order of insertion. The texts are the records' own.
-  using HandleIndex = std::multimap<platform::DevInst, const InfoDevicePtr*>;
-  using TextIndex = std::multimap<std::u16string_view, const InfoDevicePtr*>;
-  struct Places {
-    Records::iterator Record;
-    HandleIndex::iterator Handle;
-    TextIndex::iterator InstanceId;
-    TextIndex::iterator ParentId;
+  struct Place {
+    Records::iterator record;
+    bool erased = false;
   };
 
-  void Remove(const Places& places) noexcept;
+  // By what a question asks. Most sets are never asked by every key, and texts are expensive to
+  // read: an index is filled when it is first needed and kept up from then on.
+  struct ByRecord;
+  struct ByHandle;
+  struct ByInstanceId;
+  struct ByParentId;
+  template <class Key>
+  struct Index {
+    platform::FlatIndex entries;
+    bool filled = false;
+  };
+  using Indexes =
+      std::tuple<Index<ByRecord>, Index<ByHandle>, Index<ByInstanceId>, Index<ByParentId>>;
+
+  const CZKUMInfoDeviceImpl& RecordAt(Entry entry) const noexcept {
+    return **m_places[entry].record;
+  }
+  template <class Key>
+  void Enter(Index<Key>& index, Entry entry) const;
+  template <class Key>
+  void Leave(Index<Key>& index, Entry entry) const noexcept;
+  template <class Key, class Value>
+  Entry First(const Value& value) const;
+  const InfoDevicePtr& Found(Entry entry) const noexcept;
+  void Renumber();
 
   Records m_records;
-  HandleIndex m_byHandle;
-  TextIndex m_byInstanceId;
-  TextIndex m_byParentId;
-  std::unordered_map<const CZKUMUsbTreeNodeImpl*, Places> m_places;
+  std::vector<Place> m_places;  // by entry, in the order of the records, erased ones between them
+  mutable Indexes m_indexes;
 };
 
 }  // namespace KelvoUHW

@@ -106,6 +106,7 @@ bool CZKUMUsbTreeNodeImpl::HasChildWithDriverKey(const std::u16string& driverKey
 }
 
 bool CZKUMUsbTreeNodeImpl::IsSameNode(const CZKUMUsbTreeNodeImpl& other) const noexcept {
+  if (this == &other) return true;
   return m_strDevInstId == other.m_strDevInstId && m_nProductId == other.m_nProductId &&
          m_strProduct == other.m_strProduct && m_strSerialNumber == other.m_strSerialNumber &&
          m_strDeviceDescr == other.m_strDeviceDescr;

@@ -1,7 +1,6 @@
 #include "tree/publication.h"
 
 #include <algorithm>
-#include <unordered_set>
 #include <utility>
 
 #include "devinfo/devnode.h"
@@ -11,11 +10,9 @@ namespace KelvoUHW {
 
 namespace {
 
-using IdSet = std::unordered_set<std::u16string>;
-
-IdSet IdsOf(const DeviceList& list) {
-  IdSet ids;
-  for (const NodePtr& node : list) ids.insert(node->m_strDevInstId);
+platform::FlatTextSet IdsOf(const DeviceList& list) {
+  platform::FlatTextSet ids;
+  for (const NodePtr& node : list) ids.Insert(node->m_strDevInstId);
   return ids;
 }
 
@@ -131,15 +128,15 @@ void Publication::IdentifyHubs(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& 
 DeviceList Publication::RemovedDevices() {
   TreeIndex index(m_published);
   DeviceList removed = MatchAll(m_devices.Removed(), index);
-  IdSet known = IdsOf(removed);
-  IdSet present;
+  platform::FlatTextSet known = IdsOf(removed);
+  platform::FlatTextSet present;
   VisitPreOrder(m_building, [&](const NodePtr& node) {
-    if (node->m_nType == KUDTPortDevice) present.insert(node->m_strDevInstId);
+    if (node->m_nType == KUDTPortDevice) present.Insert(node->m_strDevInstId);
     return true;
   });
   VisitPreOrder(m_published, [&](const NodePtr& node) {
-    if (node->m_nType == KUDTPortDevice && !present.contains(node->m_strDevInstId) &&
-        known.insert(node->m_strDevInstId).second) {
+    if (node->m_nType == KUDTPortDevice && !present.Contains(node->m_strDevInstId) &&
+        known.Insert(node->m_strDevInstId)) {
       removed.push_back(node);
     }
     return true;
@@ -149,25 +146,25 @@ DeviceList Publication::RemovedDevices() {
 
 DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIndex& index) {
   DeviceList modified;
-  const IdSet attachedIds = IdsOf(attached);
-  IdSet modifiedIds;
+  const platform::FlatTextSet attachedIds = IdsOf(attached);
+  platform::FlatTextSet modifiedIds;
   const auto append = [&](const std::u16string& instanceId) {
     NodePtr node = index.Find(instanceId);
     if (!node) return;
-    modifiedIds.insert(instanceId);
+    modifiedIds.Insert(instanceId);
     modified.push_back(std::move(node));
   };
   for (const InfoDevicePtr& entry : m_devices.Added()) {
     const CZKUMUsbTreeNodeImpl* below = ClimbToHubPort(entry->m_pParent);
     if (below == nullptr || below->m_nType != KUDTPortDevice) continue;
     const std::u16string& id = below->m_strDevInstId;
-    if (!attachedIds.contains(id) && !modifiedIds.contains(id)) append(id);
+    if (!attachedIds.Contains(id) && !modifiedIds.Contains(id)) append(id);
   }
   // A device is appended here once for each of its volumes, however often it is listed already.
   // This is meant.
   for (const NodePtr& device : m_interfaceDevices) {
     const CZKUMUsbTreeNodeImpl* below = ClimbToHubPort(device->m_pParent);
-    if (below != nullptr && !attachedIds.contains(below->m_strDevInstId)) {
+    if (below != nullptr && !attachedIds.Contains(below->m_strDevInstId)) {
       append(below->m_strDevInstId);
     }
   }

@@ -21,9 +21,11 @@ constexpr std::int32_t kLegacyNames = 10;
 struct CZKUMTopologyWalker::HubOnTheWay {
   explicit HubOnTheWay(platform::DeviceIo& io) noexcept : file(io) {}
 
-  // A port that is done goes below the hub, and is named after it.
+  // A port that is done goes below the hub, and is named after it. Its name is not among those of
+  // the ports that are there, so it is not compared with each of them.
   void Add(const RingPtr<CZKUMHubPortImpl>& port) {
-    AddChild(port, hub.Get());
+    hub->m_childs.push_back(port);
+    port->m_pParent = hub.Get();
     port->SetInstanceId(hub->m_strDevInstId + u" port " +
                         platform::Decimal(static_cast<std::int32_t>(port->m_nPortIndex)));
   }

@@ -1,46 +1,66 @@
 #include "tree/tree_index.h"
 
-#include <algorithm>
 #include <utility>
 
 namespace KelvoUHW {
 
+using platform::FlatIndex;
+using platform::HashOf;
+
 TreeIndex::TreeIndex(NodePtr root) : m_root(std::move(root)) { Added(m_root); }
 
+TreeIndex::Entry TreeIndex::First(std::u16string_view instanceId) const noexcept {
+  return m_byId.First(HashOf(instanceId),
+                      [&](Entry entry) { return m_nodes[entry]->m_strDevInstId == instanceId; });
+}
+
 NodePtr TreeIndex::Find(const std::u16string& instanceId) const {
-  const auto found = m_nodes.find(instanceId);
-  if (found == m_nodes.end() || found->second.empty()) return {};
-  if (found->second.size() == 1) return found->second.front();
+  const Entry found = First(instanceId);
+  if (found == FlatIndex::kNone) return {};
+  if (m_byId.Next(found) == FlatIndex::kNone) return m_nodes[found];
   // Which of several comes first depends on where they hang by now: the search knows.
   return FindByInstanceId(m_root, instanceId);
 }
 
 NodePtr TreeIndex::FindPortDevice(const std::u16string& instanceId) const {
-  const auto isPortDevice = [](const NodePtr& node) { return node->m_nType == KUDTPortDevice; };
-  const auto found = m_nodes.find(instanceId);
+  const auto isPortDevice = [this](Entry entry) {
+    return m_nodes[entry]->m_nType == KUDTPortDevice;
+  };
+  const Entry first = First(instanceId);
   // A volume's device node and interface device carry one id: no need to search which comes first.
-  if (found == m_nodes.end() || std::ranges::none_of(found->second, isPortDevice)) return {};
+  Entry entry = first;
+  while (entry != FlatIndex::kNone && !isPortDevice(entry)) entry = m_byId.Next(entry);
+  if (entry == FlatIndex::kNone) return {};
   NodePtr node = Find(instanceId);
-  return node && isPortDevice(node) ? node : NodePtr();
+  return node && node->m_nType == KUDTPortDevice ? node : NodePtr();
 }
 
 void TreeIndex::Added(const NodePtr& node) {
   VisitPreOrder(node, [this](const NodePtr& each) {
-    m_nodes[each->m_strDevInstId].push_back(each);
+    m_nodes.push_back(each);
+    Enter(static_cast<Entry>(m_nodes.size() - 1));
     return true;
   });
 }
 
+void TreeIndex::Enter(Entry entry) {
+  const std::u16string& id = m_nodes[entry]->m_strDevInstId;
+  m_byId.Add(HashOf(id), entry, [&](Entry other) { return m_nodes[other]->m_strDevInstId == id; });
+}
+
 void TreeIndex::Renamed(const CZKUMUsbTreeNodeImpl& node, const std::u16string& earlierId) {
-  const auto earlier = m_nodes.find(earlierId);
-  if (earlier == m_nodes.end() || earlierId == node.m_strDevInstId) return;
-  auto& nodes = earlier->second;
-  const auto place = std::find_if(nodes.begin(), nodes.end(),
-                                  [&](const NodePtr& each) { return each.Get() == &node; });
-  if (place == nodes.end()) return;
-  NodePtr renamed = std::move(*place);
-  nodes.erase(place);
-  m_nodes[node.m_strDevInstId].push_back(std::move(renamed));
+  if (earlierId == node.m_strDevInstId) return;
+  // Where it stands it stands under its earlier id still.
+  const auto hadEarlierId = [&](Entry entry) {
+    const NodePtr& each = m_nodes[entry];
+    return (each.Get() == &node ? earlierId : each->m_strDevInstId) == earlierId;
+  };
+  const std::size_t hash = HashOf(earlierId);
+  Entry entry = m_byId.First(hash, hadEarlierId);
+  while (entry != FlatIndex::kNone && m_nodes[entry].Get() != &node) entry = m_byId.Next(entry);
+  if (entry == FlatIndex::kNone) return;
+  m_byId.Remove(hash, entry, hadEarlierId);
+  Enter(entry);
 }
 
 }  // namespace KelvoUHW

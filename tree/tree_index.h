@@ -1,10 +1,11 @@
 // Nodes of a tree by instance id, answered as the depth-first search would, but without searching.
 #pragma once
 
+#include <deque>
 #include <string>
-#include <unordered_map>
-#include <vector>
+#include <string_view>
 
+#include "platform/flat_index.h"
 #include "tree/node.h"
 
 namespace KelvoUHW {
@@ -24,8 +25,14 @@ class TreeIndex {
   void Renamed(const CZKUMUsbTreeNodeImpl& node, const std::u16string& earlierId);
 
  private:
+  using Entry = platform::FlatIndex::Entry;
+
+  Entry First(std::u16string_view instanceId) const noexcept;
+  void Enter(Entry entry);
+
   NodePtr m_root;
-  std::unordered_map<std::u16string, std::vector<NodePtr>> m_nodes;
+  std::deque<NodePtr> m_nodes;  // stay in their place: moving a pointer touches its whole ring
+  platform::FlatIndex m_byId;
 };
 
 }  // namespace KelvoUHW

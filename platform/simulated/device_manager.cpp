@@ -1,7 +1,6 @@
 #include <cstring>
 #include <optional>
 
-#include "platform/simulated/properties.h"
 #include "platform/simulated/state.h"
 
 namespace platform::simulated {
@@ -23,13 +22,10 @@ Status SimulatedPc::LocateRootDevNode(DevInst& node) noexcept {
 
 Status SimulatedPc::GetParent(DevInst node, DevInst& parent) noexcept {
   const std::lock_guard lock(m_state->mutex);
-  const IndexedMachine& now = *m_state->now;
-  const MachineIndex::Position position = now.index.DeviceByNumber(node);
+  const MachineIndex& index = m_state->now->index;
+  const MachineIndex::Position position = index.DeviceByNumber(node);
   if (position == MachineIndex::kNone) return Status::Failure(kCR_INVALID_DEVNODE);
-  if (position != MachineIndex::kRoot && now.machine.devices[position].noParent) {
-    return Status::Failure(kCR_NO_SUCH_DEVNODE);
-  }
-  return GiveNode(now.index, now.index.Parent(position), parent);
+  return GiveNode(index, index.Parent(position), parent);
 }
 
 Status SimulatedPc::GetChild(DevInst node, DevInst& child) noexcept {
@@ -51,11 +47,11 @@ Status SimulatedPc::GetSibling(DevInst node, DevInst& sibling) noexcept {
 Status SimulatedPc::GetDeviceId(DevInst node, char16_t* buffer,
                                 std::uint32_t bufferChars) noexcept {
   const std::lock_guard lock(m_state->mutex);
-  const MachineIndex::Position position = m_state->now->index.DeviceByNumber(node);
+  const IndexedMachine& now = *m_state->now;
+  const MachineIndex::Position position = now.index.DeviceByNumber(node);
   if (position == MachineIndex::kNone) return Status::Failure(kCR_INVALID_DEVNODE);
-  const std::u16string_view id = position == MachineIndex::kRoot
-                                     ? std::u16string_view(kRootDeviceId)
-                                     : m_state->now->machine.devices[position].id;
+  const std::u16string_view id =
+      position == MachineIndex::kRoot ? kRootDeviceId : now.properties.Id(position);
   if (buffer == nullptr || id.size() >= bufferChars) return Status::Failure(kCR_BUFFER_SMALL);
   id.copy(buffer, id.size());
   buffer[id.size()] = u'\0';
@@ -66,12 +62,12 @@ Status SimulatedPc::GetDevNodeRegistryProperty(DevInst node, std::uint32_t prope
                                                std::uint32_t* type, void* buffer,
                                                std::uint32_t& bytes) noexcept {
   const std::lock_guard lock(m_state->mutex);
-  const MachineIndex::Position position = m_state->now->index.DeviceByNumber(node);
+  const IndexedMachine& now = *m_state->now;
+  const MachineIndex::Position position = now.index.DeviceByNumber(node);
   if (position == MachineIndex::kNone) return Status::Failure(kCR_INVALID_DEVNODE);
   if (position == MachineIndex::kRoot) return Status::Failure(kCR_NO_SUCH_VALUE);
   // These properties count from one; zero wraps to a number that no property has.
-  const std::optional<PropertyValue> value =
-      PropertyOf(m_state->now->machine.devices[position], property - 1);
+  const std::optional<PropertyValue> value = now.properties.Value(position, property - 1);
   if (!value) return Status::Failure(kCR_NO_SUCH_VALUE);
   const bool fits = buffer != nullptr && bytes >= value->bytes.size();
   // Type and size are told in both cases: with them the caller finds a buffer that is large enough.

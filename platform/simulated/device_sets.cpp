@@ -2,7 +2,6 @@
 #include <optional>
 
 #include "platform/simulated/class_table.h"
-#include "platform/simulated/properties.h"
 #include "platform/simulated/state.h"
 #include "platform/text.h"
 
@@ -26,14 +25,13 @@ void FillDevice(const SetContents& contents, std::size_t position, SP_DEVINFO_DA
 // The device an element stands for, as it is now. An element of another set, or of a device that
 // has gone since the set was taken, has none.
 Status FindDevice(const IndexedMachine& now, const SetContents& contents,
-                  const SP_DEVINFO_DATA& data, const Device*& device) {
+                  const SP_DEVINFO_DATA& data, MachineIndex::Position& device) {
   if (data.cbSize != sizeof(SP_DEVINFO_DATA)) return Status::Failure(kERROR_INVALID_USER_BUFFER);
   const bool isElement = data.Reserved != 0 && data.Reserved <= contents.devices.size() &&
                          contents.devices[data.Reserved - 1].number == data.DevInst;
   if (!isElement) return Status::Failure(kERROR_NO_SUCH_DEVINST);
-  const MachineIndex::Position position = now.index.DeviceByNumber(data.DevInst);
-  if (position == MachineIndex::kNone) return Status::Failure(kERROR_NO_SUCH_DEVINST);
-  device = &now.machine.devices[position];
+  device = now.index.DeviceByNumber(data.DevInst);
+  if (device == MachineIndex::kNone) return Status::Failure(kERROR_NO_SUCH_DEVINST);
   return Status::Success();
 }
 
@@ -140,11 +138,11 @@ Status SimulatedPc::GetDeviceInstanceId(DeviceSetHandle set, const SP_DEVINFO_DA
   const std::lock_guard lock(m_state->mutex);
   const auto* open = m_state->handles.Find<OpenSet>(set);
   if (open == nullptr) return Status::Failure(kERROR_INVALID_HANDLE);
-  const Device* device = nullptr;
+  MachineIndex::Position device = MachineIndex::kNone;
   if (const Status found = FindDevice(*m_state->now, *open->contents, data, device); !found) {
     return found;
   }
-  return GiveText(device->id, buffer, bufferChars, required);
+  return GiveText(m_state->now->properties.Id(device), buffer, bufferChars, required);
 }
 
 Status SimulatedPc::GetDeviceRegistryProperty(DeviceSetHandle set, const SP_DEVINFO_DATA& data,
@@ -155,11 +153,11 @@ Status SimulatedPc::GetDeviceRegistryProperty(DeviceSetHandle set, const SP_DEVI
   const auto* open = m_state->handles.Find<OpenSet>(set);
   if (open == nullptr) return Status::Failure(kERROR_INVALID_HANDLE);
   if (buffer == nullptr && bufferBytes != 0) return Status::Failure(kERROR_INVALID_PARAMETER);
-  const Device* device = nullptr;
+  MachineIndex::Position device = MachineIndex::kNone;
   if (const Status found = FindDevice(*m_state->now, *open->contents, data, device); !found) {
     return found;
   }
-  const std::optional<PropertyValue> value = PropertyOf(*device, property);
+  const std::optional<PropertyValue> value = m_state->now->properties.Value(device, property);
   if (!value) return Status::Failure(kERROR_INVALID_DATA);
   if (type != nullptr) *type = value->type;
   if (required != nullptr) *required = static_cast<std::uint32_t>(value->bytes.size());

@@ -73,6 +73,23 @@ DevInst DeviceNumbers::NumberOf(const Text& loweredId) {
   return m_numbers.try_emplace(loweredId, static_cast<DevInst>(m_numbers.size() + 1)).first->second;
 }
 
+void NameTable::Enter(std::u16string_view loweredName, std::uint32_t position) {
+  m_names.push_back({m_texts.size(), loweredName.size(), position});
+  m_texts += loweredName;
+  m_index.Add(HashOf(loweredName), static_cast<FlatIndex::Entry>(m_names.size() - 1),
+              [&](auto entry) { return TextOf(entry) == loweredName; });
+}
+
+std::uint32_t NameTable::Find(std::u16string_view loweredName) const noexcept {
+  const FlatIndex::Entry found =
+      m_index.First(HashOf(loweredName), [&](auto entry) { return TextOf(entry) == loweredName; });
+  return found == FlatIndex::kNone ? kNone : m_names[found].position;
+}
+
+std::u16string_view NameTable::TextOf(FlatIndex::Entry entry) const noexcept {
+  return std::u16string_view(m_texts).substr(m_names[entry].begin, m_names[entry].length);
+}
+
 MachineIndex::MachineIndex(const Machine& machine, DeviceNumbers& numbers) : m_machine(machine) {
   IndexDevices(numbers);
   IndexNames();
@@ -83,10 +100,11 @@ void MachineIndex::IndexDevices(DeviceNumbers& numbers) {
   m_links.resize(devices.size());
   for (Position i = 0; i < devices.size(); ++i) {
     const Text id = ToLower(devices[i].id);
-    m_devices.try_emplace(id, i);
+    m_devices.Enter(id, i);
     const DevInst number = numbers.NumberOf(id);
     m_numbers.push_back(number);
-    m_byNumber.try_emplace(number, i);
+    if (m_byNumber.size() <= number) m_byNumber.resize(number + std::size_t{1}, kNone);
+    if (m_byNumber[number] == kNone) m_byNumber[number] = i;
     m_classGuids.push_back(GuidOf(devices[i].classGuid));
 
     ClassInfo& info = m_classes[m_classGuids.back()];
@@ -96,11 +114,12 @@ void MachineIndex::IndexDevices(DeviceNumbers& numbers) {
   }
   // A parent that is not there counts as the root, as an absent one does.
   for (Position i = 0; i < devices.size(); ++i) {
+    m_links[i].showsParent = !devices[i].noParent;
     const Position parent = Device(ToLower(devices[i].parent));
     if (parent != kNone) m_links[i].parent = parent;
   }
   // Backwards, so that each list of children comes out in the order of the file.
-  for (Position i = devices.size(); i-- > 0;) {
+  for (auto i = static_cast<Position>(devices.size()); i-- > 0;) {
     const Position parent = m_links[i].parent;
     Position& first = parent == kRoot ? m_rootChild : m_links[parent].firstChild;
     m_links[i].nextSibling = std::exchange(first, i);
@@ -110,37 +129,31 @@ void MachineIndex::IndexDevices(DeviceNumbers& numbers) {
 void MachineIndex::IndexNames() {
   for (Position i = 0; i < m_machine.hostControllers.size(); ++i) {
     for (const Text& name : m_machine.hostControllers[i].names) {
-      m_controllers.try_emplace(ToLower(name), i);
+      m_controllers.Enter(ToLower(name), i);
     }
   }
-  const auto addAll = [](Names& names, const auto& records, auto name) {
-    for (Position i = 0; i < records.size(); ++i) names.try_emplace(ToLower(records[i].*name), i);
+  const auto addAll = [](NameTable& names, const auto& records, auto name) {
+    for (Position i = 0; i < records.size(); ++i) names.Enter(ToLower(records[i].*name), i);
   };
   addAll(m_hubs, m_machine.hubs, &simulated::Hub::name);
   addAll(m_interfaces, m_machine.interfaces, &simulated::Interface::path);
   addAll(m_storage, m_machine.storage, &simulated::Storage::path);
   addAll(m_volumes, m_machine.volumes, &simulated::Volume::name);
-  addAll(m_volumeDevices, m_machine.volumes, &simulated::Volume::device);
-  m_volumeDevices.erase(Text());
   for (Position i = 0; i < m_machine.volumes.size(); ++i) {
-    for (const Text& path : m_machine.volumes[i].paths) m_volumePaths.try_emplace(ToLower(path), i);
+    const simulated::Volume& volume = m_machine.volumes[i];
+    if (!volume.device.empty()) m_volumeDevices.Enter(ToLower(volume.device), i);
+    for (const Text& path : volume.paths) m_volumePaths.Enter(ToLower(path), i);
   }
   m_drives.fill(kNone);
-  for (Position i = m_machine.drives.size(); i-- > 0;) {
+  for (auto i = static_cast<Position>(m_machine.drives.size()); i-- > 0;) {
     const char16_t letter = ToLower(m_machine.drives[i].letter);
     if (letter >= u'a' && letter <= u'z') m_drives[static_cast<std::size_t>(letter - u'a')] = i;
   }
 }
 
-MachineIndex::Position MachineIndex::Find(const Names& names, const Text& name) {
-  const auto found = names.find(name);
-  return found == names.end() ? kNone : found->second;
-}
-
 MachineIndex::Position MachineIndex::DeviceByNumber(DevInst number) const {
   if (number == kRootDeviceNumber) return kRoot;
-  const auto found = m_byNumber.find(number);
-  return found == m_byNumber.end() ? kNone : found->second;
+  return number < m_byNumber.size() ? m_byNumber[number] : kNone;
 }
 
 DevInst MachineIndex::NumberOf(Position device) const {
@@ -148,7 +161,8 @@ DevInst MachineIndex::NumberOf(Position device) const {
 }
 
 MachineIndex::Position MachineIndex::Parent(Position device) const {
-  return device == kRoot ? kNone : m_links[device].parent;
+  if (device == kRoot || !m_links[device].showsParent) return kNone;
+  return m_links[device].parent;
 }
 
 MachineIndex::Position MachineIndex::FirstChild(Position device) const {

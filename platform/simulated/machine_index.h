@@ -10,6 +10,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "platform/flat_index.h"
 #include "platform/setup_api.h"
 #include "platform/simulated/machine.h"
 
@@ -57,33 +58,56 @@ struct ClassInfo {
   Text name;  // the class name of a device of the class
 };
 
+// Positions by name, in memory of its own. Where a name is entered twice, the first one counts.
+class NameTable {
+ public:
+  static constexpr std::uint32_t kNone = static_cast<std::uint32_t>(-1);
+
+  void Enter(std::u16string_view loweredName, std::uint32_t position);
+  std::uint32_t Find(std::u16string_view loweredName) const noexcept;
+
+ private:
+  struct Name {
+    std::size_t begin;  // in m_texts
+    std::size_t length;
+    std::uint32_t position;
+  };
+
+  std::u16string_view TextOf(FlatIndex::Entry entry) const noexcept;
+
+  std::vector<Name> m_names;
+  Text m_texts;
+  FlatIndex m_index;
+};
+
 // Built over one state of a machine, which must outlive it unchanged. Positions are those in the
 // machine's lists. Names are asked for in lower case. Where a program built a machine with one name
 // twice, the first one counts. Not thread-safe: the PC's lock guards it.
 class MachineIndex {
  public:
-  using Position = std::size_t;
-  static constexpr Position kNone = static_cast<Position>(-1);
+  using Position = std::uint32_t;
+  static constexpr Position kNone = NameTable::kNone;
   // Stands for the root device where a device's position is meant.
   static constexpr Position kRoot = static_cast<Position>(-2);
 
   MachineIndex(const Machine& machine, DeviceNumbers& numbers);
 
-  Position Device(const Text& id) const { return Find(m_devices, id); }
+  Position Device(const Text& id) const { return m_devices.Find(id); }
   // kRoot for the root device's number, kNone for a number without a present device.
   Position DeviceByNumber(DevInst number) const;
   DevInst NumberOf(Position device) const;
+  // kRoot for a device at the top, kNone for the root device and one that shows no parent.
   Position Parent(Position device) const;
   Position FirstChild(Position device) const;
   Position NextSibling(Position device) const;
 
-  Position Controller(const Text& name) const { return Find(m_controllers, name); }
-  Position Hub(const Text& name) const { return Find(m_hubs, name); }
-  Position Interface(const Text& path) const { return Find(m_interfaces, path); }
-  Position Storage(const Text& path) const { return Find(m_storage, path); }
-  Position Volume(const Text& name) const { return Find(m_volumes, name); }
-  Position VolumeByPath(const Text& path) const { return Find(m_volumePaths, path); }
-  Position VolumeByDevice(const Text& id) const { return Find(m_volumeDevices, id); }
+  Position Controller(const Text& name) const { return m_controllers.Find(name); }
+  Position Hub(const Text& name) const { return m_hubs.Find(name); }
+  Position Interface(const Text& path) const { return m_interfaces.Find(path); }
+  Position Storage(const Text& path) const { return m_storage.Find(path); }
+  Position Volume(const Text& name) const { return m_volumes.Find(name); }
+  Position VolumeByPath(const Text& path) const { return m_volumePaths.Find(path); }
+  Position VolumeByDevice(const Text& id) const { return m_volumeDevices.Find(id); }
   // The drive of a letter in either case.
   Position Drive(char16_t letter) const;
 
@@ -95,30 +119,29 @@ class MachineIndex {
   std::shared_ptr<const SetContents> Interfaces(const Guid* interfaceClass) const;
 
  private:
-  using Names = std::unordered_map<Text, Position>;
-  static Position Find(const Names& names, const Text& name);
   void IndexDevices(DeviceNumbers& numbers);
   void IndexNames();
 
   struct Links {
-    Position parent = kRoot;
+    Position parent = kRoot;  // of which it is a child
+    bool showsParent = true;
     Position firstChild = kNone;
     Position nextSibling = kNone;
   };
 
   const Machine& m_machine;
-  Names m_devices;
-  Names m_controllers;
-  Names m_hubs;
-  Names m_interfaces;
-  Names m_storage;
-  Names m_volumes;
-  Names m_volumePaths;
-  Names m_volumeDevices;
+  NameTable m_devices;
+  NameTable m_controllers;
+  NameTable m_hubs;
+  NameTable m_interfaces;
+  NameTable m_storage;
+  NameTable m_volumes;
+  NameTable m_volumePaths;
+  NameTable m_volumeDevices;
   std::array<Position, 26> m_drives{};
-  std::vector<DevInst> m_numbers;  // by position
-  std::unordered_map<DevInst, Position> m_byNumber;
-  std::vector<Links> m_links;  // by position
+  std::vector<DevInst> m_numbers;    // by position
+  std::vector<Position> m_byNumber;  // numbers count from one
+  std::vector<Links> m_links;        // by position
   Position m_rootChild = kNone;
   std::vector<Guid> m_classGuids;  // by position
   std::map<Guid, ClassInfo, GuidOrder> m_classes;

@@ -7,19 +7,21 @@
 #include "platform/simulated/handle_table.h"
 #include "platform/simulated/machine.h"
 #include "platform/simulated/machine_index.h"
+#include "platform/simulated/property_table.h"
 #include "platform/simulated/simulated_pc.h"
 
 namespace platform::simulated {
 
-// One state of the machine with its index, which refers to it: neither moves nor changes.
+// One state of the machine with its index and tables, which refer to it: none moves or changes.
 struct IndexedMachine {
   IndexedMachine(Machine state, DeviceNumbers& numbers)
-      : machine(std::move(state)), index(machine, numbers) {}
+      : machine(std::move(state)), index(machine, numbers), properties(machine.devices) {}
   IndexedMachine(const IndexedMachine&) = delete;
   IndexedMachine& operator=(const IndexedMachine&) = delete;
 
   const Machine machine;
   const MachineIndex index;
+  const PropertyTable properties;
 };
 
 struct SimulatedPc::State {
