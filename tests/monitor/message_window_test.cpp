@@ -32,6 +32,7 @@ struct LoopRun {
 
 TEST(MessageWindow, IsHiddenTopLevelAndHasNoSize) {
   MonitorProcess process;
+  EXPECT_EQ(StaticWndProc(0, 0x81, 0, 0), 1) << "a window that no object is making";
   const LoopRun run(process);
   const std::vector<ClassFacts> classes = process.desktop.Classes();
   ASSERT_EQ(classes.size(), 1u);

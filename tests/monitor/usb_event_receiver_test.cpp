@@ -105,7 +105,7 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
   };
   Monitor monitor;
   EXPECT_TRUE(monitor.started);
-  std::size_t threads = monitor.process.desktop.Calls(DesktopCall::StartThread);
+  std::uint64_t threads = monitor.process.desktop.Calls(DesktopCall::StartThread);
   for (const auto& test : kCases) {
     EXPECT_EQ(monitor.Send(test.event, test.broadcast), test.delays) << test.what;
     threads += test.delays.size();
@@ -275,7 +275,14 @@ TEST(UsbEventReceiver, TeardownTakesBackAllButTheWindow) {
     });
     desktop.RunFor(20);
     g_notifyLock.Unlock();
+    // A broadcast is with the receiver: it outlives it.
+    ++g_nBroadcasts;
+    process.Launch([&] {
+      desktop.Sleep(25);
+      --g_nBroadcasts;
+    });
   }
+  EXPECT_EQ(desktop.Now(), 10u + 20u + 30u);
   EXPECT_EQ(target.References(), 1);
   EXPECT_TRUE(g_pNotifyTarget == nullptr && g_pActiveReceiver == nullptr && g_pMsgWindow != nullptr);
   EXPECT_EQ(desktop.Counts().registrations, 0u);

@@ -62,7 +62,10 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
   };
 
   explicit RecordingTarget(SimulatedDesktop& desktop) : m_desktop(desktop) {}
-  ~RecordingTarget() { EXPECT_EQ(m_references, 1) << "references of others"; }
+  ~RecordingTarget() {
+    EXPECT_EQ(m_references, 1) << "references of others";
+    EXPECT_FALSE(releasedWhileNamed);
+  }
 
   std::vector<Call> Calls() const {
     const std::lock_guard lock(m_mutex);
@@ -71,13 +74,18 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
   std::int32_t References() const { return m_references; }
   // Runs inside each call.
   std::function<void()> onCall;
+  // Somebody could still have called it while it was let go.
+  std::atomic<bool> releasedWhileNamed = false;
 
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID, void** object) override {
     *object = nullptr;
     return E_NOINTERFACE;
   }
   ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
-  ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
+  ULONG STDMETHODCALLTYPE Release() override {
+    if (g_pNotifyTarget == this) releasedWhileNamed = true;
+    return static_cast<ULONG>(--m_references);
+  }
   HRESULT STDMETHODCALLTYPE NotifyDeviceChange(ULONG delay, BYTE fire) override {
     // A thread that is in it already is told so.
     const HRESULT entered = CoInitializeEx(nullptr, COINIT_MULTITHREADED);
