@@ -38,8 +38,9 @@ class CProxy_IZKUMDeviceEvent {
   ~CProxy_IZKUMDeviceEvent() = default;
 
   // The plain advise: `sink` is asked for the event interface, and what it answers is kept. `slot`
-  // is the pointer in the slot, not referenced for the caller.
-  HRESULT AdviseSink(IUnknown* sink, DWORD* pdwCookie, IUnknown*& slot) noexcept {
+  // is the pointer in the slot, not referenced for the caller. What the sink throws goes on to the
+  // caller.
+  HRESULT AdviseSink(IUnknown* sink, DWORD* pdwCookie, IUnknown*& slot) {
     ComPtr<IUnknown> callback;
     const HRESULT result = sink->QueryInterface(DIID_IZKDeviceEventCallBack, callback.PutVoid());
     if (FAILED(result)) return result == E_NOINTERFACE ? CONNECT_E_CANNOTCONNECT : result;

@@ -1,0 +1,364 @@
+// The connection point as its clients see it: codes, slots, enumerators, references.
+#include "monitor/device_event_proxy.h"
+
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+#include "monitor/event_notifier.h"
+#include "tests/support/failing_memory.h"
+#include "tests/support/notifier_scene.h"
+
+namespace KelvoUHW {
+namespace {
+
+constexpr HRESULT kNoConnection = static_cast<HRESULT>(0x80040200);
+constexpr HRESULT kAdviseLimit = static_cast<HRESULT>(0x80040201);
+constexpr HRESULT kCannotConnect = static_cast<HRESULT>(0x80040202);
+constexpr HRESULT kOtherCode = static_cast<HRESULT>(0x80070005);
+constexpr DWORD kMark = 0xA5A5A5A5;
+
+using Scene = NotifierScene;
+using DeviceEventProxy = ComObjects;
+
+TEST_F(DeviceEventProxy, PointHasItsOwnIdentityAndCountsOnTheNotifier) {
+  Scene scene;
+  IConnectionPoint* point = scene.process.point.Get();
+  const std::int32_t before = scene.NotifierReferences();
+  const auto unknown = scene.process.point.As<IUnknown>();
+  EXPECT_EQ(scene.NotifierReferences(), before + 1);
+  EXPECT_FALSE(unknown.Get() == scene.process.notifier.As<IUnknown>().Get());
+  EXPECT_TRUE(unknown.As<IConnectionPoint>().Get() == point);
+  EXPECT_EQ(point->QueryInterface(platform::IidOf<IUnknown>(), nullptr), E_POINTER);
+  for (const IID& iid : {platform::IidOf<IConnectionPointContainer>(), platform::IidOf<IZKUMEventNotifier>(),
+                         platform::IidOf<IZKUMPrivateNotifier>(), DIID_IZKDeviceEventCallBack}) {
+    void* out = Mark<void>();
+    EXPECT_EQ(point->QueryInterface(iid, &out), E_NOINTERFACE);
+    EXPECT_EQ(out, nullptr);
+  }
+  EXPECT_EQ(scene.NotifierReferences(), before + 1);
+}
+
+TEST_F(DeviceEventProxy, AnswersWhatItConnects) {
+  Scene scene;
+  IConnectionPoint* point = scene.process.point.Get();
+  const auto container = scene.Container();
+  IID iid{};
+  EXPECT_EQ(point->GetConnectionInterface(&iid), S_OK);
+  EXPECT_TRUE(iid == DIID_IZKDeviceEventCallBack);
+  EXPECT_EQ(point->GetConnectionInterface(nullptr), E_POINTER);
+
+  ComPtr<IConnectionPointContainer> owner;
+  EXPECT_EQ(point->GetConnectionPointContainer(owner.Put()), S_OK);
+  EXPECT_TRUE(owner.Get() == container.Get());
+  EXPECT_EQ(point->GetConnectionPointContainer(nullptr), E_POINTER);
+
+  EXPECT_EQ(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, nullptr), E_POINTER);
+  EXPECT_EQ(container->FindConnectionPoint(platform::IidOf<IDispatch>(), nullptr), E_POINTER);
+  for (const IID& other : {platform::IidOf<IDispatch>(), platform::IidOf<IZKUMDeviceEvent>(), IID{}}) {
+    auto* found = Mark<IConnectionPoint>();
+    EXPECT_EQ(container->FindConnectionPoint(other, &found), kNoConnection);
+    EXPECT_EQ(found, nullptr);
+  }
+  EXPECT_EQ(container->EnumConnectionPoints(nullptr), E_POINTER);
+  EXPECT_EQ(point->EnumConnections(nullptr), E_POINTER);
+
+  const auto support = scene.process.notifier.As<ISupportErrorInfo>();
+  for (const IID& other : {platform::IidOf<IUnknown>(), platform::IidOf<IConnectionPointContainer>(),
+                           platform::IidOf<IZKUMPrivateNotifier>(), platform::IidOf<IZKUMUsbTree>()}) {
+    EXPECT_EQ(support->InterfaceSupportsErrorInfo(other), S_FALSE);
+  }
+  EXPECT_EQ(support->InterfaceSupportsErrorInfo(platform::IidOf<IZKUMEventNotifier>()), S_OK);
+}
+
+// Whether a sink that could not be told is advised all the same, and what was asked of the tree.
+TEST_F(DeviceEventProxy, AdviseCodes) {
+  const struct {
+    const char* what;
+    std::function<void(Scene&)> prepare;
+    HRESULT result;
+    bool advised;
+    const char* calls;
+    const char* log;
+  } kCases[] = {
+      {"fine", [](Scene&) {}, S_OK, true, "build list0 reset", "A 0 c"},
+      {"nothing changed", [](Scene& s) { s.tree.built = S_FALSE; }, S_OK, true, "build list0 reset", "A 0 c"},
+      {"reset fails", [](Scene& s) { s.tree.reset = E_FAIL; }, S_OK, true, "build list0 reset", "A 0 c"},
+      {"sink fails", [](Scene& s) { s.a.onEvent = [] { return E_FAIL; }; }, S_OK, true, "build list0 reset", "A 0 c"},
+      {"no IUnknown", [](Scene& s) { s.a.unknownCode = E_NOINTERFACE; }, E_NOINTERFACE, false, "", ""},
+      {"no event interface", [](Scene& s) { s.a.eventCodes = {E_NOINTERFACE}; }, kCannotConnect, false, "", ""},
+      {"another code", [](Scene& s) { s.a.eventCodes = {kOtherCode}; }, kOtherCode, false, "", ""},
+      {"throws when asked", [](Scene& s) { s.a.eventCodes = {TestSink::kThrows}; }, E_FAIL, false, "", ""},
+      {"no event interface the second time",
+       [](Scene& s) {
+         s.a.eventCodes = {S_OK, E_NOINTERFACE};
+       },
+       E_NOINTERFACE, true, "", ""},
+      {"throws the second time",
+       [](Scene& s) {
+         s.a.eventCodes = {S_OK, TestSink::kThrows};
+       },
+       E_FAIL, true, "", ""},
+      {"build fails", [](Scene& s) { s.tree.built = kOtherCode; }, kOtherCode, true, "build", ""},
+      {"build fails, sink unadvised meanwhile",
+       [](Scene& s) {
+         s.tree.built = kOtherCode;
+         s.tree.onBuild = [&s] { EXPECT_EQ(s.process.point->Unadvise(1), S_OK); };
+       },
+       kOtherCode, false, "build", ""},
+      {"list fails", [](Scene& s) { s.tree.listed = kOtherCode; }, E_FAIL, true, "build list0", ""},
+      {"no list", [](Scene& s) { s.tree.withoutLists = true; }, E_FAIL, true, "build list0", ""},
+      {"unadvised meanwhile",
+       [](Scene& s) { s.tree.onBuild = [&s] { EXPECT_EQ(s.process.point->Unadvise(1), S_OK); }; }, S_OK, false,
+       "build list0 reset", ""},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    Scene scene;
+    test.prepare(scene);
+    DWORD cookie = kMark;
+    EXPECT_EQ(scene.process.point->Advise(&scene.a, &cookie), test.result);
+    EXPECT_TRUE(test.advised ? cookie == 1 : cookie == kMark || cookie == 1) << cookie;
+    EXPECT_EQ(scene.tree.calls, test.calls);
+    EXPECT_EQ(Taken(scene.log), test.log);
+    EXPECT_EQ(scene.process.point->Unadvise(1), test.advised ? S_OK : kNoConnection);
+    EXPECT_EQ(scene.a.References(), 1);
+  }
+  Scene scene;
+  DWORD cookie = kMark;
+  EXPECT_EQ(scene.process.point->Advise(nullptr, &cookie), E_POINTER);
+  EXPECT_EQ(scene.process.point->Advise(&scene.a, nullptr), E_POINTER);
+  EXPECT_EQ(scene.process.point->Advise(nullptr, nullptr), E_POINTER);
+  EXPECT_EQ(cookie, kMark);
+}
+
+TEST_F(DeviceEventProxy, AdviseWithoutMemory) {
+  // The first allocation of an advise is for the slots, when there are no free ones.
+  for (const std::size_t advised : {0u, 4u, 8u, 3u}) {
+    SCOPED_TRACE(advised);
+    Scene scene;
+    for (std::size_t i = 0; i < advised; ++i) scene.process.Advise(scene.b);
+    scene.log.clear();
+    DWORD cookie = kMark;
+    HRESULT result = S_OK;
+    {
+      const FailingAllocation failing(1);
+      result = scene.process.point->Advise(&scene.a, &cookie);
+      EXPECT_TRUE(failing.Failed());
+    }
+    EXPECT_EQ(result, advised == 3 ? E_OUTOFMEMORY : kAdviseLimit);
+    EXPECT_EQ(cookie, advised == 3 ? 4u : kMark);
+    EXPECT_EQ(scene.a.References(), advised == 3 ? 2 : 1);
+    EXPECT_EQ(Taken(scene.log), "");
+    scene.process.point->Unadvise(4);
+    scene.a.unknownCode = S_OK;
+    cookie = kMark;
+    EXPECT_EQ(scene.process.point->Advise(&scene.a, &cookie), S_OK);
+    EXPECT_EQ(Taken(scene.log), "A 0 c");
+    for (DWORD each = 1; each <= 9; ++each) scene.process.point->Unadvise(each);
+  }
+}
+
+TEST_F(DeviceEventProxy, LowestFreeSlotGivesTheCookie) {
+  Scene scene;
+  IConnectionPoint* point = scene.process.point.Get();
+  for (DWORD expected = 1; expected <= 5; ++expected) EXPECT_EQ(scene.process.Advise(scene.b), expected);
+  for (const DWORD removed : {4u, 2u}) EXPECT_EQ(point->Unadvise(removed), S_OK);
+  for (const DWORD expected : {2u, 4u, 6u, 7u, 8u, 9u}) EXPECT_EQ(scene.process.Advise(scene.a), expected);
+  const struct {
+    DWORD cookie;
+    HRESULT result;
+  } kCases[] = {{0, kNoConnection},  {10, kNoConnection},         {16, kNoConnection}, {17, kNoConnection},
+                {99, kNoConnection}, {0xFFFFFFFF, kNoConnection}, {3, S_OK},           {3, kNoConnection}};
+  for (const auto& test : kCases) EXPECT_EQ(point->Unadvise(test.cookie), test.result) << test.cookie;
+  // In the order of the slots, whatever the order in which they came.
+  scene.log.clear();
+  scene.tree.lists = {};
+  scene.tree.lists[KDeviceAttached] = {scene.tree.Device(u"d")};
+  EXPECT_EQ(scene.process.Notify(), S_OK);
+  EXPECT_EQ(Taken(scene.log), "B 1 d, A 1 d, A 1 d, B 1 d, A 1 d, A 1 d, A 1 d, A 1 d");
+  for (DWORD each = 1; each <= 9; ++each) point->Unadvise(each);
+}
+
+// What the sink answered for the event interface when it was advised is what is called, though it answers with another
+// pointer the second time.
+TEST_F(DeviceEventProxy, SlotHoldsTheFirstAnswer) {
+  Scene scene;
+  scene.a.severalFaces = true;
+  const DWORD cookie = scene.process.Advise(scene.a);
+  scene.tree.lists[KDeviceRemoved] = {scene.tree.Device(u"r")};
+  EXPECT_EQ(scene.process.Notify(), S_OK);
+  EXPECT_EQ(Taken(scene.log), "A 0 c, A 0 c, A 2 r");
+  EXPECT_EQ(scene.a.Calls(0), 3);
+  EXPECT_EQ(scene.a.Calls(1), 0);
+  EXPECT_EQ(scene.process.point->Unadvise(cookie), S_OK);
+}
+
+TEST_F(DeviceEventProxy, FiringAnswersTheLastCode) {
+  const struct {
+    const char* what;
+    HRESULT codes[3];
+    bool onlyB;
+    HRESULT result;
+    const char* log;
+  } kCases[] = {
+      {"all fine", {S_OK, S_FALSE, S_OK}, false, S_OK, "A 1 d, B 1 d, C 1 d"},
+      {"first fails", {E_FAIL, S_OK, S_OK}, false, S_OK, "A 1 d, B 1 d, C 1 d"},
+      {"last fails", {S_OK, S_OK, kOtherCode}, false, kOtherCode, "A 1 d, B 1 d, C 1 d"},
+      {"filtered", {E_FAIL, S_FALSE, E_FAIL}, true, S_FALSE, "B 1 d"},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    Scene scene;
+    TestSink* sinks[] = {&scene.a, &scene.b, &scene.c};
+    for (std::size_t i = 0; i < 3; ++i) {
+      scene.process.Advise(*sinks[i]);
+      sinks[i]->onEvent = [code = test.codes[i]] { return code; };
+    }
+    scene.log.clear();
+    ComPtr<IUnknown> b;
+    EXPECT_EQ(scene.b.QueryInterface(DIID_IZKDeviceEventCallBack, b.PutVoid()), S_OK);
+    auto* notifier = static_cast<CZKUMEventNotifier*>(scene.process.notifier.Get());
+    const auto node = Wrap(scene.tree.Device(u"d"));
+    EXPECT_EQ(notifier->Fire_OnDeviceChanged(KDeviceAttached, node.Get(), test.onlyB ? b.Get() : nullptr), test.result);
+    EXPECT_EQ(Taken(scene.log), test.log);
+    EXPECT_EQ(References(node.Get()), 1u);
+    for (DWORD each = 1; each <= 3; ++each) scene.process.point->Unadvise(each);
+    // Nobody is called: neither by an identity that stands in no slot nor by empty slots.
+    EXPECT_EQ(notifier->Fire_OnDeviceChanged(KDeviceAttached, node.Get(), nullptr), S_OK);
+    EXPECT_EQ(Taken(scene.log), "");
+  }
+}
+
+// What operations bring: n2 asks for two items, n1! for one without a place for the number; s skips, r starts again, c
+// goes on with a clone.
+template <class Item, class Enumerator, class NameOf>
+std::string Play(ComPtr<Enumerator> list, const std::string& operations, NameOf nameOf) {
+  std::string text;
+  std::istringstream words(operations);
+  for (std::string word; words >> word;) {
+    const ULONG count = word.size() > 1 ? static_cast<ULONG>(word[1] - '0') : 0;
+    text += text.empty() ? "" : " ";
+    if (word[0] == 'n') {
+      Item items[4] = {};
+      ULONG fetched = kMark;
+      const bool withNumber = word.back() != '!';
+      const HRESULT result = list->Next(count, items, withNumber ? &fetched : nullptr);
+      text += CodeName(result);
+      for (Item& item : items) text += nameOf(item);
+      if (withNumber) text += "#" + std::to_string(fetched);
+    } else if (word[0] == 'c') {
+      ComPtr<Enumerator> clone;
+      text += CodeName(list->Clone(clone.Put()));
+      list = clone;
+    } else {
+      text += CodeName(word[0] == 's' ? list->Skip(count) : list->Reset());
+    }
+  }
+  EXPECT_EQ(list->Clone(nullptr), E_POINTER);
+  EXPECT_EQ(list->Next(1, nullptr, nullptr), E_POINTER);
+  return text;
+}
+
+TEST_F(DeviceEventProxy, EnumeratesConnections) {
+  const struct {
+    const char* operations;
+    const char* outcome;
+  } kCases[] = {
+      {"n1 n1 n1", "S_OK:A1#1 S_OK:C3#1 S_FALSE#0"},
+      {"n3 n1", "S_FALSE:A1:C3#2 S_FALSE#0"},
+      {"n2 r n2", "S_OK:A1:C3#2 S_OK S_OK:A1:C3#2"},
+      {"n1! n0 n0! n2! n1", "S_OK:A1 S_OK#0 S_OK E_POINTER S_OK:C3#1"},
+      {"s1 n1 s1 s0", "S_OK S_OK:C3#1 S_FALSE S_OK"},
+      {"s3 r s2 n1", "S_FALSE S_OK S_OK S_FALSE#0"},
+      {"n1 c n2 r n1", "S_OK:A1#1 S_OK S_FALSE:C3#1 S_OK S_OK:A1#1"},
+  };
+  Scene scene;
+  for (TestSink* sink : {&scene.a, &scene.b, &scene.c}) scene.process.Advise(*sink);
+  EXPECT_EQ(scene.process.point->Unadvise(2), S_OK);
+  const auto nameOf = [&](CONNECTDATA& item) -> std::string {
+    if (item.pUnk == nullptr) return "";
+    const auto sink = ComPtr<IUnknown>::Attach(item.pUnk).As<IUnknown>();
+    return (sink.Get() == &scene.a ? ":A" : sink.Get() == &scene.c ? ":C" : ":?") + std::to_string(item.dwCookie);
+  };
+  for (const auto& test : kCases) {
+    ComPtr<IEnumConnections> list;
+    ASSERT_EQ(scene.process.point->EnumConnections(list.Put()), S_OK);
+    EXPECT_EQ(Play<CONNECTDATA>(list, test.operations, nameOf), test.outcome) << test.operations;
+  }
+  EXPECT_TRUE(scene.a.References() == 2 && scene.c.References() == 2) << "all but those of the slots given back";
+  // A list is what was advised when it was made.
+  ComPtr<IEnumConnections> list;
+  ASSERT_EQ(scene.process.point->EnumConnections(list.Put()), S_OK);
+  for (const DWORD cookie : {1u, 3u}) EXPECT_EQ(scene.process.point->Unadvise(cookie), S_OK);
+  EXPECT_EQ(scene.a.References(), 2);
+  EXPECT_EQ(Play<CONNECTDATA>(list, "n2", nameOf), "S_OK:A1:C3#2");
+  ASSERT_EQ(scene.process.point->EnumConnections(list.Put()), S_OK);
+  EXPECT_EQ(Play<CONNECTDATA>(list, "n1", nameOf), "S_FALSE#0");
+}
+
+TEST_F(DeviceEventProxy, EnumeratesTheOnePoint) {
+  Scene scene;
+  const std::int32_t before = scene.NotifierReferences();
+  const auto nameOf = [&](IConnectionPoint* item) -> std::string {
+    const auto point = ComPtr<IConnectionPoint>::Attach(item);
+    return !point ? "" : point.Get() == scene.process.point.Get() ? ":point" : ":?";
+  };
+  for (const auto& [operations, outcome] : {std::pair{"n1 n1", "S_OK:point#1 S_FALSE#0"},
+                                            {"n2 r n1!", "S_FALSE:point#1 S_OK S_OK:point"},
+                                            {"s1 c n1 r c n1", "S_OK S_OK S_FALSE#0 S_OK S_OK S_OK:point#1"}}) {
+    ComPtr<IEnumConnectionPoints> list;
+    ASSERT_EQ(scene.Container()->EnumConnectionPoints(list.Put()), S_OK);
+    EXPECT_EQ(Play<IConnectionPoint*>(list, operations, nameOf), outcome) << operations;
+  }
+  EXPECT_EQ(scene.NotifierReferences(), before);
+}
+
+TEST_F(DeviceEventProxy, EnumeratorsWithoutMemory) {
+  Scene scene;
+  scene.process.Advise(scene.a);
+  const auto container = scene.Container();
+  const auto failsCleanly = [](const char* what, auto make) {
+    int failures = 0;
+    for (std::uint64_t nth = 1; nth < 50; ++nth) {
+      auto* out = Mark<IUnknown>();
+      const FailingAllocation failing(nth);
+      const HRESULT result = make(reinterpret_cast<void**>(&out));
+      if (!failing.Failed()) {
+        EXPECT_EQ(result, S_OK) << what;
+        out->Release();
+        break;
+      }
+      ++failures;
+      EXPECT_TRUE(result == E_OUTOFMEMORY && out == nullptr) << what << nth << CodeName(result);
+    }
+    EXPECT_GE(failures, 3) << what;
+  };
+  failsCleanly("connections", [&](void** out) {
+    return scene.process.point->EnumConnections(reinterpret_cast<IEnumConnections**>(out));
+  });
+  failsCleanly("points", [&](void** out) {
+    return container->EnumConnectionPoints(reinterpret_cast<IEnumConnectionPoints**>(out));
+  });
+  EXPECT_EQ(scene.a.References(), 2);
+  EXPECT_EQ(scene.process.point->Unadvise(1), S_OK);
+}
+
+// The module's end frees the slots and leaves the sinks alone: their code may be gone already. It is meant so.
+TEST_F(DeviceEventProxy, SinksLeftBehindAreNotReleased) {
+  TestSink::Log log;
+  ScriptedTree tree;
+  ScriptedTreeClass treeClass(tree);
+  TestSink sink(log, "A");
+  {
+    NotifierProcess process;
+    process.UseTreeClass(&treeClass);
+    process.Start();
+    process.Advise(sink);
+  }
+  EXPECT_EQ(sink.References(), 2);
+  sink.Release();
+}
+
+}  // namespace
+}  // namespace KelvoUHW
