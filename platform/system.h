@@ -21,12 +21,12 @@ struct System {
   ModuleEnvironment* environment = nullptr;
 };
 
-// On Windows the system itself; elsewhere the one that was set last, all null before. Callable from
-// every thread.
+// The one that was set last; where none is set, on Windows the system itself, elsewhere all null.
+// Callable from every thread.
 System CurrentSystem() noexcept;
 
-// Elsewhere than on Windows: what runs behind the seam from now on. Set before the component is
-// used and reset after it, when no thread of the component runs.
+// What runs behind the seam from now on; all null resets it. Set before the component is used and
+// reset after it, when no thread of the component runs.
 void SetCurrentSystem(const System& system) noexcept;
 
 }  // namespace platform

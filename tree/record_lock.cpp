@@ -1,7 +1,8 @@
 #include "tree/record_lock.h"
 
 #include <mutex>
-#include <shared_mutex>
+
+#include "platform/process_lock.h"
 
 namespace KelvoUHW {
 
@@ -9,8 +10,8 @@ namespace {
 
 // The gate is passed by everybody and kept by a writer until it is in: the shared lock alone lets
 // readers overtake a waiting writer for ever.
-constinit std::mutex g_gate;
-std::shared_mutex g_records;
+constinit platform::ProcessLock g_gate;
+platform::ProcessSharedLock g_records;
 thread_local bool t_holds = false;
 
 bool TakeForReading() noexcept {
