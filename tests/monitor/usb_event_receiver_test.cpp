@@ -182,6 +182,18 @@ TEST(UsbEventReceiver, StartFailsWithoutThreadOrWindow) {
     process.desktop.Settle();
     EXPECT_THAT(target.Calls(), ElementsAre(RecordingTarget::Call{100, 0, TRUE, true}));
   }
+  // The handle is there from the window's first message on, while the window is still being made.
+  {
+    MonitorProcess process;
+    process.desktop.SetDefaultProcedure([&](const platform::MSG& message) -> platform::LResult {
+      if (message.message == 0x81) process.desktop.Sleep(100);
+      return 1;
+    });
+    CZKUMUsbEventReceiver receiver;
+    EXPECT_TRUE(receiver.Start(nullptr));
+    EXPECT_EQ(process.desktop.Now(), 10u);
+    process.desktop.RunFor(200);
+  }
   // The object is late, too: looked for every ten milliseconds. And a module that cannot be pinned
   // is locked for good.
   const std::int32_t locks = ModuleLockCount();

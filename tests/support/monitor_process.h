@@ -113,6 +113,7 @@ inline DeviceBroadcast NamedBroadcast(std::uint32_t event, std::uint32_t type, c
                                       std::size_t bytes = 0) {
   DeviceBroadcast broadcast = platform::simulated::InterfaceBroadcast(event, {}, name);
   if (bytes != 0) broadcast.record.resize(bytes);
+  broadcast.record.shrink_to_fit();  // so that reading behind it is found out
   const auto size = static_cast<std::uint32_t>(broadcast.record.size());
   std::memcpy(broadcast.record.data(), &size, sizeof size);
   if (broadcast.record.size() >= 8) std::memcpy(broadcast.record.data() + 4, &type, sizeof type);
