@@ -61,7 +61,7 @@ build() {
 
 run_tests() {
   local log=build/$1-test.log passed failed started=$SECONDS
-  timeout 900 ctest --preset "$1" -V >"$log" 2>&1 || true
+  timeout 900 ctest --preset "$1" -V -j"$(nproc)" >"$log" 2>&1 || true
   read -r passed failed < <(count_tests "$log")
   if [ "$((passed + failed))" -eq 0 ]; then failed=1; fi
   if [ "$failed" -ne 0 ]; then
