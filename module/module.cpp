@@ -23,6 +23,9 @@ constinit std::atomic<CZKUsbMonitorModule*> g_pModule = nullptr;
 using TreeClass = CComSingletonExClassFactory<CZKUMUsbTree, IUnknown>;
 using NotifierClass = CComSingletonExClassFactory<CZKUMEventNotifier, IUnknown>;
 
+constexpr platform::Guid kAppId{
+    0xA0C53575, 0x7F3D, 0x4FF2, {0xB5, 0xA7, 0xBF, 0xA8, 0x73, 0x49, 0x25, 0x10}};
+
 constexpr CLSID kStdGlobalInterfaceTable{0x00000323, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
 constexpr IID kIGlobalInterfaceTable{0x00000146, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
 
@@ -48,12 +51,17 @@ void DeleteLock() noexcept {
   if (ClassFactory::State::s_pInstance == nullptr) ClassFactory::State::Delete();
 }
 
-// E_UNEXPECTED where the system has nothing to register with.
-template <class Work>
-HRESULT WithRegistrationSystem(Work work) noexcept {
+// Registers the module or takes that back. E_UNEXPECTED where the system has nothing to register
+// with.
+HRESULT Register(CZKUsbMonitorModule& module, decltype(RegisterServer)& work) noexcept {
   const platform::System system = platform::CurrentSystem();
   if (!system.registry || !system.typeLibraries || !system.environment) return E_UNEXPECTED;
-  return work(RegistrationSystem{*system.registry, *system.typeLibraries, *system.environment});
+  return Guarded([&] {
+    std::vector<Replacement> common;
+    module.AddCommonRGSReplacements(common);
+    return work(ModuleDescription(), common,
+                {*system.registry, *system.typeLibraries, *system.environment});
+  });
 }
 
 }  // namespace
@@ -63,6 +71,10 @@ CZKUsbMonitorModule* CurrentModule() noexcept { return g_pModule; }
 CZKUsbMonitorModule::CZKUsbMonitorModule() noexcept {
   m_initialized = SUCCEEDED(m_section.Initialize()) && SUCCEEDED(TreeClass::State::Initialize()) &&
                   SUCCEEDED(NotifierClass::State::Initialize());
+  if (!m_initialized) {
+    TreeClass::State::Delete();
+    NotifierClass::State::Delete();
+  }
   g_pModule = this;
 }
 
@@ -78,6 +90,7 @@ LONG CZKUsbMonitorModule::GetLockCount() noexcept { return ModuleLockCount(); }
 HRESULT CZKUsbMonitorModule::GetGlobalInterfaceTable(IUnknown** out) noexcept {
   if (out == nullptr) return E_POINTER;
   *out = nullptr;
+  if (!m_initialized) return E_UNEXPECTED;
   const std::lock_guard lock(m_section);
   if (!m_globalInterfaceTable) {
     const HRESULT result =
@@ -90,7 +103,7 @@ HRESULT CZKUsbMonitorModule::GetGlobalInterfaceTable(IUnknown** out) noexcept {
 }
 
 void CZKUsbMonitorModule::AddCommonRGSReplacements(std::vector<Replacement>& replacements) {
-  replacements.push_back({u"APPID", platform::GuidText(ModuleDescription().appId)});
+  replacements.push_back({u"APPID", platform::GuidText(kAppId)});
 }
 
 HRESULT CZKUsbMonitorModule::CanUnloadNow() noexcept {
@@ -120,15 +133,11 @@ HRESULT CZKUsbMonitorModule::GetClassObject(REFCLSID clsid, REFIID iid, void** o
 }
 
 HRESULT CZKUsbMonitorModule::RegisterServer() noexcept {
-  return WithRegistrationSystem([&](const RegistrationSystem& system) {
-    return KelvoUHW::RegisterServer(ModuleDescription(), system);
-  });
+  return Register(*this, KelvoUHW::RegisterServer);
 }
 
 HRESULT CZKUsbMonitorModule::UnregisterServer() noexcept {
-  return WithRegistrationSystem([&](const RegistrationSystem& system) {
-    return KelvoUHW::UnregisterServer(ModuleDescription(), system);
-  });
+  return Register(*this, KelvoUHW::UnregisterServer);
 }
 
 void CZKUsbMonitorModule::Unload() noexcept {

@@ -70,34 +70,37 @@ HRESULT ReadModulePath(platform::ModuleEnvironment& environment, std::u16string&
   return HRESULT_FROM_WIN32(platform::kERROR_INSUFFICIENT_BUFFER);
 }
 
-// The replacements that every script gets. The quotes are doubled because a script sets the path
-// into quotes of its own; in the registry it stands as it is.
-std::vector<Replacement> CommonReplacements(const ServerDescription& server,
-                                            std::u16string_view modulePath) {
+// What is registered, and what every script of it is given.
+struct Server {
+  const ServerDescription& description;
+  const std::vector<Replacement>& replacements;
+};
+
+// The path in quotes of a script's own: its quotes are doubled there and stand once in the
+// registry.
+Replacement ModuleReplacement(std::u16string_view modulePath) {
   std::u16string quoted;
   for (const char16_t unit : modulePath) quoted.append(unit == u'\'' ? 2 : 1, unit);
-  return {{u"MODULE", std::move(quoted)}, {u"APPID", GuidText(server.appId)}};
+  return {u"MODULE", std::move(quoted)};
 }
 
 using RunScript = decltype(RegisterScript);
 
-HRESULT RunModuleScript(RunScript& run, const ServerDescription& server,
-                        const RegistrationSystem& system, std::u16string_view modulePath) {
-  return run(system.registry, FromUtf8(server.script), CommonReplacements(server, modulePath));
+HRESULT RunModuleScript(RunScript& run, const Server& server, platform::Registry& registry) {
+  return run(registry, FromUtf8(server.description.script), server.replacements);
 }
 
 // The scripts of all classes, up to the first that fails.
-HRESULT RunClassScripts(RunScript& run, const ServerDescription& server,
-                        const RegistrationSystem& system, std::u16string_view modulePath) {
-  for (const RegisteredClass& entry : server.classes) {
-    std::vector<Replacement> replacements = CommonReplacements(server, modulePath);
+HRESULT RunClassScripts(RunScript& run, const Server& server, platform::Registry& registry) {
+  for (const RegisteredClass& entry : server.description.classes) {
+    std::vector<Replacement> replacements = server.replacements;
     replacements.push_back({u"PROGID", std::u16string(entry.progId)});
     replacements.push_back({u"VERSION", std::u16string(entry.version)});
     replacements.push_back({u"DESCRIPTION", std::u16string(entry.description)});
     replacements.push_back({u"CLSID", GuidText(entry.clsid)});
-    replacements.push_back({u"LIBID", GuidText(server.libId)});
+    replacements.push_back({u"LIBID", GuidText(server.description.libId)});
     replacements.push_back({u"THREADING", std::u16string(entry.threading)});
-    const HRESULT result = run(system.registry, FromUtf8(entry.script), replacements);
+    const HRESULT result = run(registry, FromUtf8(entry.script), replacements);
     if (FAILED(result)) return result;
   }
   return S_OK;
@@ -159,35 +162,43 @@ HRESULT UnregisterLibrary(const RegistrationSystem& system, const std::u16string
                                                 attributes.syskind);
 }
 
-// Runs `work` with the module's path under the system's locale.
+// Runs `work` with what the scripts are given and the module's path, under the system's locale.
 template <class Work>
-HRESULT UnderSystemLocale(const RegistrationSystem& system, Work work) noexcept {
+HRESULT UnderSystemLocale(const ServerDescription& description,
+                          const std::vector<Replacement>& common, const RegistrationSystem& system,
+                          Work work) noexcept {
   const SystemLocale locale(system.environment);
   return Guarded([&] {
     std::u16string modulePath;
     HRESULT result = ReadModulePath(system.environment, modulePath);
-    if (SUCCEEDED(result)) result = work(modulePath);
+    if (FAILED(result)) return result;
+    std::vector<Replacement> replacements = common;
+    replacements.push_back(ModuleReplacement(modulePath));
+    result = work(Server{description, replacements}, modulePath);
     return FAILED(result) ? result : S_OK;
   });
 }
 
 }  // namespace
 
-HRESULT RegisterServer(const ServerDescription& server, const RegistrationSystem& system) noexcept {
-  return UnderSystemLocale(system, [&](const std::u16string& modulePath) {
-    HRESULT result = RunModuleScript(RegisterScript, server, system, modulePath);
-    if (SUCCEEDED(result)) result = RunClassScripts(RegisterScript, server, system, modulePath);
+HRESULT RegisterServer(const ServerDescription& server, const std::vector<Replacement>& common,
+                       const RegistrationSystem& system) noexcept {
+  const auto work = [&](const Server& registered, const std::u16string& modulePath) {
+    HRESULT result = RunModuleScript(RegisterScript, registered, system.registry);
+    if (SUCCEEDED(result)) result = RunClassScripts(RegisterScript, registered, system.registry);
     return FAILED(result) ? result : RegisterLibrary(system, modulePath);
-  });
+  };
+  return UnderSystemLocale(server, common, system, work);
 }
 
-HRESULT UnregisterServer(const ServerDescription& server,
+HRESULT UnregisterServer(const ServerDescription& server, const std::vector<Replacement>& common,
                          const RegistrationSystem& system) noexcept {
-  return UnderSystemLocale(system, [&](const std::u16string& modulePath) {
-    HRESULT result = RunClassScripts(UnregisterScript, server, system, modulePath);
+  const auto work = [&](const Server& registered, const std::u16string& modulePath) {
+    HRESULT result = RunClassScripts(UnregisterScript, registered, system.registry);
     if (SUCCEEDED(result)) result = UnregisterLibrary(system, modulePath);
-    return FAILED(result) ? result : RunModuleScript(UnregisterScript, server, system, modulePath);
-  });
+    return FAILED(result) ? result : RunModuleScript(UnregisterScript, registered, system.registry);
+  };
+  return UnderSystemLocale(server, common, system, work);
 }
 
 }  // namespace KelvoUHW

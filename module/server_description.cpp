@@ -6,15 +6,9 @@
 #include "module/scripts.h"
 
 namespace KelvoUHW {
-namespace {
-
-using platform::FromSystemGuid;
-
-constexpr platform::Guid kAppId{
-    0xA0C53575, 0x7F3D, 0x4FF2, {0xB5, 0xA7, 0xBF, 0xA8, 0x73, 0x49, 0x25, 0x10}};
-}  // namespace
 
 const ServerDescription& ModuleDescription() noexcept {
+  using platform::FromSystemGuid;
   // The tree is registered as "ZKUMUsbTree Class" although the type library calls the same class
   // "USB Tree". Both are published and meant.
   static const std::array kClasses = {
@@ -24,7 +18,7 @@ const ServerDescription& ModuleDescription() noexcept {
                       RegistryScript(ScriptResource::EventNotifier),
                       u"KelvoUsbMonitor.EventNotifier", u"1", u"ZKUMEventNotifier Class", u"Free"},
   };
-  static const ServerDescription kDescription{kAppId, FromSystemGuid(LIBID_ZKUsbMonitorLib),
+  static const ServerDescription kDescription{FromSystemGuid(LIBID_ZKUsbMonitorLib),
                                               RegistryScript(ScriptResource::Module), kClasses};
   return kDescription;
 }

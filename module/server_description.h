@@ -20,7 +20,6 @@ struct RegisteredClass {
 };
 
 struct ServerDescription {
-  platform::Guid appId;
   platform::Guid libId;
   std::string_view script;                   // of the module itself, UTF-8
   std::span<const RegisteredClass> classes;  // in the order in which they are registered

@@ -5,6 +5,7 @@
 #include <fstream>
 #include <iterator>
 
+#include "module/module.h"
 #include "module/scripts.h"
 #include "module/type_library.h"
 #include "platform/simulated/module_environment.h"
@@ -27,6 +28,12 @@ using testing_support::LinesOf;
 using testing_support::Put;
 
 const std::u16string kModule = u"C:\\It's 100%APPID% {x}\\ZKUsbMonitor.DLL";
+// What the module gives every script.
+std::vector<Replacement> Common() {
+  std::vector<Replacement> common;
+  CZKUsbMonitorModule().AddCommonRGSReplacements(common);
+  return common;
+}
 const HRESULT kTooLong = static_cast<HRESULT>(0x8007007A);
 
 // A system with the module in a file that carries its type library, behind a registry that can fail.
@@ -37,10 +44,10 @@ struct Pc {
     libraries.Add(libraryFile, library);
   }
   HRESULT Register(const ServerDescription& server = ModuleDescription()) {
-    return Checked(RegisterServer(server, {failing, libraries, environment}));
+    return Checked(RegisterServer(server, Common(), {failing, libraries, environment}));
   }
   HRESULT Unregister(const ServerDescription& server = ModuleDescription()) {
-    return Checked(UnregisterServer(server, {failing, libraries, environment}));
+    return Checked(UnregisterServer(server, Common(), {failing, libraries, environment}));
   }
   // Whatever happened, nothing stays open and the thread has its locale again.
   HRESULT Checked(HRESULT result) {
@@ -388,8 +395,8 @@ TEST(Registration, GivesTheCodeOfWhateverFails) {
       {"the path", with(&Recorder::fileName, platform::Status::Failure(2)), good, HRESULT_FROM_WIN32(2),
        HRESULT_FROM_WIN32(2)},
       {"the path, for no reason", with(&Recorder::fileName, platform::Status::Failure(0)), good, E_FAIL, E_FAIL},
-      {"the module's script", {}, {{}, {}, "HKCR {", {}}, DISP_E_EXCEPTION, DISP_E_EXCEPTION},
-      {"a class's script", {}, {{}, {}, "", {&odd, 1}}, DISP_E_EXCEPTION, DISP_E_EXCEPTION},
+      {"the module's script", {}, {{}, "HKCR {", {}}, DISP_E_EXCEPTION, DISP_E_EXCEPTION},
+      {"a class's script", {}, {{}, "", {&odd, 1}}, DISP_E_EXCEPTION, DISP_E_EXCEPTION},
       {"the attributes", with(&Recorder::attributesResult, E_ABORT), good, S_OK, E_ABORT},
       {"the help file", with(&Recorder::helpResult, E_ABORT), good, E_ABORT, S_OK},
       {"the type library", with(&Recorder::registerResult, E_ABORT), good, E_ABORT, E_ABORT},
@@ -397,8 +404,8 @@ TEST(Registration, GivesTheCodeOfWhateverFails) {
   for (const auto& test : kCases) {
     SCOPED_TRACE(test.what);
     Recorder system = test.system;
-    EXPECT_EQ(RegisterServer(test.server, {system, system, system}), test.onRegister);
-    EXPECT_EQ(UnregisterServer(test.server, {system, system, system}), test.onUnregister);
+    EXPECT_EQ(RegisterServer(test.server, Common(), {system, system, system}), test.onRegister);
+    EXPECT_EQ(UnregisterServer(test.server, Common(), {system, system, system}), test.onUnregister);
     EXPECT_EQ(system.locale, 0x411u);
     EXPECT_EQ(system.open, 0);
     EXPECT_EQ(system.loaded, 0);
@@ -407,6 +414,7 @@ TEST(Registration, GivesTheCodeOfWhateverFails) {
 
 TEST(Registration, RunsOutOfMemoryAnywhere) {
   const ServerDescription& server = ModuleDescription();
+  const std::vector<Replacement> common = Common();
   for (const auto run : {&RegisterServer, &UnregisterServer}) {
     std::uint64_t allocation = 0;
     for (bool failed = true; failed;) {
@@ -414,7 +422,7 @@ TEST(Registration, RunsOutOfMemoryAnywhere) {
       HRESULT result = S_OK;
       {
         const FailingAllocation failing(++allocation);
-        result = run(server, {system, system, system});
+        result = run(server, common, {system, system, system});
         failed = failing.Failed();
       }
       EXPECT_EQ(result, failed ? E_OUTOFMEMORY : S_OK) << allocation;
