@@ -1,8 +1,8 @@
 #include <dlfcn.h>
 
 #include <algorithm>
-#include <array>
 #include <map>
+#include <memory>
 #include <mutex>
 #include <string>
 #include <vector>
@@ -18,11 +18,37 @@ namespace {
 using GetClassObjectFunction = HRESULT (*)(REFCLSID, REFIID, void**);
 using CanUnloadNowFunction = HRESULT (*)();
 
-struct Library {
-  void* handle = nullptr;
-  GetClassObjectFunction getClassObject = nullptr;
-  CanUnloadNowFunction canUnloadNow = nullptr;
+// A loaded server, until the last owner lets go. A call into it owns it for as long as it lasts.
+class Library {
+ public:
+  explicit Library(const std::u16string& path)
+      : m_handle(dlopen(platform::ToUtf8(path).c_str(), RTLD_NOW | RTLD_LOCAL)) {
+    if (m_handle == nullptr) return;
+    m_getClassObject =
+        reinterpret_cast<GetClassObjectFunction>(dlsym(m_handle, "DllGetClassObject"));
+    m_canUnloadNow = reinterpret_cast<CanUnloadNowFunction>(dlsym(m_handle, "DllCanUnloadNow"));
+  }
+  ~Library() {
+    if (m_handle != nullptr) dlclose(m_handle);
+  }
+  Library(const Library&) = delete;
+  Library& operator=(const Library&) = delete;
+
+  HRESULT Usable() const noexcept {
+    if (m_handle == nullptr) return CO_E_DLLNOTFOUND;
+    return m_getClassObject == nullptr ? CO_E_ERRORINDLL : S_OK;
+  }
+  HRESULT GetClassObject(REFCLSID clsid, REFIID iid, void** out) const {
+    return m_getClassObject(clsid, iid, out);
+  }
+  bool CanUnload() const { return m_canUnloadNow != nullptr && m_canUnloadNow() == S_OK; }
+
+ private:
+  void* const m_handle;
+  GetClassObjectFunction m_getClassObject = nullptr;
+  CanUnloadNowFunction m_canUnloadNow = nullptr;
 };
+using LibraryPtr = std::shared_ptr<const Library>;
 
 struct RegisteredClassObject {
   CLSID clsid;
@@ -30,14 +56,22 @@ struct RegisteredClassObject {
   DWORD cookie;
 };
 
-std::mutex g_mutex;
-std::map<std::u16string, Library> g_libraries;  // by path
-std::vector<RegisteredClassObject> g_registered;
-DWORD g_lastCookie = 0;
+struct Classes {
+  std::mutex mutex;
+  std::map<std::u16string, LibraryPtr> libraries;  // by path
+  std::vector<RegisteredClassObject> registered;
+  DWORD lastCookie = 0;
+};
+
+// Never destroyed: threads go on asking for classes while the process ends.
+Classes& Known() {
+  static Classes& known = *std::make_unique<Classes>().release();
+  return known;
+}
 
 IUnknown* FindRegistered(REFCLSID clsid) {
-  const std::lock_guard lock(g_mutex);
-  for (const RegisteredClassObject& entry : g_registered) {
+  const std::lock_guard lock(Known().mutex);
+  for (const RegisteredClassObject& entry : Known().registered) {
     if (entry.clsid != clsid) continue;
     entry.object->AddRef();
     return entry.object;
@@ -45,24 +79,20 @@ IUnknown* FindRegistered(REFCLSID clsid) {
   return nullptr;
 }
 
-// Loaded once and kept until CoFreeUnusedLibraries.
-HRESULT LoadServer(const std::u16string& path, Library& library) {
-  const std::lock_guard lock(g_mutex);
-  if (const auto known = g_libraries.find(path); known != g_libraries.end()) {
-    library = known->second;
-    return S_OK;
+// Loaded once and kept until CoFreeUnusedLibraries. Loading runs code of the library, which may ask
+// for classes itself, so the lock is not held meanwhile.
+HRESULT LoadServer(const std::u16string& path, LibraryPtr& library) {
+  {
+    const std::lock_guard lock(Known().mutex);
+    if (const auto known = Known().libraries.find(path); known != Known().libraries.end()) {
+      library = known->second;
+      return S_OK;
+    }
   }
-  library.handle = dlopen(platform::ToUtf8(path).c_str(), RTLD_NOW | RTLD_LOCAL);
-  if (library.handle == nullptr) return CO_E_DLLNOTFOUND;
-  library.getClassObject =
-      reinterpret_cast<GetClassObjectFunction>(dlsym(library.handle, "DllGetClassObject"));
-  library.canUnloadNow =
-      reinterpret_cast<CanUnloadNowFunction>(dlsym(library.handle, "DllCanUnloadNow"));
-  if (library.getClassObject == nullptr) {
-    dlclose(library.handle);
-    return CO_E_ERRORINDLL;
-  }
-  g_libraries.emplace(path, library);
+  library = std::make_shared<const Library>(path);
+  if (const HRESULT usable = library->Usable(); FAILED(usable)) return usable;
+  const std::lock_guard lock(Known().mutex);
+  Known().libraries.emplace(path, library);
   return S_OK;
 }
 
@@ -100,9 +130,9 @@ HRESULT CoGetClassObject(REFCLSID clsid, DWORD, void*, REFIID iid, void** out) n
     key.append(platform::GuidText(clsid)).append(u"\\InprocServer32");
     const std::u16string path = ReadDefault(key);
     if (path.empty()) return REGDB_E_CLASSNOTREG;
-    Library library;
+    LibraryPtr library;
     const HRESULT loaded = LoadServer(path, library);
-    return FAILED(loaded) ? loaded : library.getClassObject(clsid, iid, out);
+    return FAILED(loaded) ? loaded : library->GetClassObject(clsid, iid, out);
   });
 }
 
@@ -123,9 +153,9 @@ HRESULT CoRegisterClassObject(REFCLSID clsid, IUnknown* classObject, DWORD, DWOR
                               DWORD* cookie) noexcept {
   if (classObject == nullptr || cookie == nullptr) return E_INVALIDARG;
   return Guarded([&] {
-    const std::lock_guard lock(g_mutex);
-    g_registered.push_back({clsid, classObject, g_lastCookie + 1});
-    *cookie = ++g_lastCookie;
+    const std::lock_guard lock(Known().mutex);
+    Known().registered.push_back({clsid, classObject, Known().lastCookie + 1});
+    *cookie = ++Known().lastCookie;
     classObject->AddRef();
     return S_OK;
   });
@@ -134,28 +164,27 @@ HRESULT CoRegisterClassObject(REFCLSID clsid, IUnknown* classObject, DWORD, DWOR
 HRESULT CoRevokeClassObject(DWORD cookie) noexcept {
   IUnknown* revoked = nullptr;
   {
-    const std::lock_guard lock(g_mutex);
+    std::vector<RegisteredClassObject>& registered = Known().registered;
+    const std::lock_guard lock(Known().mutex);
     const auto entry =
-        std::find_if(g_registered.begin(), g_registered.end(),
+        std::find_if(registered.begin(), registered.end(),
                      [&](const RegisteredClassObject& each) { return each.cookie == cookie; });
-    if (entry == g_registered.end()) return E_INVALIDARG;
+    if (entry == registered.end()) return E_INVALIDARG;
     revoked = entry->object;
-    g_registered.erase(entry);
+    registered.erase(entry);
   }
   revoked->Release();
   return S_OK;
 }
 
 void CoFreeUnusedLibraries() noexcept {
-  const std::lock_guard lock(g_mutex);
-  for (auto library = g_libraries.begin(); library != g_libraries.end();) {
-    const CanUnloadNowFunction canUnloadNow = library->second.canUnloadNow;
-    if (canUnloadNow == nullptr || canUnloadNow() != S_OK) {
-      ++library;
-      continue;
-    }
-    dlclose(library->second.handle);
-    library = g_libraries.erase(library);
+  // Unloaded when the lock is free again: that, too, runs code of theirs.
+  std::map<std::u16string, LibraryPtr> unused;
+  const std::lock_guard lock(Known().mutex);
+  for (auto next = Known().libraries.begin(); next != Known().libraries.end();) {
+    const auto library = next++;
+    const bool inCall = library->second.use_count() != 1;
+    if (!inCall && library->second->CanUnload()) unused.insert(Known().libraries.extract(library));
   }
 }
 
