@@ -16,6 +16,9 @@ bool ProcessEnds() noexcept;
 namespace native {
 // Called when a system is set, which a program does once it runs.
 void WatchForProcessEnd() noexcept;
+// The library that holds `address` stays mapped until the process ends, whoever closes it. Nothing
+// happens for an address in the program itself, which stays anyway.
+void KeepMapped(const void* address) noexcept;
 }  // namespace native
 #endif
 

@@ -1,5 +1,7 @@
 #include "platform/process_end.h"
 
+#include <dlfcn.h>
+
 #include <atomic>
 #include <cstdlib>
 
@@ -19,6 +21,15 @@ namespace native {
 void WatchForProcessEnd() noexcept {
   static const int s_registered = std::atexit([] { g_processEnds = true; });
   static_cast<void>(s_registered);
+}
+
+void KeepMapped(const void* address) noexcept {
+  Dl_info library{};
+  if (dladdr(address, &library) == 0) return;
+  // Opened once more, it is marked, and its count may go down again.
+  if (void* handle = dlopen(library.dli_fname, RTLD_NOW | RTLD_NOLOAD | RTLD_NODELETE)) {
+    dlclose(handle);
+  }
 }
 }  // namespace native
 

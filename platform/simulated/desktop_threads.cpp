@@ -2,6 +2,7 @@
 #include <new>
 #include <utility>
 
+#include "platform/process_end.h"
 #include "platform/simulated/desktop_state.h"
 
 namespace platform::simulated {
@@ -78,9 +79,17 @@ void SimulatedDesktop::ExitProcess(std::uint32_t code) {
 }
 
 Status SimulatedDesktop::PinModule(const void* address) noexcept {
-  auto lock = m_state->Guard();
-  if (const Status ordered = m_state->Begin(lock, DesktopCall::PinModule); !ordered) return ordered;
-  m_state->pins.push_back(address);
+  {
+    auto lock = m_state->Guard();
+    const Status ordered = m_state->Begin(lock, DesktopCall::PinModule);
+    if (!ordered) return ordered;
+    m_state->pins.push_back(address);
+  }
+#ifndef _WIN32
+  // In earnest: the code of a loaded module runs on the threads of this process. Without the lock,
+  // which a module may want that is being unloaded.
+  native::KeepMapped(address);
+#endif
   return Status::Success();
 }
 
