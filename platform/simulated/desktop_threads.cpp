@@ -2,8 +2,10 @@
 #include <new>
 #include <utility>
 
-#include "platform/process_end.h"
 #include "platform/simulated/desktop_state.h"
+#ifndef _WIN32
+#include "platform/process_end.h"
+#endif
 
 namespace platform::simulated {
 namespace {
