@@ -1,0 +1,466 @@
+// The class objects, the shared instances behind them, and the module's lock count and end.
+#include <gmock/gmock.h>
+
+#include <array>
+#include <atomic>
+#include <barrier>
+#include <bit>
+#include <chrono>
+#include <functional>
+#include <iostream>
+#include <mutex>
+#include <thread>
+#include <vector>
+
+#include "tests/support/com_objects.h"
+#include "tests/support/counting_sink.h"
+#include "tests/support/failing_memory.h"
+#include "tests/support/module_process.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::native::FailCriticalSection;
+using platform::simulated::VolumeBroadcast;
+using testing_support::CountingSink;
+
+constexpr HRESULT kNoResources = platform::native::ToHresult(0x800705AA);
+constexpr CLSID kUnknownClass{0x11111111, 1, 1, {1}};
+constexpr CLSID kInterfaceTableClass{0x00000323, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
+
+// A class object and an object in one: creates itself, and offers IClassFactory and one interface more.
+class FakeClass final : public IClassFactory {
+ public:
+  explicit FakeClass(const IID& offered) : m_offered(offered) {
+    EXPECT_EQ(CoRegisterClassObject(m_offered == IZKUMUsbTree::kIid ? CLSID_ZKUMUsbTree : kInterfaceTableClass, this,
+                                    CLSCTX_INPROC_SERVER, 0, &m_cookie),
+              S_OK);
+  }
+  ~FakeClass() {
+    EXPECT_EQ(CoRevokeClassObject(m_cookie), S_OK);
+    EXPECT_EQ(references, 1u);
+  }
+  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
+    const bool known = iid == IUnknown::kIid || iid == IClassFactory::kIid || iid == m_offered;
+    *out = known ? this : nullptr;
+    if (known) AddRef();
+    return known ? S_OK : E_NOINTERFACE;
+  }
+  ULONG STDMETHODCALLTYPE AddRef() override { return ++references; }
+  ULONG STDMETHODCALLTYPE Release() override { return --references; }
+  HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown*, REFIID iid, void** out) override {
+    ++created;
+    return QueryInterface(iid, out);
+  }
+  HRESULT STDMETHODCALLTYPE LockServer(BOOL) override { return E_NOTIMPL; }
+
+  ULONG references = 1;
+  int created = 0;
+
+ private:
+  const IID m_offered;
+  DWORD m_cookie = 0;
+};
+
+bool HasInstance(const CLSID& clsid) {
+  return clsid == CLSID_ZKUMUsbTree ? TreeState::s_pInstance != nullptr : NotifierState::s_pInstance != nullptr;
+}
+
+TEST(ClassObjects, RefuseWhatTheyCannotMake) {
+  for (const CLSID& clsid : {CLSID_ZKUMUsbTree, CLSID_ZKUMEventNotifier}) {
+    ModuleProcess process;
+    const ComPtr<IClassFactory> factory = process.Class(clsid);
+    const LONG locks = ModuleLockCount();
+    const struct {
+      IUnknown* outer;
+      IID iid;
+      bool giveOut;
+      HRESULT result;
+    } kCases[] = {{nullptr, IUnknown::kIid, false, E_POINTER},
+                  {factory.Get(), IUnknown::kIid, false, E_POINTER},
+                  {factory.Get(), IUnknown::kIid, true, CLASS_E_NOAGGREGATION},
+                  {nullptr, IClassFactory::kIid, true, E_NOINTERFACE}};
+    for (const auto& test : kCases) {
+      void* object = Mark<void>();
+      EXPECT_EQ(factory->CreateInstance(test.outer, test.iid, test.giveOut ? &object : nullptr), test.result);
+      EXPECT_EQ(object, test.giveOut ? nullptr : Mark<void>());
+      // A notifier that was made for nothing is there all the same, and the tree that it holds.
+      const bool made = test.result == E_NOINTERFACE && clsid == CLSID_ZKUMEventNotifier;
+      EXPECT_EQ(HasInstance(clsid), made);
+      EXPECT_EQ(ModuleLockCount(), locks + (made ? 2 : 0));
+    }
+  }
+}
+
+TEST(ClassObjects, HandOutOneObjectUntilItsLastRelease) {
+  ModuleProcess process;
+  const LONG locks = ModuleLockCount();
+  for (int round = 0; round < 2; ++round) {
+    IUnknown* first = process.Make<IUnknown>(CLSID_ZKUMUsbTree).Detach();
+    IZKUMUsbTree* second = process.Make<IZKUMUsbTree>(CLSID_ZKUMUsbTree).Detach();
+    EXPECT_EQ(static_cast<void*>(first), static_cast<void*>(second));
+    EXPECT_EQ(ModuleLockCount(), locks + 1);
+    EXPECT_EQ(first->AddRef(), 3u);
+    for (const ULONG left : {255u, 255u, 0u}) EXPECT_EQ(second->Release(), left);
+    EXPECT_FALSE(HasInstance(CLSID_ZKUMUsbTree));
+    EXPECT_EQ(ModuleLockCount(), locks);
+  }
+  IUnknown* notifier = process.Make<IUnknown>(CLSID_ZKUMEventNotifier).Detach();
+  IUnknown* same = process.Make<IUnknown>(CLSID_ZKUMEventNotifier).Detach();
+  IUnknown* tree = process.Make<IUnknown>(CLSID_ZKUMUsbTree).Detach();
+  EXPECT_EQ(notifier, same);
+  for (IUnknown* held : {notifier, same, tree}) EXPECT_EQ(held->Release(), 255u);
+  EXPECT_TRUE(HasInstance(CLSID_ZKUMEventNotifier) && HasInstance(CLSID_ZKUMUsbTree));
+}
+
+TEST(ClassObjects, TheLastReferenceIsDroppedUnderTheLock) {
+  platform::CriticalSection lock;
+  ASSERT_EQ(lock.Initialize(), S_OK);
+  std::atomic<LONG> count = 2;
+  EXPECT_FALSE(ReleaseAndLockIfLast(count, lock));
+  EXPECT_EQ(count, 1);
+  // Taken by another thread while the last owner waits for the lock, or just before it looks.
+  lock.lock();
+  bool last = true;
+  std::thread owner([&] { last = ReleaseAndLockIfLast(count, lock); });
+  std::this_thread::sleep_for(std::chrono::milliseconds(20));
+  ++count;
+  lock.unlock();
+  owner.join();
+  EXPECT_FALSE(last);
+  EXPECT_EQ(count, 1);
+  // Whoever dropped the last one holds the lock: nobody else comes in.
+  EXPECT_TRUE(ReleaseAndLockIfLast(count, lock));
+  EXPECT_EQ(count, 0);
+  std::atomic<bool> inside = false;
+  std::thread other([&] {
+    const std::lock_guard guard(lock);
+    inside = true;
+  });
+  std::this_thread::sleep_for(std::chrono::milliseconds(20));
+  EXPECT_FALSE(inside);
+  lock.unlock();
+  other.join();
+}
+
+TEST(ClassObjects, LeaveNothingOfAHalfBuiltObject) {
+  const auto section = [](std::uint64_t nth) { FailCriticalSection(nth, kNoResources); };
+  const struct {
+    const char* what;
+    CLSID clsid;
+    std::function<void(ModuleProcess&)> arrange;
+    std::uint64_t failingAllocation;
+    HRESULT result;
+  } kCases[] = {
+      {"the tree's lock", CLSID_ZKUMUsbTree, [&](ModuleProcess&) { section(1); }, 0, kNoResources},
+      {"the tree's memory", CLSID_ZKUMUsbTree, {}, 1, E_OUTOFMEMORY},
+      {"the memory of its builder", CLSID_ZKUMUsbTree, {}, 2, E_FAIL},
+      {"the tree's PC", CLSID_ZKUMUsbTree,
+       [](ModuleProcess& process) {
+         platform::SetCurrentSystem({.threads = &process.desktop, .desktop = &process.desktop});
+       },
+       0, E_FAIL},
+      {"the notifier's lock", CLSID_ZKUMEventNotifier, [&](ModuleProcess&) { section(1); }, 0, kNoResources},
+      {"the lock of its tree", CLSID_ZKUMEventNotifier, [&](ModuleProcess&) { section(2); }, 0, kNoResources},
+      {"the notifier's memory", CLSID_ZKUMEventNotifier, {}, 1, E_OUTOFMEMORY},
+      {"the class of its tree", CLSID_ZKUMEventNotifier, [](ModuleProcess& process) { process.Withdraw(); }, 0,
+       REGDB_E_CLASSNOTREG},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    ModuleProcess process;
+    const ComPtr<IClassFactory> factory = process.Class(test.clsid);
+    if (test.arrange) test.arrange(process);
+    const LONG locks = ModuleLockCount();
+    void* object = Mark<void>();
+    HRESULT result = S_OK;
+    {
+      const FailingAllocation failing(test.failingAllocation);
+      result = factory->CreateInstance(nullptr, IUnknown::kIid, &object);
+    }
+    EXPECT_EQ(result, test.result);
+    EXPECT_EQ(object, nullptr);
+    EXPECT_FALSE(HasInstance(CLSID_ZKUMUsbTree) || HasInstance(CLSID_ZKUMEventNotifier));
+    EXPECT_EQ(ModuleLockCount(), locks);
+    EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), 0u) << "the monitor was started";
+  }
+}
+
+TEST(ClassObjects, TearTheMonitorDownWhenTheTreeCannotBuild) {
+  ModuleProcess process;
+  process.Withdraw();
+  FakeClass tree(IZKUMUsbTree::kIid);
+  EXPECT_FALSE(process.Make<IUnknown>(CLSID_ZKUMEventNotifier, E_NOINTERFACE));
+  EXPECT_EQ(tree.created, 1);
+  EXPECT_FALSE(HasInstance(CLSID_ZKUMEventNotifier));
+  EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), 1u);
+  EXPECT_EQ(process.desktop.Counts().registrations, 0u);
+  EXPECT_EQ(g_pActiveReceiver, nullptr);
+  EXPECT_EQ(g_pNotifyTarget, nullptr);
+  EXPECT_EQ(ModuleLockCount(), 0);
+}
+
+TEST(ClassObjects, AreCachedAndLockTheModuleWhileAClientHoldsThem) {
+  ModuleProcess process;
+  process.Withdraw();
+  CZKUsbMonitorModule& module = *process.module;
+  ComPtr<IClassFactory> first, second;
+  ComPtr<IUnknown> unknown, tree;
+  void* out = nullptr;
+  IUnknown* cached = nullptr;
+  const struct {
+    const char* what;
+    std::function<HRESULT()> act;
+    HRESULT result;
+    LONG locks;
+  } kSteps[] = {
+      {"nothing", [] { return S_OK; }, S_OK, 0},
+      {"no out pointer", [&] { return module.GetClassObject(CLSID_ZKUMUsbTree, IUnknown::kIid, nullptr); }, E_POINTER,
+       0},
+      {"an unknown class", [&] { return module.GetClassObject(kUnknownClass, IUnknown::kIid, &out); },
+       CLASS_E_CLASSNOTAVAILABLE, 0},
+      {"an unknown interface", [&] { return module.GetClassObject(CLSID_ZKUMUsbTree, IDispatch::kIid, &out); },
+       E_NOINTERFACE, 0},
+      {"the first reference",
+       [&] { return module.GetClassObject(CLSID_ZKUMUsbTree, IClassFactory::kIid, first.PutVoid()); }, S_OK, 1},
+      {"the second", [&] { return module.GetClassObject(CLSID_ZKUMUsbTree, IUnknown::kIid, unknown.PutVoid()); }, S_OK,
+       1},
+      {"the other class",
+       [&] { return module.GetClassObject(CLSID_ZKUMEventNotifier, IClassFactory::kIid, second.PutVoid()); }, S_OK, 2},
+      {"an object", [&] { return first->CreateInstance(nullptr, IUnknown::kIid, tree.PutVoid()); }, S_OK, 3},
+      {"a lock", [&] { return first->LockServer(TRUE); }, S_OK, 4},
+      {"another", [&] { return second->LockServer(2); }, S_OK, 5},
+      {"an unlock", [&] { return first->LockServer(FALSE); }, S_OK, 4},
+      {"one reference less",
+       [&] {
+         EXPECT_EQ(static_cast<IUnknown*>(first.Get()), unknown.Get());
+         cached = unknown.Get();
+         first.Reset();
+         return S_OK;
+       },
+       S_OK, 4},
+      {"none left",
+       [&] {
+         unknown.Reset();
+         return S_OK;
+       },
+       S_OK, 3},
+      {"the same once more", [&] { return module.GetClassObject(CLSID_ZKUMUsbTree, IUnknown::kIid, first.PutVoid()); },
+       S_OK, 4},
+      {"the last unlock",
+       [&] {
+         EXPECT_EQ(first.Get(), cached);
+         first.Reset();
+         const HRESULT result = second->LockServer(FALSE);
+         second.Reset();
+         return result;
+       },
+       S_OK, 1},
+      {"no object",
+       [&] {
+         tree.Reset();
+         return S_OK;
+       },
+       S_OK, 0},
+  };
+  for (const auto& step : kSteps) {
+    SCOPED_TRACE(step.what);
+    out = Mark<void>();
+    EXPECT_EQ(step.act(), step.result);
+    EXPECT_TRUE(out == nullptr || out == Mark<void>());
+    EXPECT_EQ(module.GetLockCount(), step.locks);
+    EXPECT_EQ(module.CanUnloadNow(), step.locks == 0 ? S_OK : S_FALSE);
+  }
+}
+
+TEST(ClassObjects, AreMadeWhenTheyCanBe) {
+  for (const CLSID& clsid : {CLSID_ZKUMUsbTree, CLSID_ZKUMEventNotifier}) {
+    MonitorProcess process;
+    CZKUsbMonitorModule module;
+    for (const HRESULT expected : {kNoResources, E_OUTOFMEMORY, S_OK}) {
+      void* out = Mark<void>();
+      HRESULT result = S_OK;
+      {
+        const FailingAllocation failing(expected == E_OUTOFMEMORY ? 1 : 0);
+        FailCriticalSection(expected == kNoResources ? 1 : 0, expected);
+        result = module.GetClassObject(clsid, IUnknown::kIid, &out);
+      }
+      EXPECT_EQ(result, expected);
+      EXPECT_EQ(out != nullptr, expected == S_OK);
+      EXPECT_EQ(module.GetLockCount(), expected == S_OK ? 1 : 0);
+      if (out != nullptr) {
+        EXPECT_EQ(static_cast<IUnknown*>(out)->Release(), 1u);
+      }
+    }
+    module.Unload();
+  }
+}
+
+TEST(Module, AnswersUnexpectedWhenItCouldNotInitialise) {
+  for (const std::uint64_t lock : {1u, 2u, 3u, 4u}) {
+    SCOPED_TRACE(lock);
+    const bool whole = lock == 4;
+    FailCriticalSection(lock, kNoResources);
+    CZKUsbMonitorModule module;
+    FailCriticalSection(0, S_OK);
+    EXPECT_EQ(module.Initialized(), whole);
+    for (const CLSID& clsid : {CLSID_ZKUMUsbTree, CLSID_ZKUMEventNotifier, kUnknownClass}) {
+      void* out = Mark<void>();
+      EXPECT_EQ(module.GetClassObject(clsid, IDispatch::kIid, &out), !whole ? E_UNEXPECTED
+                                                                     : clsid == kUnknownClass
+                                                                         ? CLASS_E_CLASSNOTAVAILABLE
+                                                                         : E_NOINTERFACE);
+      EXPECT_EQ(out, nullptr);
+      EXPECT_EQ(module.GetClassObject(clsid, IUnknown::kIid, nullptr), E_POINTER);
+    }
+    void* table = Mark<void>();
+    EXPECT_EQ(module.GetGlobalInterfaceTable(reinterpret_cast<IUnknown**>(&table)),
+              whole ? REGDB_E_CLASSNOTREG : E_UNEXPECTED);
+    EXPECT_EQ(table, nullptr);
+    EXPECT_EQ(module.CanUnloadNow(), S_OK);
+    module.Unload();
+  }
+}
+
+// In the ABI of these builds a pointer to a virtual method is its place in the table of methods, in bytes, plus one.
+template <class Method>
+std::size_t SlotOf(Method method) {
+  const auto words = std::bit_cast<std::array<std::uintptr_t, 2>>(method);
+  EXPECT_EQ(words[0] % sizeof(void*), 1u) << "not virtual";
+  return words[0] / sizeof(void*);
+}
+
+TEST(Module, KeepsTheOrderOfItsVirtualOperations) {
+  using Module = CZKUsbMonitorModule;
+  // Two places are the destructor's.
+  EXPECT_EQ(SlotOf(&Module::Lock), 2u);
+  EXPECT_EQ(SlotOf(&Module::Unlock), 3u);
+  EXPECT_EQ(SlotOf(&Module::GetLockCount), 4u);
+  EXPECT_EQ(SlotOf(&Module::GetGlobalInterfaceTable), 5u);
+  EXPECT_EQ(SlotOf(&Module::AddCommonRGSReplacements), 6u);
+
+  Module module;
+  EXPECT_EQ(module.Lock(), 1);
+  EXPECT_EQ(module.Lock(), 2);
+  EXPECT_EQ(module.Unlock(), 1);
+  EXPECT_EQ(module.GetLockCount(), 1);
+  EXPECT_EQ(module.CanUnloadNow(), S_FALSE);
+  EXPECT_EQ(module.Unlock(), 0);
+
+  std::vector<Replacement> replacements{{u"MINE", u"kept"}};
+  module.AddCommonRGSReplacements(replacements);
+  ASSERT_EQ(replacements.size(), 2u);
+  EXPECT_EQ(replacements[1].name, u"APPID");
+  EXPECT_EQ(replacements[1].text, u"{A0C53575-7F3D-4FF2-B5A7-BFA873492510}");
+}
+
+TEST(Module, KeepsTheInterfaceTableOfTheProcess) {
+  FakeClass table({0x00000146, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}});
+  CZKUsbMonitorModule module;
+  EXPECT_EQ(module.GetGlobalInterfaceTable(nullptr), E_POINTER);
+  for (int call = 0; call < 2; ++call) {
+    ComPtr<IUnknown> out;
+    EXPECT_EQ(module.GetGlobalInterfaceTable(out.Put()), S_OK);
+    EXPECT_EQ(out.Get(), &table);
+    EXPECT_EQ(table.created, 1);
+    EXPECT_EQ(table.references, 4u) << "the process, the module and the caller besides its own";
+  }
+  module.Unload();
+  EXPECT_EQ(table.references, 2u);
+  ComPtr<IUnknown> out;
+  EXPECT_EQ(module.GetGlobalInterfaceTable(out.Put()), E_UNEXPECTED);
+  EXPECT_FALSE(out);
+}
+
+TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {
+  const DeviceBroadcast volume = VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0);
+  const DeviceBroadcast late = NamedBroadcast(platform::kDBT_DEVICEREMOVECOMPLETE, 5, kWatchedPath);
+  for (const bool held : {false, true}) {
+    for (const bool underWay : {false, true}) {
+      SCOPED_TRACE(testing::Message() << (held ? "held" : "not held") << (underWay ? ", with an event under way" : ""));
+      ModuleProcess process;
+      CountingSink sink;
+      IUnknown* notifier = process.Make<IUnknown>(CLSID_ZKUMEventNotifier).Detach();
+      process.Withdraw();
+      {
+        ComPtr<IConnectionPoint> point;
+        DWORD cookie = 0;
+        const auto container = ComPtr<IUnknown>(notifier).As<IConnectionPointContainer>();
+        ASSERT_EQ(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, point.Put()), S_OK);
+        ASSERT_EQ(point->Advise(&sink, &cookie), S_OK);
+      }
+      // What a stick that comes leads to as long as the module is not unloaded, and no longer.
+      const auto plug = [&](const char16_t* serial, std::uint32_t port, char16_t letter) {
+        EXPECT_EQ(process.pc.Apply({0, u"", Change(Stick(serial, port, letter))}), u"");
+        EXPECT_EQ(process.desktop.Broadcast(volume), 1u);
+        process.desktop.Settle();
+        return sink.Events();
+      };
+      const std::size_t told = plug(u"S1", 1, u'E');
+      EXPECT_GE(told, 1u);
+      if (!held) {
+        EXPECT_EQ(notifier->Release(), 255u);
+      }
+      if (underWay) process.desktop.Broadcast(late);
+      EXPECT_EQ(ModuleLockCount(), underWay ? 3 : 2) << "notifier, tree, event thread";
+
+      for (int time = 0; time < 2; ++time) process.module->Unload();
+      EXPECT_EQ(process.desktop.Now() >= 3000, underWay);
+      EXPECT_EQ(HasInstance(CLSID_ZKUMEventNotifier), held);
+      EXPECT_EQ(ModuleLockCount(), held ? 2 : 0);
+      const std::uint64_t threads = process.desktop.Calls(DesktopCall::StartThread);
+      EXPECT_EQ(plug(u"S2", 2, u'F'), told);
+      if (held) {
+        EXPECT_EQ(notifier->Release(), 0u);
+      }
+      EXPECT_FALSE(HasInstance(CLSID_ZKUMEventNotifier) || HasInstance(CLSID_ZKUMUsbTree));
+      EXPECT_EQ(ModuleLockCount(), 0);
+      // Whether its code is still there is not known, so it is not released. This is meant.
+      EXPECT_EQ(sink.References(), 2);
+      EXPECT_EQ(plug(u"S3", 3, u'G'), told);
+      EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), threads);
+      EXPECT_EQ(process.desktop.Counts().registrations, 0u);
+      EXPECT_THAT(process.desktop.Pins(), testing::ElementsAre(&g_notifyLock));
+    }
+  }
+}
+
+TEST(ModuleStress, EightThreadsMakeAndReleaseTheTree) {
+  constexpr std::size_t kThreads = 8;
+  constexpr std::size_t kRounds = 500;
+  ModuleProcess process(ClockMode::Real);
+  process.Withdraw();
+  std::atomic<std::size_t> made = 0, shared = 0, failures = 0;
+  std::barrier round(kThreads);
+  std::vector<std::thread> threads;
+  for (std::size_t thread = 0; thread < kThreads; ++thread) {
+    threads.emplace_back([&, thread] {
+      for (std::size_t i = 0; i < kRounds; ++i) {
+        round.arrive_and_wait();
+        ComPtr<IClassFactory> factory;
+        failures += FAILED(process.module->GetClassObject(CLSID_ZKUMUsbTree, IClassFactory::kIid, factory.PutVoid()));
+        if (!factory) continue;
+        IZKUMUsbTree* tree = nullptr;
+        failures += FAILED(factory->CreateInstance(nullptr, IZKUMUsbTree::kIid, reinterpret_cast<void**>(&tree)));
+        if (tree == nullptr) continue;
+        IZKUMUsbTreeNode* root = nullptr;
+        failures += tree->get_RootNode(&root) != E_POINTER;
+        if ((i + thread) % 4 == 0) std::this_thread::yield();
+        ++(tree->Release() == 0 ? made : shared);
+      }
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(failures, 0u);
+  EXPECT_EQ(made + shared, kThreads * kRounds);
+  // In every round at least the first thread found none: all had been released.
+  EXPECT_GE(made, kRounds);
+  EXPECT_GE(shared, 1u) << "no two threads met";
+  EXPECT_EQ(process.pc.Open().sets, made) << "of which each tree leaves one, so no more were made than destroyed";
+  EXPECT_FALSE(HasInstance(CLSID_ZKUMUsbTree));
+  EXPECT_EQ(ModuleLockCount(), 0);
+  std::cout << made << " objects made, " << shared << " releases of one that others held\n";
+}
+
+}  // namespace
+}  // namespace KelvoUHW

@@ -1,0 +1,270 @@
+// The module as a client has it: a shared library that is loaded through COM. This program does not contain it.
+#include <dlfcn.h>
+#include <gmock/gmock.h>
+#include <link.h>
+
+#include <chrono>
+#include <cstdlib>
+#include <iostream>
+#include <string>
+
+#include "com/com_ptr.h"
+#include "com/private_interfaces.h"
+#include "com/zkusb_monitor.h"
+#include "module/type_library.h"
+#include "platform/server_module.h"
+#include "platform/simulated/module_environment.h"
+#include "platform/simulated/play_step.h"
+#include "platform/simulated/simulated_desktop.h"
+#include "platform/simulated/simulated_pc.h"
+#include "platform/simulated/type_libraries.h"
+#include "platform/system.h"
+#include "tests/support/counting_sink.h"
+#include "tests/support/machines.h"
+#include "tests/support/registry_lines.h"
+
+namespace {
+
+using KelvoUHW::ComPtr;
+using platform::simulated::ClockMode;
+using platform::simulated::InterfaceBroadcast;
+using platform::simulated::VolumeBroadcast;
+using testing_support::CountingSink;
+using testing_support::Lines;
+using testing_support::LinesOf;
+
+const std::u16string kModule = platform::FromUtf8(ZKUSB_MODULE);
+
+// Whether the module is part of this process, as the loader and the list of what is mapped say.
+bool Mapped() {
+  const auto find = [](dl_phdr_info* library, std::size_t, void* found) {
+    *static_cast<bool*>(found) |= std::string_view(library->dlpi_name).ends_with("libZKUsbMonitor.so");
+    return 0;
+  };
+  bool listed = false;
+  dl_iterate_phdr(find, &listed);
+  void* const handle = dlopen(ZKUSB_MODULE, RTLD_NOW | RTLD_NOLOAD);
+  if (handle != nullptr) dlclose(handle);
+  EXPECT_EQ(handle != nullptr, listed);
+  return listed;
+}
+
+// One controller with a gadget on its root hub.
+platform::simulated::Machine OneGadget() {
+  using namespace testing_support;
+  Machine machine = OneController(2);
+  machine.devices.push_back(
+      DeviceNode(u"USB\\VID_0781&PID_5567\\1", kRootHubId, u"HIDClass", u"{key}\\1", u"USB Input Device"));
+  machine.hubs[0].ports[0] = DevicePort(u"{key}\\1", 0x0781, 0x5567);
+  return machine;
+}
+
+// A process on a simulated PC, with the module registered or not.
+struct Client {
+  explicit Client(bool registered = true, ClockMode mode = ClockMode::Virtual) : desktop(mode) {
+    typeLibraries.Add(kModule, KelvoUHW::ModuleTypeLibrary());
+    platform::SetCurrentSystem({&pc, &desktop, &desktop, &registry, &typeLibraries, &environment});
+    if (registered) {
+      EXPECT_EQ(platform::RegisterServerModule(kModule), S_OK);
+    }
+  }
+  ~Client() {
+    desktop.EndProcess();
+    platform::SetCurrentSystem({});
+  }
+
+  platform::simulated::SimulatedPc pc{OneGadget()};
+  platform::simulated::SimulatedDesktop desktop;
+  platform::simulated::SimulatedRegistry registry;
+  platform::simulated::SimulatedTypeLibraries typeLibraries{registry};
+  platform::simulated::SimulatedModuleEnvironment environment{kModule};
+};
+
+template <class Interface>
+ComPtr<Interface> Create(const CLSID& clsid, HRESULT expected = S_OK) {
+  ComPtr<Interface> object;
+  EXPECT_EQ(CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, platform::IidOf<Interface>(), object.PutVoid()),
+            expected);
+  return object;
+}
+
+CLSID ClassOf(const char16_t* progId) {
+  CLSID clsid{};
+  EXPECT_EQ(CLSIDFromProgID(progId, &clsid), S_OK);
+  return clsid;
+}
+
+HRESULT RootOf(const ComPtr<IZKUMUsbTree>& tree) {
+  ComPtr<IZKUMUsbTreeNode> root;
+  const HRESULT result = tree->get_RootNode(root.Put());
+  EXPECT_EQ(static_cast<bool>(root), result == S_OK);
+  return result;
+}
+
+TEST(SharedLibrary, InstallWritesNothing) {
+  void* const library = dlopen(ZKUSB_MODULE, RTLD_NOW);
+  ASSERT_NE(library, nullptr);
+  const auto install = reinterpret_cast<HRESULT (*)(BOOL, const OLECHAR*)>(dlsym(library, "DllInstall"));
+  ASSERT_NE(install, nullptr);
+  for (const bool registered : {false, true}) {
+    const Client client(registered);
+    const Lines before = LinesOf(client.registry);
+    EXPECT_EQ(before.empty(), !registered);
+    for (const BOOL flag : {TRUE, FALSE, 2}) {
+      for (const char16_t* line : {static_cast<const char16_t*>(nullptr), u"", u"user", u"/n /i:machine"}) {
+        EXPECT_EQ(install(flag, line), S_OK);
+        EXPECT_EQ(LinesOf(client.registry), before);
+      }
+    }
+  }
+  dlclose(library);
+  EXPECT_FALSE(Mapped());
+}
+
+TEST(SharedLibrary, IsFoundThroughItsRegistrationAlone) {
+  Client client(false);
+  const auto refused = [] {
+    EXPECT_FALSE(Create<IUnknown>(CLSID_ZKUMUsbTree, REGDB_E_CLASSNOTREG));
+    EXPECT_FALSE(Create<IUnknown>(CLSID_ZKUMEventNotifier, REGDB_E_CLASSNOTREG));
+    CLSID clsid = CLSID_ZKUMUsbTree;
+    EXPECT_EQ(CLSIDFromProgID(u"KelvoUsbMonitor.UsbTree", &clsid), CO_E_CLASSSTRING);
+    EXPECT_EQ(clsid, GUID_NULL);
+    EXPECT_FALSE(Mapped());
+  };
+  refused();
+  ASSERT_EQ(platform::RegisterServerModule(kModule), S_OK);
+  EXPECT_FALSE(Mapped()) << "loaded for the call only";
+  const std::string server = "CLSID\\{34349D2D-14C6-414B-9771-A7BD2A7C7180}\\InprocServer32  ";
+  EXPECT_THAT(LinesOf(client.registry), testing::IsSupersetOf({server + "(default) = \"" + ZKUSB_MODULE + "\"",
+                                                               server + "ThreadingModel = \"Free\""}));
+  EXPECT_EQ(ClassOf(u"KelvoUsbMonitor.EventNotifier"), CLSID_ZKUMEventNotifier);
+  EXPECT_EQ(ClassOf(u"KelvoUsbMonitor.EventNotifier.1"), CLSID_ZKUMEventNotifier);
+  for (const CLSID& clsid :
+       {CLSID_ZKUMUsbTree, ClassOf(u"KelvoUsbMonitor.UsbTree"), ClassOf(u"KelvoUsbMonitor.UsbTree.1")}) {
+    EXPECT_EQ(RootOf(Create<IZKUMUsbTree>(clsid)), E_POINTER) << "no build, no tree";
+  }
+  CoFreeUnusedLibraries();
+
+  ASSERT_EQ(platform::UnregisterServerModule(kModule), S_OK);
+  EXPECT_THAT(LinesOf(client.registry, false), testing::IsEmpty());
+  EXPECT_THAT(LinesOf(client.registry), testing::IsSupersetOf({"AppID", "CLSID"}));
+  refused();
+  testing_support::ExpectAllClosed(client.registry);
+}
+
+TEST(SharedLibrary, IsUnmappedWheneverNothingOfItIsLeft) {
+  constexpr int kCycles = 200;
+  const Client client;
+  for (int cycle = 0; cycle < kCycles && !HasFailure(); ++cycle) {
+    SCOPED_TRACE(cycle);
+    ASSERT_FALSE(Mapped());
+    ComPtr<IZKUMUsbTree> tree = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree);
+    ASSERT_TRUE(tree && Mapped());
+    EXPECT_EQ(RootOf(tree), E_POINTER) << "a tree of the cycle before";
+    EXPECT_EQ(tree.As<IBuildUsbTree>()->BuildTree(), S_OK);
+    ComPtr<IZKUMUsbTreeNode> root;
+    ComPtr<IZKUMUsbTreeNodeEnumerator> nodes;
+    EXPECT_EQ(tree->get_RootNode(root.Put()), S_OK);
+    EXPECT_EQ(tree->get_PortDevicesWithVendorId(0x0781, nodes.Put()), S_OK);
+    for (const VARIANT_BOOL expected : {VARIANT_TRUE, VARIANT_FALSE}) {
+      VARIANT_BOOL more = 2;
+      EXPECT_EQ(nodes->MoveNext(&more), S_OK);
+      EXPECT_EQ(more, expected);
+    }
+    // Each of them alone keeps it.
+    tree.Reset();
+    CoFreeUnusedLibraries();
+    root.Reset();
+    CoFreeUnusedLibraries();
+    ASSERT_TRUE(Mapped());
+    nodes.Reset();
+    CoFreeUnusedLibraries();
+  }
+  EXPECT_FALSE(Mapped());
+}
+
+// With a notifier the module stays in the process, so each of these has a process to itself.
+class SharedLibraryDeathTest : public testing::Test {
+ protected:
+  SharedLibraryDeathTest() { GTEST_FLAG_SET(death_test_style, "threadsafe"); }
+};
+
+constexpr int kOwnCode = 42;
+[[noreturn]] void EndWithOwnCode() { std::exit(testing::Test::HasFailure() ? 1 : kOwnCode); }
+
+struct Advised {
+  Advised() {
+    EXPECT_EQ(notifier->FindConnectionPoint(DIID_IZKDeviceEventCallBack, point.Put()), S_OK);
+    EXPECT_EQ(point->Advise(&sink, &cookie), S_OK);
+  }
+
+  CountingSink sink;
+  ComPtr<IConnectionPointContainer> notifier = Create<IConnectionPointContainer>(CLSID_ZKUMEventNotifier);
+  ComPtr<IConnectionPoint> point;
+  DWORD cookie = 0;
+};
+
+[[noreturn]] void StaysMapped() {
+  Client client;
+  const ComPtr<IZKUMUsbTree> tree = Create<IZKUMUsbTree>(ClassOf(u"KelvoUsbMonitor.UsbTree"));
+  const auto notifier = Create<IUnknown>(ClassOf(u"KelvoUsbMonitor.EventNotifier"));
+  EXPECT_EQ(RootOf(tree), E_POINTER) << "creating builds nothing";
+  auto advised = std::make_unique<Advised>();
+  EXPECT_EQ(advised->notifier.As<IUnknown>().Get(), notifier.Get());
+  EXPECT_EQ(RootOf(tree), S_OK);
+  EXPECT_EQ(advised->sink.Events(), 1u) << "the gadget that was there";
+
+  // More closings than openings: a client can unload it no more than the system.
+  CoFreeUnusedLibraries();
+  void* const handle = dlopen(ZKUSB_MODULE, RTLD_NOW);
+  for (int closings = 0; closings < 3; ++closings) dlclose(handle);
+  EXPECT_TRUE(Mapped());
+
+  EXPECT_EQ(client.pc.Apply({0, u"", platform::simulated::Unplug{u"USB\\VID_0781&PID_5567\\1"}}), u"");
+  EXPECT_EQ(client.desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEREMOVECOMPLETE, u'E', 0)), 1u);
+  client.desktop.Settle();
+  EXPECT_EQ(advised->sink.Events(), 2u);
+  EXPECT_EQ(advised->point->Unadvise(advised->cookie), S_OK);
+  EXPECT_EQ(advised->sink.References(), 1);
+  advised.reset();
+  EndWithOwnCode();
+}
+
+TEST_F(SharedLibraryDeathTest, StaysMappedWithANotifier) {
+  EXPECT_EXIT(StaysMapped(), testing::ExitedWithCode(kOwnCode), "");
+}
+
+std::int64_t Milliseconds() {
+  return std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now().time_since_epoch())
+      .count();
+}
+
+// Prints when it begins to end.
+[[noreturn]] void EndsAmidAnEvent() {
+  Client client(true, ClockMode::Real);
+  const Advised advised;
+  const std::u16string watched = u"\\\\?\\USB#VID_05AC&PID_1291#0#{a5dcbf10-6530-11d2-901f-00c04fb951ed}";
+  // The window may be there later than the notifier, and is not registered then: it is sent to.
+  while (client.desktop.Windows().empty()) client.desktop.RunFor(1);
+  const auto removal = InterfaceBroadcast(platform::kDBT_DEVICEREMOVECOMPLETE, {}, watched);
+  const std::size_t threads = client.desktop.Counts().threads;
+  EXPECT_TRUE(client.desktop.SendToWindow(client.desktop.Windows()[0].handle, platform::kWM_DEVICECHANGE,
+                                          platform::kDBT_DEVICEREMOVECOMPLETE,
+                                          reinterpret_cast<platform::LParam>(removal.record.data())));
+  EXPECT_EQ(client.desktop.Counts().threads, threads + 1) << "no event thread";
+  client.desktop.RunFor(100);
+  EXPECT_EQ(client.desktop.Counts().threads, threads + 1) << "it does not wait";
+  std::cerr << "ends at " << Milliseconds() << std::endl;
+  EndWithOwnCode();
+}
+
+TEST_F(SharedLibraryDeathTest, EndsAtOnceThoughAnEventThreadSleeps) {
+  const auto sinceItBegan = [](const std::string& text) {
+    const std::size_t at = text.find("ends at ");
+    return at == text.npos ? -1 : Milliseconds() - std::stoll(text.substr(at + 8));
+  };
+  EXPECT_EXIT(EndsAmidAnEvent(), testing::ExitedWithCode(kOwnCode),
+              testing::ResultOf(sinceItBegan, testing::AllOf(testing::Ge(0), testing::Lt(1000))));
+}
+
+}  // namespace

@@ -1,0 +1,149 @@
+// How builds without the system find the classes of COM.
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "platform/com.h"
+#include "platform/simulated/registry.h"
+#include "platform/system.h"
+#include "platform/text.h"
+#include "tests/support/registry_lines.h"
+
+namespace {
+
+using testing_support::Put;
+
+constexpr CLSID kClass{0x12345678, 0x9ABC, 0xDEF0, {1, 2, 3, 4, 5, 6, 7, 0xFF}};
+const std::u16string kClassText = u"{12345678-9ABC-DEF0-0102-0304050607FF}";
+constexpr CLSID kOtherClass{};
+
+// A class object that makes itself.
+struct Factory final : IClassFactory {
+  HRESULT QueryInterface(REFIID iid, void** out) override {
+    const bool known = iid == IUnknown::kIid || iid == IClassFactory::kIid;
+    *out = known ? this : nullptr;
+    if (known) AddRef();
+    return known ? S_OK : E_NOINTERFACE;
+  }
+  ULONG AddRef() override { return ++references; }
+  ULONG Release() override { return --references; }
+  HRESULT CreateInstance(IUnknown* outer, REFIID iid, void** out) override {
+    return outer != nullptr ? CLASS_E_NOAGGREGATION : QueryInterface(iid, out);
+  }
+  HRESULT LockServer(BOOL) override { return E_NOTIMPL; }
+  ULONG references = 1;
+};
+
+// What COM answers for a class object and for an object, which has to be the same; `out` is checked, too.
+HRESULT Ask(const CLSID& clsid, const IID& iid, IUnknown* expected = nullptr, IUnknown* outer = nullptr) {
+  HRESULT results[2] = {};
+  for (const bool object : {false, true}) {
+    void* out = &results;
+    results[object] = object ? CoCreateInstance(clsid, outer, CLSCTX_INPROC_SERVER, iid, &out)
+                             : CoGetClassObject(clsid, CLSCTX_INPROC_SERVER, nullptr, iid, &out);
+    EXPECT_EQ(out, SUCCEEDED(results[object]) ? expected : nullptr);
+    if (SUCCEEDED(results[object])) static_cast<IUnknown*>(out)->Release();
+  }
+  // Aggregation is an object's business.
+  EXPECT_TRUE(outer != nullptr || results[0] == results[1]);
+  return results[1];
+}
+
+TEST(ClassObjects, OfTheProcessComeBeforeThoseOfTheRegistry) {
+  platform::simulated::SimulatedRegistry registry;
+  platform::SetCurrentSystem({.registry = &registry});
+  Put(registry, u"CLSID\\" + kClassText + u"\\InprocServer32", u"", u"/nowhere/server.so");
+  Factory first, second;
+  DWORD firstCookie = 0, secondCookie = 0;
+  EXPECT_EQ(CoRegisterClassObject(kClass, nullptr, CLSCTX_INPROC_SERVER, 0, &firstCookie), E_INVALIDARG);
+  EXPECT_EQ(CoRegisterClassObject(kClass, &first, CLSCTX_INPROC_SERVER, 0, nullptr), E_INVALIDARG);
+  EXPECT_EQ(CoGetClassObject(kClass, CLSCTX_INPROC_SERVER, nullptr, IUnknown::kIid, nullptr), E_POINTER);
+  EXPECT_EQ(CoCreateInstance(kClass, nullptr, CLSCTX_INPROC_SERVER, IUnknown::kIid, nullptr), E_POINTER);
+
+  ASSERT_EQ(CoRegisterClassObject(kClass, &first, CLSCTX_INPROC_SERVER, 0, &firstCookie), S_OK);
+  ASSERT_EQ(CoRegisterClassObject(kClass, &second, CLSCTX_INPROC_SERVER, 0, &secondCookie), S_OK);
+  EXPECT_NE(firstCookie, secondCookie);
+  EXPECT_EQ(Ask(kClass, IClassFactory::kIid, &first), S_OK);
+  EXPECT_EQ(Ask(kClass, IDispatch::kIid), E_NOINTERFACE);
+  EXPECT_EQ(Ask(kClass, IUnknown::kIid, &first, &second), CLASS_E_NOAGGREGATION);
+  EXPECT_EQ(Ask(kOtherClass, IUnknown::kIid), REGDB_E_CLASSNOTREG);
+  EXPECT_EQ(first.references, 2u);
+  EXPECT_EQ(CoRevokeClassObject(firstCookie), S_OK);
+  EXPECT_EQ(CoRevokeClassObject(firstCookie), E_INVALIDARG);
+  EXPECT_EQ(first.references, 1u);
+  EXPECT_EQ(Ask(kClass, IUnknown::kIid, &second), S_OK);
+  EXPECT_EQ(CoRevokeClassObject(secondCookie), S_OK);
+  EXPECT_EQ(Ask(kClass, IUnknown::kIid), CO_E_DLLNOTFOUND);
+  platform::SetCurrentSystem({});
+}
+
+TEST(ClassObjects, OfTheRegistryAreLookedUpStepByStep) {
+  const std::u16string key = u"CLSID\\" + kClassText;
+  // A library that is no server: the platform layer itself.
+  const std::u16string noServer = platform::FromUtf8(ZKUSB_PLATFORM_LIBRARY);
+  const struct {
+    const char* what;
+    std::u16string key;
+    const char16_t* name;
+    std::u16string text;
+    HRESULT result;
+  } kCases[] = {{"no key", u"CLSID", nullptr, u"", REGDB_E_CLASSNOTREG},
+                {"no server", key, u"", noServer, REGDB_E_CLASSNOTREG},
+                {"no path", key + u"\\InprocServer32", nullptr, u"", REGDB_E_CLASSNOTREG},
+                {"another value", key + u"\\InprocServer32", u"Path", noServer, REGDB_E_CLASSNOTREG},
+                {"an empty path", key + u"\\InprocServer32", u"", u"", REGDB_E_CLASSNOTREG},
+                {"no file", key + u"\\InprocServer32", u"", u"/nowhere/server.so", CO_E_DLLNOTFOUND},
+                {"a file that is no library", key + u"\\InprocServer32", u"", u"/dev/null", CO_E_DLLNOTFOUND},
+                {"a library that is no server", key + u"\\InprocServer32", u"", noServer, CO_E_ERRORINDLL}};
+  platform::SetCurrentSystem({});
+  EXPECT_EQ(Ask(kClass, IUnknown::kIid), REGDB_E_CLASSNOTREG) << "no registry";
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    platform::simulated::SimulatedRegistry registry;
+    platform::SetCurrentSystem({.registry = &registry});
+    Put(registry, test.key, test.name, test.text);
+    EXPECT_EQ(Ask(kClass, IUnknown::kIid), test.result);
+    CoFreeUnusedLibraries();
+    testing_support::ExpectAllClosed(registry);
+  }
+  platform::SetCurrentSystem({});
+}
+
+TEST(ClassObjects, AreNamedByProgramIdentifiers) {
+  const struct {
+    const char* what;
+    const char16_t* progId;
+    const char16_t* text;  // that the registry has for Server.1
+    HRESULT result;
+  } kCases[] = {{"found", u"Server.1", u"{12345678-9ABC-DEF0-0102-0304050607FF}", S_OK},
+                {"in any case", u"SERVER.1", u"{12345678-9abc-def0-0102-0304050607ff}", S_OK},
+                {"another name", u"Server", u"{12345678-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
+                {"no name", u"", u"{12345678-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
+                {"an empty class", u"Server.1", u"", CO_E_CLASSSTRING},
+                {"no braces", u"Server.1", u"12345678-9ABC-DEF0-0102-0304050607FF", CO_E_CLASSSTRING},
+                {"another bracket", u"Server.1", u"(12345678-9ABC-DEF0-0102-0304050607FF)", CO_E_CLASSSTRING},
+                {"too short", u"Server.1", u"{12345678-9ABC-DEF0-0102-0304050607F}", CO_E_CLASSSTRING},
+                {"too long", u"Server.1", u"{12345678-9ABC-DEF0-0102-0304050607FF} ", CO_E_CLASSSTRING},
+                {"no digit", u"Server.1", u"{1234567G-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
+                {"a sign", u"Server.1", u"{+2345678-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
+                {"another dash", u"Server.1", u"{12345678-9ABC-DEF0-01020-304050607FF}", CO_E_CLASSSTRING}};
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    platform::simulated::SimulatedRegistry registry;
+    platform::SetCurrentSystem({.registry = &registry});
+    Put(registry, u"Server.1\\CLSID", u"", test.text);
+    CLSID clsid{1, 2, 3, {}};
+    EXPECT_EQ(CLSIDFromProgID(test.progId, &clsid), test.result);
+    EXPECT_EQ(clsid, test.result == S_OK ? kClass : GUID_NULL);
+    const auto parsed = platform::ParseGuid(test.text);
+    EXPECT_EQ(parsed.has_value(), platform::EqualIgnoringCase(test.text, kClassText));
+    EXPECT_EQ(parsed.value_or(kClass), kClass);
+  }
+  platform::SetCurrentSystem({});
+  CLSID clsid{};
+  EXPECT_EQ(CLSIDFromProgID(nullptr, &clsid), E_INVALIDARG);
+  EXPECT_EQ(CLSIDFromProgID(u"Server.1", nullptr), E_INVALIDARG);
+  EXPECT_EQ(CLSIDFromProgID(u"Server.1", &clsid), CO_E_CLASSSTRING) << "no registry";
+}
+
+}  // namespace
