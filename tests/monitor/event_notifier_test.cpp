@@ -5,7 +5,6 @@
 #include <set>
 
 #include "module/singleton.h"
-#include "tests/support/desk_pc.h"
 #include "tests/support/failing_memory.h"
 #include "tests/support/notifier_scene.h"
 

@@ -1,7 +1,7 @@
 // Runs of the notifier over whole PCs: what sinks hear of what happened.
 #include <gtest/gtest.h>
 
-#include "tests/support/desk_pc.h"
+#include "tests/support/plugs.h"
 #include "tests/support/notifier_process.h"
 #include "tests/support/test_sink.h"
 
