@@ -1,4 +1,3 @@
-#include <optional>
 #include <stdexcept>
 #include <utility>
 
@@ -50,12 +49,10 @@ struct Pc::State {
         environment(modulePath) {
     typeLibraries.Add(modulePath, KelvoUHW::ModuleTypeLibrary());
     platform::SetCurrentSystem({&pc, &desktop, &desktop, &registry, &typeLibraries, &environment});
-    thread.emplace(desktop);
     Check(platform::RegisterServerModule(modulePath), "registering the component");
   }
   ~State() {
     // The process ends with the PC: its threads are gone before what they use is.
-    thread.reset();
     desktop.EndProcess();
     platform::SetCurrentSystem({});
   }
@@ -70,12 +67,11 @@ struct Pc::State {
   const Script script;
   const std::u16string modulePath;
   platform::simulated::SimulatedPc pc;
+  // Made by the thread that plays the script: virtual time stands still while it works.
   platform::simulated::SimulatedDesktop desktop;
   platform::simulated::SimulatedRegistry registry;
   platform::simulated::SimulatedTypeLibraries typeLibraries;
   platform::simulated::SimulatedModuleEnvironment environment;
-  // Virtual time stands still while this thread works.
-  std::optional<platform::simulated::ClientThread> thread;
 };
 
 Pc::Pc(const std::string& machineFile, const std::string& scriptFile) {
