@@ -3,8 +3,9 @@
 
 #include <functional>
 
+#include "platform/host.h"
+#include "platform/setup_api.h"
 #include "platform/simulated/steps.h"
-#include "platform/storage_ioctl.h"
 #include "tests/support/machines.h"
 
 namespace KelvoUHW {
