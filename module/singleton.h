@@ -114,7 +114,7 @@ class CComSingletonExClassFactory : public ObjectRoot, public IClassFactory {
     Instance* instance = State::s_pInstance;
     HRESULT result = S_OK;
     if (instance == nullptr) result = Instance::Create(instance);
-    if (SUCCEEDED(result)) {
+    if (instance != nullptr) {
       instance->AddRef();
       State::s_pInstance = instance;
     }

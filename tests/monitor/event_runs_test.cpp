@@ -1,8 +1,8 @@
 // Runs of the notifier over whole PCs: what sinks hear of what happened.
 #include <gtest/gtest.h>
 
-#include "tests/support/plugs.h"
 #include "tests/support/notifier_process.h"
+#include "tests/support/plugs.h"
 #include "tests/support/test_sink.h"
 
 namespace KelvoUHW {
