@@ -335,7 +335,7 @@ TEST_F(EventNotifier, OtherThreadsWaitToAdviseAndNotToUnadvise) {
   scene.process.Advise(scene.b);
   scene.log.clear();
   scene.tree.lists = {};
-  scene.tree.lists[KDeviceAttached] = {scene.tree.Device(u"d")};
+  scene.tree.lists[KDeviceAttached] = {scene.tree.Device(u"d"), scene.tree.Device(u"e")};
   std::uint64_t advised = 0;
   std::uint64_t unadvised = 1;
   std::uint32_t caller = 0;
@@ -351,25 +351,26 @@ TEST_F(EventNotifier, OtherThreadsWaitToAdviseAndNotToUnadvise) {
     });
     testing_support::Launch(desktop, [&] {
       EXPECT_EQ(scene.process.point->Unadvise(2), S_OK);
+      EXPECT_EQ(scene.process.point->Unadvise(1), S_OK);
       unadvised = desktop.Now();
     });
     desktop.Sleep(120);
+    EXPECT_GE(scene.a.References(), 2) << "the call has one of its own";
     return S_OK;
   };
   const std::uint64_t start = desktop.Now();
   desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
   desktop.Settle();
-  // B left while A was called, and is not called any more; C is in a slot of this round already, and is told what is
-  // connected after the run.
-  EXPECT_EQ(Taken(scene.log), "A 1 d, C 1 d");
+  // A and B left while A was called, and are not called any more; C is in a slot of this round already, and is told
+  // what is connected after the run.
+  EXPECT_EQ(Taken(scene.log), "A 1 d, C 1 d, C 1 e");
   EXPECT_EQ(unadvised - start, 0u);
   EXPECT_EQ(advised - start, 150u);
   // An event thread in the multithreaded apartment: neither the client's nor the window's.
   EXPECT_EQ(apartment, S_FALSE);
   EXPECT_NE(caller, desktop.CurrentThreadId());
   EXPECT_NE(caller, desktop.Windows().at(0).ownerThread);
-  scene.a.onEvent = {};
-  for (DWORD cookie = 1; cookie <= 3; ++cookie) scene.process.point->Unadvise(cookie);
+  EXPECT_EQ(scene.process.point->Unadvise(3), S_OK);
 }
 
 }  // namespace

@@ -67,6 +67,12 @@ TEST_F(EventRuns, AdvisingAnotherInsideACall) {
       pc.a.onEvent = {};
       for (const Change& change : test.meanwhile) pc.process.Do(change);
       pc.process.Advise(pc.b);
+      ComPtr<IZKUMUsbTree> tree;
+      EXPECT_EQ(CoCreateInstance(CLSID_ZKUMUsbTree, nullptr, CLSCTX_INPROC_SERVER, platform::IidOf<IZKUMUsbTree>(),
+                                 tree.PutVoid()),
+                S_OK);
+      ComPtr<IZKUMUsbTreeNode> root;
+      EXPECT_EQ(tree->get_RootNode(root.Put()), S_OK);
       return S_OK;
     };
     EXPECT_EQ(pc.process.Notify(), S_OK);
