@@ -42,7 +42,10 @@ HRESULT VariantEnumerator::Next(ULONG celt, VARIANT* rgVar, ULONG* pCeltFetched)
     VARIANT& target = rgVar[copied];
     // What the caller's array held is not ours to clear.
     VariantInit(&target);
-    if (const HRESULT result = VariantCopy(&target, &(*m_items)[m_position]); FAILED(result)) {
+    // Some of the system's headers take the source by a pointer that may write.
+    const VARIANT& source = (*m_items)[m_position];
+    const HRESULT result = VariantCopy(&target, const_cast<VARIANT*>(&source));
+    if (FAILED(result)) {
       for (ULONG written = 0; written < copied; ++written) VariantClear(&rgVar[written]);
       return result;
     }

@@ -14,6 +14,7 @@
 #include <objbase.h>
 #include <ocidl.h>
 #include <oleauto.h>
+#include <olectl.h>
 #else
 #include "platform/native/com_functions.h"
 #include "platform/native/com_interfaces.h"

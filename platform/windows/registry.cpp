@@ -44,7 +44,8 @@ Status WindowsRegistry::CreateKey(RegistryKeyHandle parent, const char16_t* path
 Status WindowsRegistry::OpenKey(RegistryKeyHandle parent, const char16_t* path,
                                 std::uint32_t access, RegistryKeyHandle& key) noexcept {
   HKEY opened = nullptr;
-  return TakeKey(RegOpenKeyExW(NativeKey(parent), Native(path), 0, access, &opened), opened, key);
+  const LSTATUS code = RegOpenKeyExW(NativeKey(parent), Native(path), 0, access, &opened);
+  return TakeKey(code, opened, key);
 }
 
 Status WindowsRegistry::SetValue(RegistryKeyHandle key, const char16_t* name, std::uint32_t type,
