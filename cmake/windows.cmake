@@ -3,6 +3,10 @@
 
 # Programs run on a PC that has nothing but the system's own DLLs.
 target_link_options(zkusb_options INTERFACE -static)
+# The same sources give the same bytes, in whichever folder and at whatever time they are built.
+target_link_options(zkusb_options INTERFACE -Wl,--no-insert-timestamp)
+target_compile_options(zkusb_options INTERFACE
+  "$<$<COMPILE_LANGUAGE:CXX>:-ffile-prefix-map=${CMAKE_SOURCE_DIR}=.>")
 # Every call of the system in its UTF-16 form, as Windows 7 offers it.
 target_compile_definitions(zkusb_options INTERFACE UNICODE _UNICODE _WIN32_WINNT=0x0601 WINVER=0x0601)
 

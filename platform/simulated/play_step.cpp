@@ -2,16 +2,13 @@
 
 #include <variant>
 
-#include "platform/simulated/broadcasts.h"
 #include "platform/simulated/steps.h"
 
 namespace platform::simulated {
 
-namespace {
-constexpr std::uint32_t kRealLead = 100;
-}  // namespace
-
-Text PlayStep(SimulatedPc& pc, SimulatedDesktop& desktop, const Step& step) {
+Text PlayStep(SimulatedPc& pc, const Step& step,
+              const std::function<void(const DeviceBroadcast&)>& send,
+              const std::function<void()>& lead) {
   const Machine before = pc.Snapshot();
   Machine after = before;
   Text reason =
@@ -19,17 +16,21 @@ Text PlayStep(SimulatedPc& pc, SimulatedDesktop& desktop, const Step& step) {
   if (!reason.empty()) return reason;
 
   const auto tell = [&] {
-    for (const DeviceBroadcast& broadcast : BroadcastsOf(before, after)) {
-      desktop.Broadcast(broadcast);
-    }
+    for (const DeviceBroadcast& broadcast : BroadcastsOf(before, after)) send(broadcast);
   };
   if (step.broadcast == BroadcastTime::Before) {
     tell();
-    desktop.RunFor(desktop.Mode() == ClockMode::Virtual ? 0 : kRealLead);
+    lead();
   }
   reason = pc.Apply(step);
   if (step.broadcast == BroadcastTime::After) tell();
   return reason;
+}
+
+Text PlayStep(SimulatedPc& pc, SimulatedDesktop& desktop, const Step& step) {
+  return PlayStep(
+      pc, step, [&](const DeviceBroadcast& broadcast) { desktop.Broadcast(broadcast); },
+      [&] { desktop.RunFor(desktop.Mode() == ClockMode::Virtual ? 0 : kRealLeadMilliseconds); });
 }
 
 }  // namespace platform::simulated

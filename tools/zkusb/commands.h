@@ -23,8 +23,8 @@ bool PrintVolumes(const NodeView& root, bool json, Writer& out);
 // behind its end. Throws std::runtime_error when the PC refuses a step.
 void Watch(Pc& pc, std::uint32_t milliseconds, bool json, Writer& out);
 
-// What registering the component has written.
-void PrintRegistration(const Pc& pc, bool json, Writer& out);
+// Registers the component and prints what that has written.
+void PrintRegistration(Pc& pc, bool json, Writer& out);
 // Takes the registration back, and prints what went and what stays.
 void PrintUnregistration(Pc& pc, bool json, Writer& out);
 

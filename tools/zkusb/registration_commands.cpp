@@ -20,7 +20,8 @@ Json LinesJson(const std::vector<std::u16string>& lines) {
 
 }  // namespace
 
-void PrintRegistration(const Pc& pc, bool json, Writer& out) {
+void PrintRegistration(Pc& pc, bool json, Writer& out) {
+  pc.Register();
   const std::vector<std::u16string> written = pc.RegistryLines();
   if (json) {
     out.Json({{"written", LinesJson(written)}}, true);

@@ -49,12 +49,16 @@ struct Pc::State {
         environment(modulePath) {
     typeLibraries.Add(modulePath, KelvoUHW::ModuleTypeLibrary());
     platform::SetCurrentSystem({&pc, &desktop, &desktop, &registry, &typeLibraries, &environment});
-    Check(platform::RegisterServerModule(modulePath), "registering the component");
+    Register();
   }
   ~State() {
     // The process ends with the PC: its threads are gone before what they use is.
     desktop.EndProcess();
     platform::SetCurrentSystem({});
+  }
+
+  void Register() const {
+    Check(platform::RegisterServerModule(modulePath), "registering the component");
   }
 
   void Refuse(std::size_t step, const std::u16string& reason) const {
@@ -108,6 +112,8 @@ void Pc::Settle() { m_state->desktop.Settle(); }
 std::uint64_t Pc::Now() const { return m_state->desktop.Now(); }
 
 std::vector<std::u16string> Pc::RegistryLines() const { return m_state->registry.Snapshot(); }
+
+void Pc::Register() { m_state->Register(); }
 
 void Pc::Unregister() {
   Check(platform::UnregisterServerModule(m_state->modulePath), "unregistering the component");

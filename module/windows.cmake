@@ -1,0 +1,30 @@
+# The module as a Windows DLL: ${CMAKE_BINARY_DIR}/NAME.dll.
+enable_language(RC)
+
+# The sources behind the name are those the DLL has besides the component.
+function(zkusb_windows_module name)
+  set(resources ${CMAKE_SOURCE_DIR}/module/zkusb_monitor.rc)
+  set(exports ${CMAKE_SOURCE_DIR}/module/exports.def)
+  set(scripts ${CMAKE_SOURCE_DIR}/module/scripts)
+  add_library(${name} SHARED
+    ${CMAKE_SOURCE_DIR}/module/exports.cpp ${exports} ${resources} ${ARGN})
+  target_link_libraries(${name} PRIVATE zkusb_component)
+
+  string(REPLACE "." "," numbers "${PROJECT_VERSION}")
+  set_source_files_properties(${resources} PROPERTIES
+    INCLUDE_DIRECTORIES "${CMAKE_BINARY_DIR}/generated;${CMAKE_SOURCE_DIR}/module"
+    OBJECT_DEPENDS "${CMAKE_BINARY_DIR}/generated/zkusb_monitor.tlb;${scripts}/module.rgs;${scripts}/event_notifier.rgs;${scripts}/usb_tree.rgs")
+  target_compile_definitions(${name} PRIVATE $<$<COMPILE_LANGUAGE:RC>:
+    ZKUSB_VERSION_NUMBERS=${numbers},0
+    ZKUSB_VERSION=${PROJECT_VERSION}
+    ZKUSB_FILE_NAME=${name}.dll>)
+  add_dependencies(${name} zkusb_type_library_file)
+
+  # 32-bit names of the calling convention carry the bytes of their parameters; the exported ones do not.
+  target_link_options(${name} PRIVATE -s -Wl,--enable-stdcall-fixup -Wl,--kill-at)
+  set_target_properties(${name} PROPERTIES
+    PREFIX ""
+    RUNTIME_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}
+    ARCHIVE_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib
+    LINK_DEPENDS ${exports})
+endfunction()
