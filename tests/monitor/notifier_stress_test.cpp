@@ -162,7 +162,7 @@ TEST_F(NotifierStress, ClientsComeAndGoWhileBroadcastsArrive) {
   EXPECT_EQ(seen.alive, 0);
   EXPECT_GE(seen.events[KDeviceConnected], 500);
   for (const TDeviceEventType kind : {KDeviceAttached, KDeviceRemoved, KDeviceModified}) {
-    EXPECT_GE(seen.events[kind], 50) << kind;
+    EXPECT_GE(seen.events.at(static_cast<std::size_t>(kind)), 50) << kind;
   }
   EXPECT_GE(seen.advised, 50);
   EXPECT_GE(seen.fromInside, 20);
