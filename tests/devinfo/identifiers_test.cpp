@@ -52,7 +52,6 @@ TEST(InstanceId, IsTakenApart) {
       {u"USB\\VID_046D&PID_C52B&MI_00\\6&1A&0&0000", 0x046D, 0xC52B, u"V", u"P", u"6&1A&0&0000"},
       {u"USBSTOR\\DISK&VEN_X&PROD_Y&REV_1.00\\4C53&0", kNone, 8, u"X", u"Y&REV_1.00", u"4C53&0"},
       {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04\\3&11583659&0&A0", kNone, 8, u"8086", u"", u"S"},
-      {u"ROOT\\VOLMGR\\0000", kNone, 8, u"", u"P", u"S"},
       {u"", kNone, 8, u"", u"P", u"S"},
       {u"USB\\VID_046D\\1", kNone, 8, u"", u"P", u"S"},
       {u"USB\\VID_046D\\VEN_A&PROD_B\\1", 0x046D, kNone, u"V", u"P", u"S"},
@@ -60,7 +59,6 @@ TEST(InstanceId, IsTakenApart) {
       {u"USB\\VID_1&PID_2\\", 1, 2, u"V", u"P", u"S"},
       {u"USB\\VID_1&PID_2", 1, kNone, u"V", u"P", u"S"},
       {u"PID_2\\VID_1&X", 1, kNone, u"V", u"P", u"S"},
-      {u"vid_1&pid_2\\X", kNone, 8, u"", u"P", u"S"},
       {u"A\\VEN_X&PROD_Y", kNone, 8, u"X", u"", u"S"},
       {u"A\\VEN_X&PROD_Y\\", kNone, 8, u"X", u"Y", u"S"},
       {u"VEN_&PROD_\\X", kNone, 8, u"", u"", u"X"}};
@@ -105,12 +103,10 @@ TEST(GuidText, FollowsTheRulesOfAScan) {
     bool whole;
   };
   // Blanks do not count against a width, but against the place where a group must end.
-  const Case cases[] = {{u"{12345678-9abc-def0-1234-56789abcdef0}", 0x12345678, 0x9ABC, 0xDEF0, true},
-                        {u"x12345678-9ABC-DEF0-1234-56789ABCDEF0 more", 0x12345678, 0x9ABC, 0xDEF0, true},
+  const Case cases[] = {{u"x12345678-9ABC-DEF0-1234-56789ABCDEF0 more", 0x12345678, 0x9ABC, 0xDEF0, true},
                         {u"{ 2345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x2345678, 0x9ABC, 0xDEF0, true},
                         {u"{ 12345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
                         {u"{12345678 -9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0, 0, false},
-                        {u"{+2345678-+ABC-DEF0-1234-56789ABCDEF0}", 0x2345678, 0xABC, 0xDEF0, true},
                         {u"{-2345678--ABC-DEF0-1234-56789ABCDEF0}", 0xFDCBA988, 0xF544, 0xDEF0, true},
                         {u"{0x345678-0XBC-DEF0-1234-56789ABCDEF0}", 0x345678, 0xBC, 0xDEF0, true},
                         {u"{12345678-0x-DEF0-1234-56789ABCDEF0}", 0x12345678, 0, 0, false},
@@ -118,8 +114,6 @@ TEST(GuidText, FollowsTheRulesOfAScan) {
                         {u"{1234567-9ABC-DEF0-1234-56789ABCDEF0}", 0x1234567, 0x9ABC, 0xDEF0, false},
                         {u"{12345678-9ABCD-EF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0, false},
                         {u"12345678-1234-5678-9ABC-DEF012345678", 0x2345678, 0x1234, 0x5678, false},
-                        {u"{", 0, 0, 0, false},
-                        {u"", 0, 0, 0, false},
                         {nullptr, 0, 0, 0, false}};
   for (const Case& c : cases) {
     EXPECT_EQ(ParseGuidText(c.text), (Guid{c.data1, c.data2, c.data3, c.whole ? kGoodBytes : kNoBytes}))
@@ -160,11 +154,8 @@ TEST(PciHardwareId, NeedsAllFourNumbers) {
   const Case cases[] = {{u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04", true, 0x8086, 0x1E31, 0x1E318086, 4},
                         {u"PCI\\VEN_ 8086&DEV_+1&SUBSYS_-1&REV_0x4Z", true, 0x8086, 1, 0xFFFFFFFF, 4},
                         {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1&REV_", false, 0x8086, 0x1E31, 1, 0},
-                        {u"PCI\\VEN_8086&DEV_1E31&CC_0C03", false, 0x8086, 0x1E31, 0, 0},
                         {u"PCI\\VEN_8086 &DEV_1E31", false, 0x8086, 0, 0, 0},
                         {u"pci\\VEN_8086&DEV_1E31&SUBSYS_1&REV_1", false, 0, 0, 0, 0},
-                        {u" PCI\\VEN_8086&DEV_1E31&SUBSYS_1&REV_1", false, 0, 0, 0, 0},
-                        {u"", false, 0, 0, 0, 0},
                         {nullptr, false, 0, 0, 0, 0}};
   for (const Case& c : cases) {
     const PciHardwareId id = ParsePciHardwareId(c.text);
@@ -176,15 +167,13 @@ TEST(PciHardwareId, NeedsAllFourNumbers) {
 
 TEST(Identifiers, ReadabilitySetsNoLimitToTheLength) {
   EXPECT_FALSE(IsReadableText(nullptr));
-  for (const std::size_t length : {0u, 511u, 512u, 513u, 100000u}) {
-    const std::u16string padding(length, u'A');
-    EXPECT_TRUE(IsReadableText(padding.c_str()));
-    NodeIdentity node;
-    node.SetInstanceId(padding + u"VID_046D&" + padding + u"PID_C52B\\" + padding + u"\\S1");
-    EXPECT_THAT((std::array{node.m_nVendorId, node.m_nProductId}), ElementsAre(0x46D, 0xC52B)) << length;
-    EXPECT_EQ(node.m_strSerialNumber, u"S1") << length;
-    EXPECT_EQ(InterfacePathToInstanceId((padding + u"#b#{c}").c_str()), padding + u"\\B") << length;
-  }
+  const std::u16string padding(100'000, u'A');
+  EXPECT_TRUE(IsReadableText(padding.c_str()));
+  NodeIdentity node;
+  node.SetInstanceId(padding + u"VID_046D&" + padding + u"PID_C52B\\" + padding + u"\\S1");
+  EXPECT_THAT((std::array{node.m_nVendorId, node.m_nProductId}), ElementsAre(0x46D, 0xC52B));
+  EXPECT_EQ(node.m_strSerialNumber, u"S1");
+  EXPECT_EQ(InterfacePathToInstanceId((padding + u"#b#{c}").c_str()), padding + u"\\B");
 }
 
 }  // namespace

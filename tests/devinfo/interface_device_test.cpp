@@ -8,7 +8,7 @@ namespace {
 
 TEST(InterfaceDevice, NamesOfDeviceTypes) {
   std::u16string names;
-  for (const unsigned type : {0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 255}) {
+  for (const int type : {0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 255}) {
     names.append(StorageDeviceTypeName(static_cast<std::uint8_t>(type))).append(u"|");
   }
   EXPECT_EQ(names,
@@ -17,26 +17,9 @@ TEST(InterfaceDevice, NamesOfDeviceTypes) {
             u"RBC Device|Unknown Device|Unknown Device|Unknown Device|");
 }
 
-std::u16string DumpOf(const CZKUMInterfaceDeviceImpl& record) {
-  std::u16string out = u"before|\r\n";
-  record.ToString(out, u"> ");
-  return out;
-}
-
-TEST(InterfaceDevice, Dumps) {
-  CZKUMInterfaceDeviceImpl disk;  // its descriptor is never received
-  disk.m_strDevInstId = u"USBSTOR\\DISK\\1";
-  EXPECT_EQ(disk.m_nType, KUDTInterfaceDevice);
-  EXPECT_EQ(disk.InterfaceData.cbSize, sizeof(platform::SP_DEVICE_INTERFACE_DATA));
-  EXPECT_EQ(disk.MountPoint(), u"");
-  EXPECT_EQ(DumpOf(disk),
-            u"before|\r\n>  Interface ++++++++++++++++++++++++++++\r\n"
-            u"> DevInstId            : USBSTOR\\DISK\\1\r\n"
-            u"> devInstHandle        : -1\r\n> devInstHandleParent  : -1\r\n> Device Properties:\r\n"
-            u"> Device Type         : 0x0 (Direct Access Device)\r\n> Removable Media     : No\r\n"
-            u"> Vendor ID           : \r\n> Product ID          : \r\n> Product Revision    : \r\n"
-            u"> DevicePath: \r\n> Volume serial number: -1\r\n> devVolumeName   : \r\n"
-            u"childvector size0\r\nChildsToString End\r\n");
+// The golden dumps of whole PCs show records of disks, whose descriptor is never received.
+TEST(InterfaceDevice, DumpsWhatItHas) {
+  EXPECT_EQ(CZKUMInterfaceDeviceImpl().InterfaceData.cbSize, sizeof(platform::SP_DEVICE_INTERFACE_DATA));
   CZKUMInterfaceDeviceImpl volume;
   volume.m_devInstHandle = volume.m_devInstHandleParent = 0;
   volume.m_strSerialNumber = u"4C53";
@@ -52,7 +35,9 @@ TEST(InterfaceDevice, Dumps) {
   volume.Descriptor[9] = 0xAB;
   volume.Descriptor[10] = 2;
   EXPECT_EQ(volume.MountPoint(), u"E:\\");
-  EXPECT_EQ(DumpOf(volume),
+  std::u16string dump = u"before|\r\n";
+  volume.ToString(dump, u"> ");
+  EXPECT_EQ(dump,
             u"before|\r\n>  Interface ++++++++++++++++++++++++++++\r\n> serial number        : 4C53\r\n"
             u"> Device Properties:\r\n> Device Type         : 0x1F (Unknown Device)\r\n"
             u"> Device Modifier : 0xab\r\n> Removable Media     : Yes\r\n> Vendor ID           : SanDisk \r\n"
