@@ -6,116 +6,77 @@
 
 #include "platform/setup_api.h"
 #include "platform/text.h"
-#include "tests/support/machines.h"
+#include "tests/support/plugs.h"
 
 namespace testing_support {
 namespace {
 
 namespace simulated = platform::simulated;
 using namespace platform::simulated;
+using KelvoUHW::AddNode;
+using KelvoUHW::DriverKey;
 
-constexpr char16_t kVolumeManager[] = u"ROOT\\VOLMGR\\0000";
-constexpr char16_t kDiskClassText[] = u"#{53f56307-b6bf-11d0-94f2-00a0c91efb8b}";
-constexpr char16_t kVolumeClassText[] = u"#{53f5630d-b6bf-11d0-94f2-00a0c91efb8b}";
-
-Text DiskPath(const Text& diskId) { return u"\\\\?\\" + platform::Replaced(diskId, u'\\', u'#') + kDiskClassText; }
+Text SerialOf(const Gadget& gadget) { return gadget.id.substr(gadget.id.rfind(u'\\') + 1); }
 
 // Several volumes of one disk: the first as Windows names it, the others with something behind it.
-Text VolumeId(const Text& diskId, const Text& volumeName) {
-  const Text id = u"STORAGE\\VOLUME\\_??_" + platform::Replaced(diskId, u'\\', u'#') + kDiskClassText +
-                  volumeName.substr(volumeName.size() - 3, 1);
-  return platform::ToUpper(id);
+Text VolumeId(const Text& diskId, const Text& name) {
+  return KelvoUHW::VolumeId(diskId, name.substr(name.size() - 3, 1));
 }
 
-void AddNode(Machine& machine, const Text& id, const Text& parent, const Text& deviceClass, const Text& service) {
-  const Text driver = u"{" + deviceClass + u"}\\" + id.substr(id.find(u'\\') + 1);
-  machine.devices.push_back(DeviceNode(id, parent, deviceClass, driver, service + u" device"));
-  machine.devices.back().service = service;
-}
-
-void AddStorage(Machine& machine, const platform::Guid& interfaceClass, const Text& path, const Text& device) {
-  machine.interfaces.push_back({interfaceClass, path, device});
-  Storage storage;
-  storage.path = path;
-  storage.deviceType = std::uint8_t{0};
-  storage.removable = true;
-  machine.storage.push_back(storage);
-}
-
-void AddVolume(Machine& machine, const Text& diskId, const Text& name) {
+// A volume that is mounted nowhere.
+void AddVolume(simulated::Plug& plug, const Text& diskId, const Text& name) {
   const Text id = VolumeId(diskId, name);
-  AddNode(machine, id, kVolumeManager, u"Volume", u"volume");
-  machine.devices.back().physicalName = u"\\Device\\Volume" + name.substr(name.size() - 10, 8);
-  AddStorage(machine, platform::GUID_DEVINTERFACE_VOLUME,
-             u"\\\\?\\" + platform::Replaced(id, u'\\', u'#') + kVolumeClassText, id);
-  Volume volume;
-  volume.name = name;
-  volume.device = id;
-  volume.serial = 7;
-  volume.driveType = platform::kDRIVE_REMOVABLE;
-  machine.volumes.push_back(volume);
+  AddNode(plug, id, KelvoUHW::kVolumeManagerId, u"Volume", u"volume");
+  plug.fragment.devices.back().physicalName = u"\\Device\\Volume" + name.substr(name.size() - 10, 8);
+  KelvoUHW::AddStorageInterface(plug, platform::GUID_DEVINTERFACE_VOLUME, id, diskId);
+  plug.fragment.volumes.push_back({name, id, {}, 7, platform::kDRIVE_REMOVABLE, false, {}});
 }
 
 // Everything a gadget brings; the result says what stands on its port.
-Port AddGadget(Machine& machine, const Gadget& gadget, const Text& hubDevice) {
+Port AddGadget(simulated::Plug& plug, const Gadget& gadget, const Text& hubDevice) {
   static constexpr const char16_t* kServices[kKinds] = {u"HidUsb", u"HidUsb", u"USBSTOR", u"usbccgp",
                                                         u"STHDA",  u"usbhub", u"USBSTOR"};
-  AddNode(machine, gadget.id, hubDevice, u"USB", kServices[static_cast<std::size_t>(gadget.kind)]);
-  const Text driver = *machine.devices.back().driver;
-  const Text serial = gadget.id.substr(gadget.id.rfind(u'\\') + 1);
-  switch (gadget.kind) {
-    case Kind::Mouse:
-      AddNode(machine, u"HID\\VID_046D\\" + serial, gadget.id, u"Mouse", u"mouhid");
-      break;
-    case Kind::Keyboard:
-      AddNode(machine, u"HID\\VID_413C\\" + serial, gadget.id, u"Keyboard", u"kbdhid");
-      break;
-    case Kind::Composite:
-      for (const Text function : {u"VID_1&PID_2&MI_00\\", u"VID_1&PID_2&MI_01\\"}) {
-        AddNode(machine, u"USB\\" + function + serial, gadget.id, u"HIDClass", u"HidUsb");
-        AddNode(machine, u"HID\\" + function + serial, u"USB\\" + function + serial, u"Keyboard", u"kbdhid");
-      }
-      break;
-    case Kind::Hub:
-      machine.hubs.push_back({HubName(gadget.id), std::vector<Port>(4), false});
-      return HubOnPort(driver, HubName(gadget.id));
-    case Kind::Unreported:
-    case Kind::Stick:
-    case Kind::CardReader:
-      break;
+  AddNode(plug, gadget.id, hubDevice, u"USB", kServices[static_cast<std::size_t>(gadget.kind)]);
+  const Text serial = SerialOf(gadget);
+  if (gadget.kind == Kind::Mouse) AddNode(plug, u"HID\\VID_046D\\" + serial, gadget.id, u"Mouse", u"mouhid");
+  if (gadget.kind == Kind::Keyboard) AddNode(plug, u"HID\\VID_413C\\" + serial, gadget.id, u"Keyboard", u"kbdhid");
+  if (gadget.kind == Kind::Composite) {
+    for (const Text function : {u"VID_1&PID_2&MI_00\\", u"VID_1&PID_2&MI_01\\"}) {
+      AddNode(plug, u"USB\\" + function + serial, gadget.id, u"HIDClass", u"HidUsb");
+      AddNode(plug, u"HID\\" + function + serial, u"USB\\" + function + serial, u"Keyboard", u"kbdhid");
+    }
+  }
+  if (gadget.kind == Kind::Hub) {
+    plug.fragment.hubs.push_back({HubName(gadget.id), std::vector<Port>(4), false});
+    return HubOnPort(DriverKey(gadget.id), HubName(gadget.id));
   }
   for (std::size_t disk = 0; disk < gadget.disks.size(); ++disk) {
-    const Text diskId = DiskId(gadget, disk);
-    AddNode(machine, diskId, gadget.id, u"DiskDrive", u"disk");
-    AddStorage(machine, platform::GUID_DEVINTERFACE_DISK, DiskPath(diskId), diskId);
-    for (const Text& name : gadget.disks[disk]) AddVolume(machine, diskId, name);
+    KelvoUHW::AddDisk(plug, DiskId(gadget, disk), gadget.id);
+    for (const Text& name : gadget.disks[disk]) AddVolume(plug, DiskId(gadget, disk), name);
   }
-  return DevicePort(driver, 0x0781, 0x5580);
+  return DevicePort(DriverKey(gadget.id), 0x0781, 0x5580);
 }
 
 // Half of the PCs have root hubs whose service is reported, as newer systems have.
 Machine EmptyPc(std::uint32_t controllers, bool reportedHubs) {
-  Machine machine;
-  AddNode(machine, u"ACPI\\PNP0A08\\0", u"", u"System", u"pci");
-  AddNode(machine, kVolumeManager, u"", u"System", u"volmgr");
+  simulated::Plug parts;
+  AddNode(parts, u"ACPI\\PNP0A08\\0", u"", u"System", u"pci");
+  AddNode(parts, KelvoUHW::kVolumeManagerId, u"", u"System", u"volmgr");
   for (std::uint32_t i = 0; i < controllers; ++i) {
     const Text number = platform::Decimal(static_cast<std::int32_t>(i));
-    const Text controller = kControllerId + number;
-    AddNode(machine, controller, u"ACPI\\PNP0A08\\0", u"USB", u"usbehci");
-    const Text driver = *machine.devices.back().driver;
-    const Text hub = u"USB\\ROOT_HUB20\\4&" + number;
-    AddNode(machine, hub, controller, u"USB", reportedHubs ? u"USBHUB3" : u"usbhub");
-    machine.hostControllers.push_back({{u"\\\\.\\HCD" + number}, driver, HubName(hub)});
-    machine.hubs.push_back({HubName(hub), std::vector<Port>(4), false});
+    const Text controller = kControllerId + number, hub = u"USB\\ROOT_HUB20\\4&" + number;
+    AddNode(parts, controller, u"ACPI\\PNP0A08\\0", u"USB", u"usbehci");
+    AddNode(parts, hub, controller, u"USB", reportedHubs ? KelvoUHW::kNewHubService : KelvoUHW::kOldHubService);
+    parts.fragment.hostControllers.push_back({{u"\\\\.\\HCD" + number}, DriverKey(controller), HubName(hub)});
+    parts.fragment.hubs.push_back({HubName(hub), std::vector<Port>(4), false});
   }
-  return machine;
+  return parts.fragment;
 }
 
 }  // namespace
 
 Text DiskId(const Gadget& gadget, std::size_t disk) {
-  return u"USBSTOR\\DISK&VEN_X&PROD_Y\\" + gadget.id.substr(gadget.id.rfind(u'\\') + 1) + u"&" +
-         platform::Decimal(static_cast<std::int32_t>(disk));
+  return KelvoUHW::DiskId(SerialOf(gadget), static_cast<std::uint32_t>(disk));
 }
 
 RandomPc::RandomPc(std::uint32_t seed) : m_random(seed) {
@@ -161,7 +122,7 @@ void RandomPc::Plug(Gadget& gadget) {
   PortChange change = free[Below(static_cast<std::uint32_t>(free.size()))];
   const Text hub = platform::Replaced(change.hub.substr(0, change.hub.rfind(u"#{")), u'#', u'\\');
   simulated::Plug plug;
-  change.port = AddGadget(plug.fragment, gadget, hub);
+  change.port = AddGadget(plug, gadget, hub);
   plug.ports.push_back(std::move(change));
   Apply({0, {}, std::move(plug)}, "plug", gadget.id);
   gadget.plugged = true;
@@ -185,7 +146,7 @@ void RandomPc::ChangeCard(Gadget& gadget) {
   if (cards.empty()) {
     cards.push_back(NewVolume());
     simulated::Plug plug;
-    AddVolume(plug.fragment, diskId, cards[0]);
+    AddVolume(plug, diskId, cards[0]);
     Apply({0, {}, std::move(plug)}, "put a card into", diskId);
   } else {
     Apply({0, {}, simulated::Unplug{VolumeId(diskId, cards[0])}}, "take the card from", diskId);
