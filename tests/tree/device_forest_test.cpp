@@ -2,14 +2,14 @@
 
 #include <gtest/gtest.h>
 
+#include <optional>
 #include <sstream>
 #include <string>
 
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/failing_host.h"
 #include "tests/support/machines.h"
-#include "tree/port_device.h"
-#include "tree/records.h"
+#include "tests/support/outline.h"
 
 namespace KelvoUHW {
 namespace {
@@ -37,6 +37,7 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
     void (*change)(Device&);
     std::string names;
     std::size_t setsLeftOpen = 0;
+    std::optional<Operation> fails{};
   };
   const Case cases[] = {
       {"all", [](Device&) {}, "first second third "},
@@ -57,15 +58,22 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
       {"a processor without parent", [](Device& d) { d.noParent = true, d.deviceClass = u"Processor"; }, "", 1},
       {"no parent and no class, which is asked first", [](Device& d) { d.noParent = true, d.deviceClass.reset(); },
        "first third "},
+      {"no set", [](Device&) {}, "", 0, Operation::GetClassDevs},
+      {"no image list", [](Device&) {}, "", 0, Operation::GetClassImageList},
+      {"no image for any", [](Device&) {}, "", 0, Operation::GetClassImageIndex},
   };
   for (const Case& c : cases) {
     Machine machine = ThreeDevices();
     c.change(machine.devices[1]);
     SimulatedPc pc(machine);
+    FailingHost host(
+        pc, {.call = c.fails ? 1u : platform::wrappers::FailurePlan::kNever, .onwards = true, .operation = c.fails});
     std::string names;
-    for (const DeviceNodeRecord& record : ReadDeviceRecords(pc)) names += platform::ToUtf8(record.Name) + " ";
+    for (const DeviceNodeRecord& record : ReadDeviceRecords(host)) names += platform::ToUtf8(record.Name) + " ";
     EXPECT_EQ(names, c.names) << c.what;
+    EXPECT_EQ(host.Failures() != 0, c.fails.has_value()) << c.what;
     EXPECT_EQ(pc.Open(), (OpenCounts{.sets = c.setsLeftOpen})) << c.what;
+    EXPECT_TRUE(pc.Misuses().empty()) << c.what;
   }
 }
 
@@ -79,23 +87,10 @@ TEST(DeviceRecords, FieldsAreThoseOfTheDevice) {
   EXPECT_EQ(records[0].ParentDevInst, platform::simulated::kRootDeviceNumber);
   EXPECT_EQ(records[0].ParentInstanceId + records[0].Location, platform::simulated::kRootDeviceId);
   const DeviceNodeRecord& record = records[1];
-  EXPECT_EQ(record.DevInst, 2u);
-  EXPECT_EQ(record.ParentDevInst, 1u);
-  EXPECT_EQ(record.InstanceId + u" below " + record.ParentInstanceId, u"PCI\\B below ACPI\\A");
-  EXPECT_EQ(record.ClassName + u": " + record.ClassDescription, u"Display: Display adapters");
-  EXPECT_EQ(record.Location + u", " + record.HardwareId, u"slot 3, PCI\\FIRST");
-}
-
-TEST(DeviceRecords, WithoutSetOrImageListThereIsNone) {
-  SimulatedPc pc(ThreeDevices());
-  for (const Operation operation :
-       {Operation::GetClassDevs, Operation::GetClassImageList, Operation::GetClassImageIndex}) {
-    FailingHost host(pc, {.call = 1, .onwards = true, .operation = operation});
-    EXPECT_TRUE(ReadDeviceRecords(host).empty());
-    EXPECT_GT(host.Failures(), 0u);
-    EXPECT_EQ(pc.Open(), OpenCounts{});
-  }
-  EXPECT_TRUE(pc.Misuses().empty());
+  EXPECT_EQ(record.DevInst * 100 + record.ParentDevInst, 201u);
+  EXPECT_EQ(record.InstanceId + u" < " + record.ParentInstanceId + u", " + record.ClassName + u": " +
+                record.ClassDescription + u", " + record.Location + u", " + record.HardwareId,
+            u"PCI\\B < ACPI\\A, Display: Display adapters, slot 3, PCI\\FIRST");
 }
 
 // Records from words such as "d*b": name, class, parent ("-" for one that is nowhere).
@@ -166,27 +161,10 @@ DeviceNodeRecord Record(std::u16string id, Records children = {}) {
   return record;
 }
 
-// One line a node: dots for its depth, kind, ids and what is particular to its kind.
-void Write(const NodePtr& node, const std::string& dots, std::string& text) {
-  text += dots + std::to_string(node->m_nType) + " " + platform::ToUtf8(node->m_strDevInstId) + " < " +
-          platform::ToUtf8(node->m_strDevInstIdParent);
-  if (node->m_nType == KUDTPortDevice) {
-    text += "'" + platform::ToUtf8(node->m_strDeviceDescr) + "' '" + platform::ToUtf8(node->m_strDriverKeyName) + "' " +
-            std::to_string(node->m_devInstHandle);
-    EXPECT_EQ(static_cast<const CZKUMPortDeviceImpl&>(*node).ConnectionInfo(), nullptr);
-  }
-  EXPECT_TRUE(node->m_nType != KUDTHubPort || static_cast<const CZKUMHubPortImpl&>(*node).m_nPortIndex == 0);
-  text += "\n";
-  for (const NodePtr& child : node->m_childs) {
-    EXPECT_EQ(child->m_pParent, node.Get());
-    Write(child, dots + ".", text);
-  }
-}
-
 std::string NodesOf(const Records& forest, const NodePtr& root) {
   AddForestNodes(forest, *root);
   std::string text;
-  for (const NodePtr& child : root->m_childs) Write(child, "", text);
+  for (const NodePtr& child : root->m_childs) text += OutlineOf(child);
   return text;
 }
 
@@ -200,18 +178,18 @@ TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
       {"no PCI device", {Record(u"ACPI\\A", {Record(u"pci\\B", {Record(u"IDE\\D")})})}, ""},
       {"below something else, by the text anywhere in its id, and after one at the top",
        {Record(u"PCI\\T"), Record(u"ACPI\\A", {Record(u"ACPI\\B", {Record(u"XPCI\\C")})})},
-       "2 PCI\\T < of PCI\\T\n2 XPCI\\C < of XPCI\\C\n"},
+       "controller PCI\\T < of PCI\\T\ncontroller XPCI\\C < of XPCI\\C\n"},
       {"two levels and no more, and a PCI device below another is no controller",
        {Record(u"PCI\\C", {Record(u"PCI\\H", {Record(u"IDE\\D", {Record(u"PCI\\DEEP")})}), Record(u"IDE\\E")})},
-       "2 PCI\\C < of PCI\\C\n.3 PCI\\H < of PCI\\H\n"
-       "..4 IDE\\D port 0 < of IDE\\D\n"
-       "...5 IDE\\D < 'name of IDE\\D' 'class of IDE\\D' 77\n"
-       ".3 IDE\\E < of IDE\\E\n"},
+       "controller PCI\\C < of PCI\\C\n.hub PCI\\H '' < of PCI\\H\n"
+       "..port 0 status 0 IDE\\D port 0 < of IDE\\D\n...device IDE\\D 'name of IDE\\D' class of IDE\\D speed 0\n"
+       ".hub IDE\\E '' < of IDE\\E\n"},
       {"the same node twice: what hangs below the second is lost",
        {Record(u"PCI\\C", {Record(u"H", {Record(u"D"), Record(u"D"), Record(u"E")}), Record(u"H", {Record(u"F")})}),
         Record(u"PCI\\C", {Record(u"G")})},
-       "2 PCI\\C < of PCI\\C\n.3 H < of H\n..4 D port 0 < of D\n...5 D < 'name of D' 'class of D' 77\n"
-       "..4 E port 0 < of E\n...5 E < 'name of E' 'class of E' 77\n"},
+       "controller PCI\\C < of PCI\\C\n.hub H '' < of H\n"
+       "..port 0 status 0 D port 0 < of D\n...device D 'name of D' class of D speed 0\n"
+       "..port 0 status 0 E port 0 < of E\n...device E 'name of E' class of E speed 0\n"},
   };
   for (const Case& c : cases) {
     EXPECT_EQ(NodesOf(c.forest, MakeRecord<CZKUMUsbTreeRootImpl>()), c.nodes) << c.what;
@@ -223,7 +201,7 @@ TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
   walked->SetInstanceId(u"PCI\\C");
   walked->m_strDeviceDescr = u"described";
   AddChild(walked, root.Get());
-  EXPECT_EQ(NodesOf({Record(u"PCI\\C")}, root), "2 PCI\\C < \n2 PCI\\C < of PCI\\C\n");
+  EXPECT_EQ(NodesOf({Record(u"PCI\\C")}, root), "controller PCI\\C\ncontroller PCI\\C < of PCI\\C\n");
   EXPECT_EQ(FindByInstanceId(root, u"PCI\\C"), walked);
 }
 

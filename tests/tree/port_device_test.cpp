@@ -10,16 +10,13 @@
 namespace KelvoUHW {
 namespace {
 
-// A mass-storage configuration: one interface with its string, two bulk endpoints, a HID descriptor
-// that has no business here, and an unknown one.
+// A configuration of one interface with its string and an endpoint.
 std::unique_ptr<DescriptorRequest> Configuration() {
   auto request = std::make_unique<DescriptorRequest>();
   request->Data = {
-      9, 2,    41,   0, 1,  1,    4,    0xA0, 0x32,  // configuration
-      9, 4,    0,    0, 2,  8,    6,    0x50, 4,     // interface
-      7, 5,    0x81, 2, 0,  2,    0,                 // bulk in
-      9, 0x21, 0x11, 1, 33, 1,    0x22, 0x3F, 0,     // HID
-      7, 0x30, 1,    2, 3,  0xAB, 0xCD,              // unknown
+      9, 2, 25,   0, 1, 1, 4, 0xA0, 0x32,  // configuration
+      9, 4, 0,    0, 2, 8, 6, 0x50, 4,     // interface
+      7, 5, 0x81, 2, 0, 2, 0,              // bulk in
   };
   return request;
 }
@@ -36,8 +33,7 @@ TEST(PortDevice, TakesItsIdentityFromRecordAndStrings) {
     bool record, strings;
     const char16_t* id;
     std::uint32_t vendor, product;
-    const char16_t* serial;
-    const char16_t* manufacturer;
+    const char16_t *serial, *manufacturer;
   };
   const Case cases[] = {
       {"nothing", false, false, u"", kUnknownId, kUnknownId, u"", u""},
@@ -97,16 +93,13 @@ TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
             "> Current Config Value: 0x01\r\n> Device Bus Speed:     High\r\n> DeviceIsHub: no\r\n"
             "> Device Address:       0x09\r\n> Open Pipes:              0\r\n> End ConnectionInfo ---\r\n"
             "> ConfigDesc :::\r\n"
-            "> \r\nConfiguration Descriptor:\r\n> wTotalLength:       0x0029\r\n> bNumInterfaces:       0x01\r\n"
+            "> \r\nConfiguration Descriptor:\r\n> wTotalLength:       0x0019\r\n> bNumInterfaces:       0x01\r\n"
             "> bConfigurationValue:  0x01\r\n> iConfiguration:       0x04\r\n> (LanguageID=0x0409):    \"Stick\"\r\n"
             "> bmAttributes:         0xA0 (> Bus Powered > Remote Wakeup)\r\n"
             "> MaxPower:             0x32 (100 Ma)\r\n"
             "> \r\n> Endpoint Descriptor:\r\n> bEndpointAddress:     0x81  IN\r\n> Transfer Type:        Bulk\r\n"
             "> wMaxPacketSize:       0x0200 (512)\r\n> bInterval:            0x00\r\n"
-            "> \r\nHID Descriptor:\r\n> bcdHID:             0x0111\r\n> bCountryCode:         0x21\r\n"
-            "> bNumDescriptors:      0x01\r\n> bDescriptorType:      0x22\r\n> wDescriptorLength:  0x003F\r\n"
-            "> \r\nUnknown Descriptor:\r\n> bDescriptorType:      0x30\r\n> bLength:              0x07\r\n"
-            "07 30 01 02 03 AB CD \r\n> End ConfigDesc ...\r\n"
+            "> End ConfigDesc ...\r\n"
             "> . \r\nInterface Descriptor:\r\n> . bInterfaceNumber:     0x00\r\n> . bAlternateSetting:    0x00\r\n"
             "> . bNumEndpoints:        0x02\r\n> . bInterfaceClass:      0x08 (Interface: Mass Storage)\r\n"
             "> . bInterfaceSubClass:   0x06 (SCSI transparent)\r\n"

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <span>
 
+#include "platform/text.h"
+
 namespace KelvoUHW {
 namespace {
 
@@ -30,10 +32,7 @@ TEST(ConnectionRecord, BeginsAtZeroAndIsCounted) {
 }
 
 TEST(StringDescriptor, TextEndsWithItsLengthOrTheBytes) {
-  struct {
-    std::vector<std::uint8_t> Bytes;
-    std::u16string_view Text;
-  } const cases[] = {
+  const std::pair<std::vector<std::uint8_t>, std::u16string_view> cases[] = {
       {{}, u""},
       {{6}, u""},
       {{3, 3, 'A', 0}, u""},
@@ -41,34 +40,27 @@ TEST(StringDescriptor, TextEndsWithItsLengthOrTheBytes) {
       {{6, 3, 0x34, 0x12, 'B', 0}, u"\u1234B"},
       {{200, 3, 'A', 0, 'B'}, u"A"},
   };
-  for (const auto& c : cases) {
+  for (const auto& [bytes, text] : cases) {
     StringDescriptorNode node;
-    node.StringDescriptor = c.Bytes;
-    EXPECT_TRUE(node.Text() == c.Text) << &c - cases;
+    node.StringDescriptor = bytes;
+    EXPECT_TRUE(node.Text() == text) << platform::ToUtf8(text);
   }
 }
 
-TEST(StringDescriptor, IsFoundByIndexAndTheFirstOneWins) {
+// Taking a list apart may not need stack for each of its nodes.
+TEST(StringDescriptor, IsFoundByIndexInAListOfAnyLength) {
   std::unique_ptr<StringDescriptorNode> head;
-  for (const int index : {2, 1, 255, 2, 0}) {
-    auto node = std::make_unique<StringDescriptorNode>();
-    node->DescriptorIndex = static_cast<std::uint8_t>(index);
-    node->Next = std::move(head);
-    head = std::move(node);
-  }
-  EXPECT_EQ(FindStringDescriptor(head.get(), 2), head->Next.get());
-  EXPECT_EQ(FindStringDescriptor(head.get(), 255), head->Next->Next.get());
-  EXPECT_EQ(FindStringDescriptor(head.get(), 0), nullptr);
-  EXPECT_EQ(FindStringDescriptor(head.get(), 3), nullptr);
-  EXPECT_EQ(FindStringDescriptor(nullptr, 1), nullptr);
-
-  // Taking a list apart may not need stack for each of its nodes.
   for (int i = 0; i < 1'000'000; ++i) {
     auto node = std::make_unique<StringDescriptorNode>();
+    node->DescriptorIndex = static_cast<std::uint8_t>(i % 200);
     node->Next = std::move(head);
     head = std::move(node);
   }
-  head.reset();
+  EXPECT_EQ(FindStringDescriptor(head.get(), 199), head.get());  // the first of many
+  EXPECT_EQ(FindStringDescriptor(head.get(), 198), head->Next.get());
+  EXPECT_EQ(FindStringDescriptor(head.get(), 0), nullptr);
+  EXPECT_EQ(FindStringDescriptor(head.get(), 200), nullptr);
+  EXPECT_EQ(FindStringDescriptor(nullptr, 1), nullptr);
 }
 
 }  // namespace
