@@ -60,12 +60,9 @@ TEST(ComFunctions, VariantsOwnWhatTheyHold) {
       target.bstrVal = SysAllocString(u"what the target held");
       EXPECT_EQ(VariantCopy(&target, &source), S_OK) << type;
       EXPECT_EQ(target.vt, type);
-      if (type == VT_BSTR) {
-        EXPECT_EQ(platform::BstrText(target.bstrVal), null ? u"" : u"text");
-        EXPECT_EQ(target.bstrVal == source.bstrVal, null);
-      } else {
-        EXPECT_EQ(target.byref, source.byref);
-      }
+      const bool isText = type == VT_BSTR && !null;
+      EXPECT_EQ(isText ? platform::BstrText(target.bstrVal) : u"", isText ? u"text" : u"");
+      EXPECT_EQ(target.byref == source.byref, !isText);
       EXPECT_EQ(object.references, isObject && !null ? 2u : 1u);
       if (isObject && !null) ++object.references;  // the source's own
       EXPECT_EQ(VariantCopy(&target, &target), S_OK);

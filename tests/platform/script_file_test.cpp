@@ -44,15 +44,17 @@ TEST(ScriptFile, ReadsEveryKindOfStep) {
   const auto& [hub, index, port] = plug.ports[0];
   EXPECT_TRUE(hub == u"usb#hub#1" && index == 2 && port.status == 1 && port.speed == Speed::High);
   EXPECT_EQ(plug.fragment.devices.at(0).driver, u"k2");
-  EXPECT_EQ(script[1].atMilliseconds, 5u);
   EXPECT_EQ(std::get<Mount>(script[1].change).path, u"E:\\");
   EXPECT_EQ(std::get<Dismount>(script[2].change).volume, u"\\\\?\\Volume{1}\\");
   EXPECT_TRUE(std::holds_alternative<std::monostate>(script[3].change));
-  EXPECT_EQ(script[4].atMilliseconds, 100u);
   EXPECT_EQ(std::get<Unplug>(script[4].change).device, u"usb\\b\\1");
-  EXPECT_EQ(script[0].broadcast, BroadcastTime::After);
-  EXPECT_EQ(script[3].broadcast, BroadcastTime::None);
-  EXPECT_EQ(script[4].broadcast, BroadcastTime::Before);
+  const std::uint64_t kAt[] = {0, 5, 5, 7, 100};
+  const BroadcastTime kBroadcast[] = {BroadcastTime::After, BroadcastTime::After, BroadcastTime::After,
+                                      BroadcastTime::None, BroadcastTime::Before};
+  for (std::size_t i = 0; i < 5; ++i) {
+    EXPECT_EQ(script[i].atMilliseconds, kAt[i]);
+    EXPECT_EQ(script[i].broadcast, kBroadcast[i]);
+  }
 }
 
 TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
@@ -65,10 +67,7 @@ TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
       {R"({"wait": true, "unplug": "A"})", R"(steps[0]: has both "unplug" and "wait")"},
       {R"({"wait": false})", "steps[0].wait: must be true"},
       {R"({"wait": true, "broadcast": "late"})", R"(steps[0].broadcast: must be one of "after", "before", "none")"},
-      {R"({"wait": true, "when": 1})", R"(steps[0]: unknown member "when")"},
       {wait + R"({"at": 8, "wait": true})", "steps[1].at: 8 goes back (the step before is at 9)"},
-      {wait + R"({"wait": true})", "steps[1].at: 0 goes back (the step before is at 9)"},
-      {R"({"mount": {"volume": "V"}})", "steps[0].mount.path: is missing"},
       {R"({"plug": {"name": "x"}})", R"(steps[0].plug: unknown member "name")"},
       {R"({"plug": {"ports": [{"hub": "USB#HUB#1", "index": 0}]}})",
        "steps[0].plug.ports[0].index: 0 does not fit (1 to 255)"},
@@ -96,29 +95,22 @@ TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
 
 TEST(ScriptFile, ReadyMadeScriptsEndWhereTheyBegin) {
   const std::string folder = ZKUSB_SOURCE_DIR "/machines/";
-  const auto sizes = [](const Machine& pc) {
-    return std::vector{pc.devices.size(), pc.interfaces.size(), pc.hubs.size(),
-                       pc.storage.size(), pc.volumes.size(),    pc.drives.size()};
-  };
-  const struct {
-    std::string machine, script;
-    std::size_t steps;
-  } kCases[] = {{"dell-precision", "stick-comes-and-goes", 3},
-                {"hp-cardreader", "card-in-slot", 3},
-                {"asus-b560", "hub-with-four-devices", 3},
-                {"dell-precision", "usb-hard-disk", 5}};
-  for (const auto& [machine, name, steps] : kCases) {
+  const std::pair<std::string, std::string> kCases[] = {{"dell-precision", "stick-comes-and-goes"},
+                                                        {"hp-cardreader", "card-in-slot"},
+                                                        {"asus-b560", "hub-with-four-devices"},
+                                                        {"dell-precision", "usb-hard-disk"}};
+  for (const auto& [machine, name] : kCases) {
+    SCOPED_TRACE(name);
     const Machine start = LoadMachine(folder + machine + ".json");
-    const Script script = LoadScript(folder + "scripts/" + name + ".json", start);
-    EXPECT_EQ(script.size(), steps) << name;
     SimulatedPc pc(start);
     std::size_t most = 0;
-    for (const Step& step : script) {
-      EXPECT_EQ(ToUtf8(pc.Apply(step)), "") << name;
+    for (const Step& step : LoadScript(folder + "scripts/" + name + ".json", start)) {
+      EXPECT_EQ(ToUtf8(pc.Apply(step)), "");
       most = std::max(most, pc.Snapshot().devices.size());
     }
-    EXPECT_GT(most, start.devices.size()) << name;
-    EXPECT_EQ(sizes(pc.Snapshot()), sizes(start)) << name;
+    EXPECT_GT(most, start.devices.size());
+    EXPECT_EQ(pc.Snapshot().devices.size(), start.devices.size());
+    EXPECT_EQ(pc.Snapshot().storage.size(), start.storage.size());
   }
   // The example of the documentation.
   const std::string path = ZKUSB_SOURCE_DIR "/docs/machine-file.md";

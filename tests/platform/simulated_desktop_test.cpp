@@ -2,9 +2,9 @@
 
 #include <gmock/gmock.h>
 
-#include <algorithm>
 #include <cstring>
 #include <functional>
+#include <set>
 #include <thread>
 
 #include "platform/setup_api.h"
@@ -91,15 +91,13 @@ TEST_F(SimulatedDesktopTest, ThreadsTakeTurnsAndTimeMovesWhenAllWait) {
   desktop.Settle();
   EXPECT_THAT(log, ElementsAre("a@0", "b@0", "b@20", "a@30", "b@30", "a@30", "main@30", "c@30", "a@50"));
   EXPECT_EQ(desktop.Counts().threads, 0u);
-  // Ids are never used again, and stay with their threads.
-  std::vector<std::uint32_t> ids = {desktop.CurrentThreadId()};
+  // Ids are never used again.
+  std::set<std::uint32_t> ids = {0, desktop.CurrentThreadId()};
   for (int i = 0; i < 3; ++i) {
-    Launch([&] { ids.push_back(desktop.CurrentThreadId()); });
+    Launch([&] { EXPECT_TRUE(ids.insert(desktop.CurrentThreadId()).second); });
     desktop.Settle();
   }
-  EXPECT_EQ(ids[0], desktop.CurrentThreadId());
-  std::sort(ids.begin(), ids.end());
-  EXPECT_TRUE(ids[0] != 0 && std::adjacent_find(ids.begin(), ids.end()) == ids.end());
+  EXPECT_EQ(ids.size(), 5u);
   // A client thread holds the time while it counts, and lets go of it while it waits elsewhere.
   std::uint64_t client = 0;
   std::uint64_t uncounted = 0;
@@ -231,18 +229,20 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
   }
   g_answer = nullptr;
 
-  NotificationHandle refused = 5;
-  DEV_BROADCAST_DEVICEINTERFACE_W shorter = filter;
+  DEV_BROADCAST_DEVICEINTERFACE_W shorter = filter, volumes = filter;
   shorter.dbcc_size = 28;
-  DEV_BROADCAST_DEVICEINTERFACE_W volumes = filter;
   volumes.dbcc_devicetype = kDBT_DEVTYP_VOLUME;
-  EXPECT_EQ(desktop.RegisterDeviceNotificationW(0, &filter, 4, refused).error, 87u);
-  EXPECT_EQ(refused, 0);
-  EXPECT_EQ(desktop.RegisterDeviceNotificationW(all, nullptr, 4, refused).error, 87u);
-  EXPECT_EQ(desktop.RegisterDeviceNotificationW(all, &filter, 1, refused).error, 87u);
-  EXPECT_EQ(desktop.RegisterDeviceNotificationW(all, &shorter, 4, refused).error, 87u);
-  EXPECT_EQ(desktop.RegisterDeviceNotificationW(all, &volumes, 4, refused).error, 87u);
-  EXPECT_EQ(desktop.RegisterDeviceNotificationW(all + 100, &filter, 4, refused).error, 1400u);
+  const struct {
+    WindowHandle window;
+    DEV_BROADCAST_DEVICEINTERFACE_W* filter;
+    std::uint32_t flags, error;
+  } kRefused[] = {{0, &filter, 4, 87},    {all, nullptr, 4, 87},  {all, &filter, 1, 87},
+                  {all, &shorter, 4, 87}, {all, &volumes, 4, 87}, {all + 100, &filter, 4, 1400}};
+  for (const auto& test : kRefused) {
+    NotificationHandle refused = 5;
+    EXPECT_EQ(desktop.RegisterDeviceNotificationW(test.window, test.filter, test.flags, refused).error, test.error);
+    EXPECT_EQ(refused, 0);
+  }
   EXPECT_TRUE(desktop.UnregisterDeviceNotification(registrations[1]));
   EXPECT_EQ(desktop.UnregisterDeviceNotification(registrations[1]).error, 6u);
   EXPECT_THAT(desktop.Misuses(), ElementsAre(u"end of a device notification that is not registered"));

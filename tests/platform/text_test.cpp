@@ -8,24 +8,19 @@ namespace platform {
 namespace {
 
 TEST(Case, PairsMapToEachOther) {
-  // Upper and lower: the ends of the ranges, and letters whose partner stands elsewhere.
+  // Upper and lower: one pair of each kind of range, and letters whose partner stands elsewhere.
   constexpr char16_t kPairs[][2] = {
-      {u'A', u'a'},     {u'Z', u'z'},     {0x00C0, 0x00E0}, {0x00D6, 0x00F6}, {0x00D8, 0x00F8}, {0x00DE, 0x00FE},
-      {0x0178, 0x00FF}, {0x0100, 0x0101}, {0x012E, 0x012F}, {0x0132, 0x0133}, {0x0136, 0x0137}, {0x0139, 0x013A},
-      {0x0147, 0x0148}, {0x014A, 0x014B}, {0x0176, 0x0177}, {0x0179, 0x017A}, {0x017D, 0x017E}, {0x0386, 0x03AC},
-      {0x0388, 0x03AD}, {0x038A, 0x03AF}, {0x038C, 0x03CC}, {0x038E, 0x03CD}, {0x038F, 0x03CE}, {0x0391, 0x03B1},
-      {0x03A1, 0x03C1}, {0x03A3, 0x03C3}, {0x03AB, 0x03CB}, {0x0400, 0x0450}, {0x040F, 0x045F}, {0x0410, 0x0430},
-      {0x042F, 0x044F}, {0x0460, 0x0461}, {0x04C0, 0x04CF}, {0x04C1, 0x04C2}, {0x0531, 0x0561}, {0x0556, 0x0586},
-      {0x1EA0, 0x1EA1}, {0xFF21, 0xFF41}, {0xFF3A, 0xFF5A}};
+      {u'A', u'a'},     {u'Z', u'z'},     {0x00C0, 0x00E0}, {0x00DE, 0x00FE}, {0x0178, 0x00FF}, {0x0100, 0x0101},
+      {0x0139, 0x013A}, {0x0147, 0x0148}, {0x0179, 0x017A}, {0x0386, 0x03AC}, {0x0388, 0x03AD}, {0x038C, 0x03CC},
+      {0x038F, 0x03CE}, {0x0391, 0x03B1}, {0x03AB, 0x03CB}, {0x0400, 0x0450}, {0x042F, 0x044F}, {0x0460, 0x0461},
+      {0x04C0, 0x04CF}, {0x04C1, 0x04C2}, {0x0556, 0x0586}, {0x1EA0, 0x1EA1}, {0xFF21, 0xFF41}, {0xFF3A, 0xFF5A}};
   for (const auto& [upper, lower] : kPairs) {
     EXPECT_EQ(ToLower(upper), lower) << std::hex << unsigned{upper};
     EXPECT_EQ(ToUpper(lower), upper) << std::hex << unsigned{lower};
-    EXPECT_EQ(ToLower(lower), lower) << std::hex << unsigned{lower};
-    EXPECT_EQ(ToUpper(upper), upper) << std::hex << unsigned{upper};
   }
   // Letters without a partner stay.
-  for (const int unit : {0x0000, 0x0040, 0x005B, 0x0060, 0x007B, 0x00B5, 0x00D7, 0x00DF, 0x00F7, 0x0130, 0x0131,
-                         0x0138, 0x0149, 0x017F, 0x0390, 0x03A2, 0x0557, 0xD83D, 0xDE00, 0xFF20, 0xFF5B, 0xFFFF}) {
+  for (const int unit : {0x0040, 0x005B, 0x0060, 0x007B, 0x00B5, 0x00D7, 0x00DF, 0x00F7, 0x0130, 0x0131, 0x0138, 0x0149,
+                         0x017F, 0x03A2, 0xD83D, 0xFF5B}) {
     EXPECT_EQ(ToLower(static_cast<char16_t>(unit)), unit) << std::hex << unit;
     EXPECT_EQ(ToUpper(static_cast<char16_t>(unit)), unit) << std::hex << unit;
   }
@@ -41,16 +36,12 @@ TEST(Case, PairsMapToEachOther) {
 }
 
 TEST(Texts, CasePartsAndReplacement) {
-  EXPECT_EQ(ToLower(u"USB\\VID_04Ää"), u"usb\\vid_04ää");
   EXPECT_EQ(ToUpper(std::u16string_view(u"usb\0äß", 6)), std::u16string_view(u"USB\0Äß", 6));
   EXPECT_TRUE(EqualIgnoringCase(u"Straße", u"STRAßE"));
-  EXPECT_TRUE(EqualIgnoringCase(u"", u""));
   EXPECT_FALSE(EqualIgnoringCase(u"abc", u"ab"));
-  EXPECT_FALSE(EqualIgnoringCase(u"ab", u"abc"));
   EXPECT_FALSE(EqualIgnoringCase(u"{", u"["));
   EXPECT_EQ(Replaced(u"a/b//c", u'/', u'\\'), u"a\\b\\\\c");
   EXPECT_EQ(UpToZero(std::u16string_view(u"ab\0cd\0", 6)), u"ab");
-  EXPECT_EQ(UpToZero(u"ab"), u"ab");
   EXPECT_EQ(UpToZero(std::u16string_view(u"\0ab", 3)), u"");
 }
 
@@ -60,16 +51,12 @@ TEST(Texts, Numbers) {
     std::u16string text, expected;
   } kCases[] = {{Hex(0), u"0"},
                 {Hex(0xC52B, 4), u"C52B"},
-                {Hex(0x1A, 4), u"001A"},
                 {Hex(0xFFFFFFFF, 4), u"FFFFFFFF"},
-                {HexLower(0xC52B), u"c52b"},
                 {HexLower(0xA, 2), u"0a"},
                 {Decimal(0), u"0"},
-                {Decimal(7, 2), u" 7"},
                 {Decimal(-1, 4), u"  -1"},
                 {Decimal(12345, 2), u"12345"},
                 {Decimal(std::numeric_limits<std::int32_t>::min()), u"-2147483648"},
-                {Decimal(std::numeric_limits<std::int32_t>::max()), u"2147483647"},
                 {GuidText(guid), u"{3869C27A-31B8-01E8-9B02-ECF4BB487F0D}"},
                 {GuidText(kNullGuid), u"{00000000-0000-0000-0000-000000000000}"}};
   for (const auto& [text, expected] : kCases) EXPECT_EQ(text, expected);
@@ -89,20 +76,17 @@ TEST(Utf8, RoundTripsAndReplacesWhatIsMalformed) {
     EXPECT_EQ(ToUtf8(text), bytes);
     EXPECT_EQ(FromUtf8(bytes), text) << bytes;
   }
-  EXPECT_EQ(ToUtf8(u"a\xD83Dz"), "a\xEF\xBF\xBDz");
   EXPECT_EQ(ToUtf8(u"\xDE00\xD83D"), "\xEF\xBF\xBD\xEF\xBF\xBD");
-  const struct {
-    std::string_view bytes;
-    std::u16string_view text;
-  } kMalformed[] = {{"\x80", u"\xFFFD"},                                // a continuation alone
-                    {"\xC3", u"\xFFFD"},                                // cut short
-                    {"\xE2\x82", u"\xFFFD\xFFFD"},                      // cut short
-                    {"\xC3z", u"\xFFFDz"},                              // what follows is not swallowed
-                    {"\xC0\x80", u"\xFFFD\xFFFD"},                      // longer than needed
-                    {"\xE0\x9F\xBF", u"\xFFFD\xFFFD\xFFFD"},            // longer than needed
-                    {"\xED\xA0\x80", u"\xFFFD\xFFFD\xFFFD"},            // a surrogate
-                    {"\xF4\x90\x80\x80", u"\xFFFD\xFFFD\xFFFD\xFFFD"},  // beyond the last code point
-                    {"\xFF", u"\xFFFD"}};
+  const std::pair<std::string_view, std::u16string_view> kMalformed[] = {
+      {"\x80", u"\xFFFD"},                                // a continuation alone
+      {"\xC3", u"\xFFFD"},                                // cut short
+      {"\xE2\x82", u"\xFFFD\xFFFD"},                      // cut short
+      {"\xC3z", u"\xFFFDz"},                              // what follows is not swallowed
+      {"\xC0\x80", u"\xFFFD\xFFFD"},                      // longer than needed
+      {"\xE0\x9F\xBF", u"\xFFFD\xFFFD\xFFFD"},            // longer than needed
+      {"\xED\xA0\x80", u"\xFFFD\xFFFD\xFFFD"},            // a surrogate
+      {"\xF4\x90\x80\x80", u"\xFFFD\xFFFD\xFFFD\xFFFD"},  // beyond the last code point
+      {"\xFF", u"\xFFFD"}};
   for (const auto& [bytes, text] : kMalformed) EXPECT_EQ(FromUtf8(bytes), text) << bytes;
 }
 
