@@ -40,46 +40,38 @@ void ForEachMatch(const std::string& text, const char* pattern, Visit visit) {
   for (std::sregex_iterator match(text.begin(), text.end(), expression), end; match != end; ++match) visit(*match);
 }
 
-Lines HeaderInterfaces() {
-  Lines lines;
+TEST(Idl, SaysWhatTheHeaderSays) {
+  Lines header, idl;
   ForEachMatch(
       Load("zkusb_monitor.h"),
       "struct (\\w+) : IUnknown \\{ static constexpr IID kIid\\{([^;]*);|"
       "virtual HRESULT STDMETHODCALLTYPE (\\w+)\\(([^)]*)\\) = 0;",
       [&](const std::smatch& m) {
-        lines.push_back(m[1].matched ? m.str(1) + " " + Digits(m.str(2)) : m.str(3) + " " + Parameters(m.str(4)));
+        header.push_back(m[1].matched ? m.str(1) + " " + Digits(m.str(2)) : m.str(3) + " " + Parameters(m.str(4)));
       });
-  return lines;
-}
-
-Lines IdlInterfaces() {
-  Lines lines;
   ForEachMatch(Load("zkusb_monitor.idl"),
                "uuid\\(([^)]*)\\)[^\\]]*\\] interface (\\w+) : IUnknown|"
                "\\[([^\\]]*)\\] HRESULT (\\w+)\\(([^;]*)\\);",
                [&](const std::smatch& m) {
                  const bool property = m.str(3).find("propget") != std::string::npos;
-                 lines.push_back(m[1].matched ? m.str(2) + " " + Digits(m.str(1))
-                                              : (property ? "get_" : "") + m.str(4) + " " + Parameters(m.str(5)));
+                 idl.push_back(m[1].matched ? m.str(2) + " " + Digits(m.str(1))
+                                            : (property ? "get_" : "") + m.str(4) + " " + Parameters(m.str(5)));
                });
-  return lines;
-}
-
-TEST(Idl, SaysWhatTheHeaderSays) {
-  const Lines header = HeaderInterfaces();
-  EXPECT_EQ(IdlInterfaces(), header);
+  EXPECT_EQ(idl, header);
   EXPECT_EQ(header.size(), 13u + 50u);  // interfaces and methods
 
-  Lines ids;
-  ForEachMatch(Load("zkusb_monitor.h"), "(LIBID|CLSID|DIID)_(\\w+)\\{([^;]*);",
-               [&](const std::smatch& m) { ids.push_back(m.str(2) + " " + Digits(m.str(3))); });
-  Lines idlIds;
-  ForEachMatch(Load("zkusb_monitor.idl"), "uuid\\(([^)]*)\\)[^\\]]*\\] (?:library|coclass|dispinterface) (\\w+)",
-               [&](const std::smatch& m) { idlIds.push_back(m.str(2) + " " + Digits(m.str(1))); });
+  // Classes, the library and the event interface, whatever their order.
+  const auto idsOf = [](const char* file, const char* pattern, std::size_t name, std::size_t guid) {
+    Lines lines;
+    ForEachMatch(Load(file), pattern,
+                 [&](const std::smatch& m) { lines.push_back(m.str(name) + " " + Digits(m.str(guid))); });
+    std::sort(lines.begin(), lines.end());
+    return lines;
+  };
+  const Lines ids = idsOf("zkusb_monitor.h", "(?:LIBID|CLSID|DIID)_(\\w+)\\{([^;]*);", 1, 2);
   EXPECT_EQ(ids.size(), 4u);
-  std::sort(ids.begin(), ids.end());
-  std::sort(idlIds.begin(), idlIds.end());
-  EXPECT_EQ(idlIds, ids);
+  EXPECT_EQ(idsOf("zkusb_monitor.idl", "uuid\\(([^)]*)\\)[^\\]]*\\] (?:library|coclass|dispinterface) (\\w+)", 2, 1),
+            ids);
 
   const auto values = [](const char* file) {
     Lines lines;

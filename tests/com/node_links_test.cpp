@@ -12,8 +12,7 @@ namespace {
 
 using platform::native::FailCriticalSection;
 
-class NodeLinks : public ComObjects {
- protected:
+struct NodeLinks : ComObjects {
   SampleTree sample;
 };
 
@@ -93,28 +92,6 @@ TEST_F(NodeLinks, ListsWithoutTheirObjects) {
     }
     EXPECT_EQ(sample.controller.RingSize(), ring);
   }
-}
-
-TEST_F(NodeLinks, SubtreesAreListedInPreOrderWithTheirTop) {
-  const NodePtr h1 =
-      MakeNode<CZKUMHubDeviceImpl>(u"h1", {MakeNode<CZKUMHubPortImpl>(u"p1", {MakeNode<CZKUMHubDeviceImpl>(u"h2")}, 1u),
-                                           MakeNode<CZKUMHubPortImpl>(u"p2", {}, 2u)});
-  const NodePtr tree = MakeNode<CZKUMUsbTreeRootImpl>(
-      u"root", {h1, MakeNode<CZKUMHubDeviceImpl>(u"h3"), MakeNode<CZKUMUsbTreeNodeImpl>(u"plain")});
-  const struct {
-    const NodePtr& top;
-    TUsbDeviceType kind;
-    const char* ids;
-  } rows[] = {{tree, KUDTRoot, "root"},     {tree, KUDTHub, "h1 h2 h3"}, {h1, KUDTHub, "h1 h2"},
-              {tree, KUDTHubPort, "p1 p2"}, {h1, KUDTRoot, ""},          {tree, KUDTUnknown, "plain"}};
-  for (const auto& row : rows) {
-    ComPtr<IZKUMUsbTreeNodeEnumerator> list;
-    ASSERT_EQ(Wrap(row.top)->get_InSubtreeDevicesOfType(row.kind, list.Put()), S_OK);
-    EXPECT_EQ(WalkIds(list.Get()), row.ids);
-  }
-  ComPtr<IZKUMUsbTreeNodeEnumerator> childs;
-  ASSERT_EQ(Wrap(tree)->get_Childs(childs.Put()), S_OK);
-  EXPECT_EQ(WalkIds(childs.Get()), "h1 h3 plain");
 }
 
 }  // namespace

@@ -5,12 +5,103 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 #include "tests/support/com_objects.h"
-#include "tests/support/text_properties.h"
 
 namespace KelvoUHW {
 namespace {
+
+// What a text property answers where it cannot give its text; null: no such case.
+struct TextRules {
+  const char* firstFails;  // the text's first allocation
+  const char* secondFails;
+  const char* nullOutFirstFails;
+  const char* noRecord;
+  const char* noRecordNullOut;
+};
+// The text is made before the out pointer is looked at, the record is asked for before both.
+constexpr TextRules kBase = {"raised E_OUTOFMEMORY null", "E_OUTOFMEMORY null", "raised E_OUTOFMEMORY", "E_FAIL null",
+                             "E_FAIL"};
+// The typed record is not tested.
+constexpr TextRules kTyped = {"raised E_OUTOFMEMORY null", "E_OUTOFMEMORY null", "raised E_OUTOFMEMORY", nullptr,
+                              nullptr};
+// Nothing is read for a null out pointer.
+constexpr TextRules kSerialNumber = {"raised E_OUTOFMEMORY null", "E_OUTOFMEMORY null", "E_POINTER", "E_FAIL null",
+                                     "E_POINTER"};
+// Out of memory is not noticed.
+constexpr TextRules kUntested = {"S_OK null", nullptr, "E_POINTER", "E_POINTER null", "E_POINTER"};
+
+struct TextRow {
+  const char* name;
+  TextProperty property;
+  TextProperty bySlot;             // the method in its published place
+  std::vector<const char*> kinds;  // of the sample tree
+  TextRules rules;
+  const char* source;  // whose text it is, where not the object's own
+};
+
+// Calls what stands in a place of the table that an interface pointer points at.
+template <auto Getter, std::size_t Slot>
+HRESULT ReadSlot(IUnknown* object, BSTR* out) {
+  const auto asked = ComPtr<IUnknown>(object).As<typename GetterTraits<decltype(Getter)>::Interface>();
+  const auto* table = *reinterpret_cast<void* const* const*>(asked.Get());
+  return reinterpret_cast<HRESULT (*)(IUnknown*, BSTR*)>(table[Slot])(asked.Get(), out);
+}
+template <auto Getter, std::size_t Slot>
+TextRow Row(const char* name, const std::vector<const char*>& kinds, const TextRules& rules,
+            const char* source = nullptr) {
+  return {name, &Read<Getter>, &ReadSlot<Getter, Slot>, kinds, rules, source};
+}
+
+const std::vector<const char*> kNoDevice = {"root", "plain", "controller", "hub", "port", "info", "disk"};
+const std::vector<const char*> kAll = {"device", "root", "plain", "controller", "hub", "port", "info", "disk"};
+const std::vector<const char*> kInfo = {"info", "device"};
+const TextRow kTexts[] = {Row<&IZKUMUsbTreeNode::get_InstanceId, 3>("InstanceId", kAll, kBase),
+                          Row<&IZKUMUsbDevice::get_Description, 3>("Description", kAll, kBase),
+                          Row<&IZKUMUsbDevice::get_SerialNumber, 4>("SerialNumber", kAll, kSerialNumber),
+                          Row<&IZKUMUsbDevice::get_DriverKeyName, 7>("DriverKeyName", kAll, kBase),
+                          Row<&IZKUMUsbDevice::get_Vendor, 9>("Vendor", kAll, kUntested),
+                          Row<&IZKUMUsbDevice::get_Product, 10>("Product", kNoDevice, kUntested),
+                          Row<&IZKUMUsbDevice::get_Product, 10>("Product", {"device"}, kTyped),
+                          Row<&IZKUMPortDevice::get_Product, 3>("Product", {"device"}, kTyped),
+                          Row<&IZKUMPortDevice::get_Manufacturer1, 4>("Manufacturer1", {"device"}, kTyped),
+                          Row<&IZKUMHostController::get_LeafName, 3>("LeafName", {"controller"}, kTyped),
+                          Row<&IZKUMHubDevice::get_PathName, 3>("PathName", {"hub"}, kTyped),
+                          Row<&IZKUMHubDevice::get_ConnectionName, 4>("ConnectionName", {"hub"}, kTyped),
+                          // A port device shows those of its device-manager node.
+                          Row<&IZKUMInfoDevice::get_Service, 3>("Service", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_FriendlyName, 4>("FriendlyName", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_Location, 5>("Location", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_Manufacturer, 6>("Manufacturer", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_HardwareId, 7>("HardwareId", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_PhysicalName, 8>("PhysicalName", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_DevClass, 9>("DevClass", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_EnumName, 10>("EnumName", kInfo, kTyped, "info"),
+                          Row<&IZKUMInterfaceDevice::get_VolumeName, 3>("VolumeName", {"disk"}, kTyped),
+                          Row<&IZKUMInterfaceDevice::get_VendorId, 4>("VendorId", {"disk"}, kTyped),
+                          Row<&IZKUMInterfaceDevice::get_ProductId, 5>("ProductId", {"disk"}, kTyped),
+                          Row<&IZKUMInterfaceDevice::get_ProductRev, 6>("ProductRev", {"disk"}, kTyped),
+                          Row<&IZKUMInterfaceDevice::get_DevicePath, 7>("DevicePath", {"disk"}, kTyped),
+                          Row<&IZKUMInterfaceDevice::get_MountPoint, 8>("MountPoint", {"disk"}, kTyped)};
+
+// Reads the text, and once for each of its rules but those without record.
+void CheckText(TextProperty property, IUnknown* object, const TextRules& rules, const std::string& text) {
+  const std::string success = "S_OK " + text;
+  const ULONG references = References(object);
+  EXPECT_EQ(TextOf(property, object), success);
+  EXPECT_EQ(TextOf(property, object, false), "E_POINTER");
+  const struct {
+    std::uint64_t allocation;
+    bool giveOut;
+    const char* expected;
+  } faults[] = {{1, true, rules.firstFails}, {2, true, rules.secondFails}, {1, false, rules.nullOutFirstFails}};
+  for (const auto& fault : faults) {
+    const platform::native::FailingBstr failing(fault.allocation);
+    EXPECT_EQ(TextOf(property, object, fault.giveOut), fault.expected ? fault.expected : success);
+  }
+  EXPECT_EQ(References(object), references);
+}
 
 class NodeObject : public ComObjects {
  protected:
@@ -29,11 +120,12 @@ class NodeObject : public ComObjects {
 };
 
 TEST_F(NodeObject, TextsAndWhatIsAnsweredInTheirPlace) {
-  for (const TextRow& row : TextRows()) {
+  for (const TextRow& row : kTexts) {
     for (const char* kind : row.kinds) {
       SCOPED_TRACE(std::string(kind) + "." + row.name);
       const std::string source = row.source ? row.source : kind;
       CheckText(row.property, objects[kind].Get(), row.rules, source + "." + row.name);
+      EXPECT_EQ(TextOf(row.bySlot, objects[kind].Get()), "S_OK " + source + "." + row.name);
     }
     if (row.rules.noRecord == nullptr) continue;
     EXPECT_EQ(TextOf(row.property, empty.Get()), row.rules.noRecord) << row.name;
@@ -52,43 +144,39 @@ TEST_F(NodeObject, DumpsAreThoseOfTheRecords) {
 }
 
 TEST_F(NodeObject, NumbersAndWhatIsAnsweredInTheirPlace) {
+  using Number = std::string (*)(IUnknown*, bool);
+  constexpr Number kType = &NumberOf<&IZKUMUsbTreeNode::get_Type>;
+  constexpr Number kVendor = &NumberOf<&IZKUMUsbDevice::get_VendorId>;
+  constexpr Number kProduct = &NumberOf<&IZKUMUsbDevice::get_ProductId>;
+  constexpr Number kGuid = &NumberOf<&IZKUMInfoDevice::get_ClassGuid>;
+  const std::string untouched = " 1515870810";
   const struct {
-    const char* name;
-    std::string (*read)(IUnknown*, bool);
+    Number read;
     const char* kind;
     const char* value;
     const char* nullOut;
-    const char* noRecord;
+    const char* noRecord;  // the code then; null: there is always one
     const char* noRecordNullOut;
   } rows[] = {
-      {"Type", &NumberOf<&IZKUMUsbTreeNode::get_Type>, "plain", "S_OK 0", "E_POINTER", "E_INVALIDARG 1515870810",
-       "E_INVALIDARG"},
-      {"Type", &NumberOf<&IZKUMUsbTreeNode::get_Type>, "root", "S_OK 1", "E_POINTER", nullptr, nullptr},
-      {"Type", &NumberOf<&IZKUMUsbTreeNode::get_Type>, "disk", "S_OK 7", "E_POINTER", nullptr, nullptr},
-      {"VendorId", &NumberOf<&IZKUMUsbDevice::get_VendorId>, "root", "S_OK -1", "E_POINTER", "E_POINTER 1515870810",
-       "E_POINTER"},
-      {"VendorId", &NumberOf<&IZKUMUsbDevice::get_VendorId>, "device", "S_OK 4660", "E_POINTER", nullptr, nullptr},
-      {"ProductId", &NumberOf<&IZKUMUsbDevice::get_ProductId>, "hub", "S_OK -1", "E_POINTER", "E_POINTER 1515870810",
-       "E_POINTER"},
-      {"ProductId", &NumberOf<&IZKUMUsbDevice::get_ProductId>, "device", "S_OK -2147483648", "E_POINTER", nullptr,
-       nullptr},
-      {"PortIndex", &NumberOf<&IZKUMHubPort::get_PortIndex>, "port", "S_OK 7", "E_INVALIDARG", nullptr, nullptr},
-      {"Speed", &NumberOf<&IZKUMPortDevice::get_Speed>, "device", "S_OK 0", "E_INVALIDARG", nullptr, nullptr},
-      {"NumberInterfaces", &NumberOf<&IZKUMPortDevice::get_NumberInterfaces>, "device", "S_OK 0", "E_INVALIDARG",
-       nullptr, nullptr},
-      {"ClassGuid", &NumberOf<&IZKUMInfoDevice::get_ClassGuid>, "info", "S_OK 4711", "E_INVALIDARG", nullptr, nullptr},
-      {"ClassGuid", &NumberOf<&IZKUMInfoDevice::get_ClassGuid>, "device", "S_OK 4711", "E_INVALIDARG", nullptr,
-       nullptr},
+      {kType, "root", "S_OK 1", "E_POINTER", "E_INVALIDARG", "E_INVALIDARG"},
+      {kType, "disk", "S_OK 7", "E_POINTER", nullptr, nullptr},
+      {kVendor, "root", "S_OK -1", "E_POINTER", "E_POINTER", "E_POINTER"},
+      {kVendor, "device", "S_OK 4660", "E_POINTER", nullptr, nullptr},
+      {kProduct, "hub", "S_OK -1", "E_POINTER", "E_POINTER", "E_POINTER"},
+      {kProduct, "device", "S_OK -2147483648", "E_POINTER", nullptr, nullptr},
+      {&NumberOf<&IZKUMHubPort::get_PortIndex>, "port", "S_OK 7", "E_INVALIDARG", nullptr, nullptr},
+      {&NumberOf<&IZKUMPortDevice::get_Speed>, "device", "S_OK 0", "E_INVALIDARG", nullptr, nullptr},
+      {&NumberOf<&IZKUMPortDevice::get_NumberInterfaces>, "device", "S_OK 0", "E_INVALIDARG", nullptr, nullptr},
+      {kGuid, "info", "S_OK 4711", "E_INVALIDARG", nullptr, nullptr},
+      {kGuid, "device", "S_OK 4711", "E_INVALIDARG", nullptr, nullptr},
   };
   for (const auto& row : rows) {
-    SCOPED_TRACE(std::string(row.kind) + "." + row.name);
+    SCOPED_TRACE(&row - rows);
     IUnknown* object = objects[row.kind].Get();
-    const ULONG references = References(object);
     EXPECT_EQ(row.read(object, true), row.value);
     EXPECT_EQ(row.read(object, false), row.nullOut);
-    EXPECT_EQ(References(object), references);
     if (row.noRecord == nullptr) continue;
-    EXPECT_EQ(row.read(empty.Get(), true), row.noRecord);
+    EXPECT_EQ(row.read(empty.Get(), true), row.noRecord + untouched);
     EXPECT_EQ(row.read(empty.Get(), false), row.noRecordNullOut);
   }
 }
@@ -97,7 +185,7 @@ TEST_F(NodeObject, PortDeviceWithoutDeviceManagerNodeFailsItsPropertiesOnly) {
   sample.device->m_infoDevice.Reset();
   IUnknown* object = objects["device"].Get();
   int properties = 0;
-  for (const TextRow& row : TextRows()) {
+  for (const TextRow& row : kTexts) {
     if (row.source == nullptr) continue;
     EXPECT_EQ(TextOf(row.property, object), "E_FAIL null") << row.name;
     EXPECT_EQ(TextOf(row.property, object, false), "E_FAIL") << row.name;
