@@ -244,7 +244,7 @@ HWND FindReceiver() {
   return window;
 }
 HWND Receiver() {
-  for (int i = 0; i < 500 && FindReceiver() == nullptr; ++i) std::this_thread::sleep_for(20ms);
+  for (int i = 0; i < 1500 && FindReceiver() == nullptr; ++i) std::this_thread::sleep_for(20ms);
   return FindReceiver();
 }
 
