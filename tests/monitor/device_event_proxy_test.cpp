@@ -22,15 +22,15 @@ constexpr DWORD kMark = 0xA5A5A5A5;
 using Scene = NotifierScene;
 using DeviceEventProxy = ComObjects;
 
-TEST_F(DeviceEventProxy, PointHasItsOwnIdentityAndCountsOnTheNotifier) {
+TEST_F(DeviceEventProxy, HasItsOwnIdentityAndCountsOnTheNotifier) {
   Scene scene;
   IConnectionPoint* point = scene.process.point.Get();
+  const auto container = scene.Container();
   const std::int32_t before = scene.NotifierReferences();
   const auto unknown = scene.process.point.As<IUnknown>();
   EXPECT_EQ(scene.NotifierReferences(), before + 1);
   EXPECT_FALSE(unknown.Get() == scene.process.notifier.As<IUnknown>().Get());
   EXPECT_TRUE(unknown.As<IConnectionPoint>().Get() == point);
-  EXPECT_EQ(point->QueryInterface(platform::IidOf<IUnknown>(), nullptr), E_POINTER);
   for (const IID& iid : {platform::IidOf<IConnectionPointContainer>(), platform::IidOf<IZKUMEventNotifier>(),
                          platform::IidOf<IZKUMPrivateNotifier>(), DIID_IZKDeviceEventCallBack}) {
     void* out = Mark<void>();
@@ -38,42 +38,37 @@ TEST_F(DeviceEventProxy, PointHasItsOwnIdentityAndCountsOnTheNotifier) {
     EXPECT_EQ(out, nullptr);
   }
   EXPECT_EQ(scene.NotifierReferences(), before + 1);
-}
 
-TEST_F(DeviceEventProxy, AnswersWhatItConnects) {
-  Scene scene;
-  IConnectionPoint* point = scene.process.point.Get();
-  const auto container = scene.Container();
   IID iid{};
   EXPECT_EQ(point->GetConnectionInterface(&iid), S_OK);
   EXPECT_TRUE(iid == DIID_IZKDeviceEventCallBack);
-  EXPECT_EQ(point->GetConnectionInterface(nullptr), E_POINTER);
-
   ComPtr<IConnectionPointContainer> owner;
   EXPECT_EQ(point->GetConnectionPointContainer(owner.Put()), S_OK);
   EXPECT_TRUE(owner.Get() == container.Get());
-  EXPECT_EQ(point->GetConnectionPointContainer(nullptr), E_POINTER);
-
-  EXPECT_EQ(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, nullptr), E_POINTER);
-  EXPECT_EQ(container->FindConnectionPoint(platform::IidOf<IDispatch>(), nullptr), E_POINTER);
-  for (const IID& other : {platform::IidOf<IDispatch>(), platform::IidOf<IZKUMDeviceEvent>(), IID{}}) {
+  for (const IID& other : {platform::IidOf<IDispatch>(), platform::IidOf<IZKUMDeviceEvent>()}) {
     auto* found = Mark<IConnectionPoint>();
     EXPECT_EQ(container->FindConnectionPoint(other, &found), kNoConnection);
     EXPECT_EQ(found, nullptr);
   }
-  EXPECT_EQ(container->EnumConnectionPoints(nullptr), E_POINTER);
-  EXPECT_EQ(point->EnumConnections(nullptr), E_POINTER);
-
   const auto support = scene.process.notifier.As<ISupportErrorInfo>();
-  for (const IID& other : {platform::IidOf<IUnknown>(), platform::IidOf<IConnectionPointContainer>(),
-                           platform::IidOf<IZKUMPrivateNotifier>(), platform::IidOf<IZKUMUsbTree>()}) {
-    EXPECT_EQ(support->InterfaceSupportsErrorInfo(other), S_FALSE);
-  }
+  EXPECT_EQ(support->InterfaceSupportsErrorInfo(platform::IidOf<IZKUMPrivateNotifier>()), S_FALSE);
   EXPECT_EQ(support->InterfaceSupportsErrorInfo(platform::IidOf<IZKUMEventNotifier>()), S_OK);
+
+  DWORD cookie = kMark;
+  for (const HRESULT result :
+       {point->QueryInterface(platform::IidOf<IUnknown>(), nullptr), point->GetConnectionInterface(nullptr),
+        point->GetConnectionPointContainer(nullptr), container->EnumConnectionPoints(nullptr),
+        container->FindConnectionPoint(platform::IidOf<IDispatch>(), nullptr), point->EnumConnections(nullptr),
+        point->Advise(nullptr, &cookie), point->Advise(&scene.a, nullptr)}) {
+    EXPECT_EQ(result, E_POINTER);
+  }
+  EXPECT_EQ(cookie, kMark);
 }
 
 // Whether a sink that could not be told is advised all the same, and what was asked of the tree.
 TEST_F(DeviceEventProxy, AdviseCodes) {
+  const auto answers = [](std::vector<HRESULT> codes) { return [=](Scene& s) { s.a.eventCodes = codes; }; };
+  const auto unadvises = [](Scene& s) { s.tree.onBuild = [&s] { EXPECT_EQ(s.process.point->Unadvise(1), S_OK); }; };
   const struct {
     const char* what;
     std::function<void(Scene&)> prepare;
@@ -82,36 +77,18 @@ TEST_F(DeviceEventProxy, AdviseCodes) {
     const char* calls;
     const char* log;
   } kCases[] = {
-      {"fine", [](Scene&) {}, S_OK, true, "build list0 reset", "A 0 c"},
       {"nothing changed", [](Scene& s) { s.tree.built = S_FALSE; }, S_OK, true, "build list0 reset", "A 0 c"},
       {"reset fails", [](Scene& s) { s.tree.reset = E_FAIL; }, S_OK, true, "build list0 reset", "A 0 c"},
       {"sink fails", [](Scene& s) { s.a.onEvent = [] { return E_FAIL; }; }, S_OK, true, "build list0 reset", "A 0 c"},
       {"no IUnknown", [](Scene& s) { s.a.unknownCode = E_NOINTERFACE; }, E_NOINTERFACE, false, "", ""},
-      {"no event interface", [](Scene& s) { s.a.eventCodes = {E_NOINTERFACE}; }, kCannotConnect, false, "", ""},
-      {"another code", [](Scene& s) { s.a.eventCodes = {kOtherCode}; }, kOtherCode, false, "", ""},
-      {"throws when asked", [](Scene& s) { s.a.eventCodes = {TestSink::kThrows}; }, E_FAIL, false, "", ""},
-      {"no event interface the second time",
-       [](Scene& s) {
-         s.a.eventCodes = {S_OK, E_NOINTERFACE};
-       },
-       E_NOINTERFACE, true, "", ""},
-      {"throws the second time",
-       [](Scene& s) {
-         s.a.eventCodes = {S_OK, TestSink::kThrows};
-       },
-       E_FAIL, true, "", ""},
+      {"no event interface", answers({E_NOINTERFACE}), kCannotConnect, false, "", ""},
+      {"another code", answers({kOtherCode}), kOtherCode, false, "", ""},
+      {"throws when asked", answers({TestSink::kThrows}), E_FAIL, false, "", ""},
+      {"no event interface the second time", answers({S_OK, E_NOINTERFACE}), E_NOINTERFACE, true, "", ""},
       {"build fails", [](Scene& s) { s.tree.built = kOtherCode; }, kOtherCode, true, "build", ""},
-      {"build fails, sink unadvised meanwhile",
-       [](Scene& s) {
-         s.tree.built = kOtherCode;
-         s.tree.onBuild = [&s] { EXPECT_EQ(s.process.point->Unadvise(1), S_OK); };
-       },
-       kOtherCode, false, "build", ""},
       {"list fails", [](Scene& s) { s.tree.listed = kOtherCode; }, E_FAIL, true, "build list0", ""},
       {"no list", [](Scene& s) { s.tree.withoutLists = true; }, E_FAIL, true, "build list0", ""},
-      {"unadvised meanwhile",
-       [](Scene& s) { s.tree.onBuild = [&s] { EXPECT_EQ(s.process.point->Unadvise(1), S_OK); }; }, S_OK, false,
-       "build list0 reset", ""},
+      {"unadvised meanwhile", unadvises, S_OK, false, "build list0 reset", ""},
   };
   for (const auto& test : kCases) {
     SCOPED_TRACE(test.what);
@@ -125,17 +102,11 @@ TEST_F(DeviceEventProxy, AdviseCodes) {
     EXPECT_EQ(scene.process.point->Unadvise(1), test.advised ? S_OK : kNoConnection);
     EXPECT_EQ(scene.a.References(), 1);
   }
-  Scene scene;
-  DWORD cookie = kMark;
-  EXPECT_EQ(scene.process.point->Advise(nullptr, &cookie), E_POINTER);
-  EXPECT_EQ(scene.process.point->Advise(&scene.a, nullptr), E_POINTER);
-  EXPECT_EQ(scene.process.point->Advise(nullptr, nullptr), E_POINTER);
-  EXPECT_EQ(cookie, kMark);
 }
 
 TEST_F(DeviceEventProxy, AdviseWithoutMemory) {
   // The first allocation of an advise is for the slots, when there are no free ones.
-  for (const std::size_t advised : {0u, 4u, 8u, 3u}) {
+  for (const std::size_t advised : {0u, 4u, 3u}) {
     SCOPED_TRACE(advised);
     Scene scene;
     for (std::size_t i = 0; i < advised; ++i) scene.process.Advise(scene.b);
@@ -151,12 +122,8 @@ TEST_F(DeviceEventProxy, AdviseWithoutMemory) {
     EXPECT_EQ(cookie, advised == 3 ? 4u : kMark);
     EXPECT_EQ(scene.a.References(), advised == 3 ? 2 : 1);
     EXPECT_EQ(Taken(scene.log), "");
-    scene.process.point->Unadvise(4);
-    scene.a.unknownCode = S_OK;
-    cookie = kMark;
-    EXPECT_EQ(scene.process.point->Advise(&scene.a, &cookie), S_OK);
+    scene.process.Advise(scene.a);
     EXPECT_EQ(Taken(scene.log), "A 0 c");
-    for (DWORD each = 1; each <= 9; ++each) scene.process.point->Unadvise(each);
   }
 }
 
@@ -166,12 +133,8 @@ TEST_F(DeviceEventProxy, LowestFreeSlotGivesTheCookie) {
   for (DWORD expected = 1; expected <= 5; ++expected) EXPECT_EQ(scene.process.Advise(scene.b), expected);
   for (const DWORD removed : {4u, 2u}) EXPECT_EQ(point->Unadvise(removed), S_OK);
   for (const DWORD expected : {2u, 4u, 6u, 7u, 8u, 9u}) EXPECT_EQ(scene.process.Advise(scene.a), expected);
-  const struct {
-    DWORD cookie;
-    HRESULT result;
-  } kCases[] = {{0, kNoConnection},  {10, kNoConnection},         {16, kNoConnection}, {17, kNoConnection},
-                {99, kNoConnection}, {0xFFFFFFFF, kNoConnection}, {3, S_OK},           {3, kNoConnection}};
-  for (const auto& test : kCases) EXPECT_EQ(point->Unadvise(test.cookie), test.result) << test.cookie;
+  EXPECT_EQ(point->Unadvise(3), S_OK);
+  for (const DWORD free : {0u, 3u, 16u, 17u, 0xFFFFFFFF}) EXPECT_EQ(point->Unadvise(free), kNoConnection) << free;
   // In the order of the slots, whatever the order in which they came.
   scene.log.clear();
   scene.tree.lists = {};
@@ -195,13 +158,12 @@ TEST_F(DeviceEventProxy, LowestFreeSlotGivesTheCookie) {
 TEST_F(DeviceEventProxy, SlotHoldsTheFirstAnswer) {
   Scene scene;
   scene.a.severalFaces = true;
-  const DWORD cookie = scene.process.Advise(scene.a);
+  scene.process.Advise(scene.a);
   scene.tree.lists[KDeviceRemoved] = {scene.tree.Device(u"r")};
   EXPECT_EQ(scene.process.Notify(), S_OK);
   EXPECT_EQ(Taken(scene.log), "A 0 c, A 0 c, A 2 r");
   EXPECT_EQ(scene.a.Calls(0), 3);
   EXPECT_EQ(scene.a.Calls(1), 0);
-  EXPECT_EQ(scene.process.point->Unadvise(cookie), S_OK);
 }
 
 TEST_F(DeviceEventProxy, FiringAnswersTheLastCode) {
@@ -212,7 +174,6 @@ TEST_F(DeviceEventProxy, FiringAnswersTheLastCode) {
     HRESULT result;
     const char* log;
   } kCases[] = {
-      {"all fine", {S_OK, S_FALSE, S_OK}, false, S_OK, "A 1 d, B 1 d, C 1 d"},
       {"first fails", {E_FAIL, S_OK, S_OK}, false, S_OK, "A 1 d, B 1 d, C 1 d"},
       {"last fails", {S_OK, S_OK, kOtherCode}, false, kOtherCode, "A 1 d, B 1 d, C 1 d"},
       {"filtered", {E_FAIL, S_FALSE, E_FAIL}, true, S_FALSE, "B 1 d"},
@@ -275,9 +236,7 @@ TEST_F(DeviceEventProxy, EnumeratesConnections) {
     const char* operations;
     const char* outcome;
   } kCases[] = {
-      {"n1 n1 n1", "S_OK:A1#1 S_OK:C3#1 S_FALSE#0"},
       {"n3 n1", "S_FALSE:A1:C3#2 S_FALSE#0"},
-      {"n2 r n2", "S_OK:A1:C3#2 S_OK S_OK:A1:C3#2"},
       {"n1! n0 n0! n2! n1", "S_OK:A1 S_OK#0 S_OK E_POINTER S_OK:C3#1"},
       {"s1 n1 s1 s0", "S_OK S_OK:C3#1 S_FALSE S_OK"},
       {"s3 r s2 n1", "S_FALSE S_OK S_OK S_FALSE#0"},
@@ -303,8 +262,6 @@ TEST_F(DeviceEventProxy, EnumeratesConnections) {
   for (const DWORD cookie : {1u, 3u}) EXPECT_EQ(scene.process.point->Unadvise(cookie), S_OK);
   EXPECT_EQ(scene.a.References(), 2);
   EXPECT_EQ(Play<CONNECTDATA>(list, "n2", nameOf), "S_OK:A1:C3#2");
-  ASSERT_EQ(scene.process.point->EnumConnections(list.Put()), S_OK);
-  EXPECT_EQ(Play<CONNECTDATA>(list, "n1", nameOf), "S_FALSE#0");
 }
 
 TEST_F(DeviceEventProxy, EnumeratesTheOnePoint) {
@@ -314,12 +271,10 @@ TEST_F(DeviceEventProxy, EnumeratesTheOnePoint) {
     const auto point = ComPtr<IConnectionPoint>::Attach(item);
     return !point ? "" : point.Get() == scene.process.point.Get() ? ":point" : ":?";
   };
-  for (const auto& [operations, outcome] : {std::pair{"n1 n1", "S_OK:point#1 S_FALSE#0"},
-                                            {"n2 r n1!", "S_FALSE:point#1 S_OK S_OK:point"},
-                                            {"s1 c n1 r c n1", "S_OK S_OK S_FALSE#0 S_OK S_OK S_OK:point#1"}}) {
+  {
     ComPtr<IEnumConnectionPoints> list;
     ASSERT_EQ(scene.Container()->EnumConnectionPoints(list.Put()), S_OK);
-    EXPECT_EQ(Play<IConnectionPoint*>(list, operations, nameOf), outcome) << operations;
+    EXPECT_EQ(Play<IConnectionPoint*>(list, "n2 r c n1!", nameOf), "S_FALSE:point#1 S_OK S_OK S_OK:point");
   }
   EXPECT_EQ(scene.NotifierReferences(), before);
 }
@@ -351,18 +306,16 @@ TEST_F(DeviceEventProxy, EnumeratorsWithoutMemory) {
     return container->EnumConnectionPoints(reinterpret_cast<IEnumConnectionPoints**>(out));
   });
   EXPECT_EQ(scene.a.References(), 2);
-  EXPECT_EQ(scene.process.point->Unadvise(1), S_OK);
 }
 
 // The module's end frees the slots and leaves the sinks alone: their code may be gone already. It is meant so.
 TEST_F(DeviceEventProxy, SinksLeftBehindAreNotReleased) {
   TestSink::Log log;
   ScriptedTree tree;
-  ScriptedTreeClass treeClass(tree);
   TestSink sink(log, "A");
   {
     NotifierProcess process;
-    process.UseTreeClass(&treeClass);
+    process.UseTreeClass(static_cast<IClassFactory*>(&tree));
     process.Start();
     process.Advise(sink);
   }

@@ -13,15 +13,13 @@ namespace {
 using platform::kDBT_DEVICEARRIVAL;
 using platform::kDBT_DEVICEREMOVECOMPLETE;
 using platform::kWM_DEVICECHANGE;
-using platform::simulated::CallOrder;
-using platform::simulated::DesktopCounts;
 using platform::simulated::VolumeBroadcast;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr std::uint32_t kArrival = kDBT_DEVICEARRIVAL;
 constexpr std::uint32_t kRemoval = kDBT_DEVICEREMOVECOMPLETE;
-constexpr std::uint32_t kOem = 0, kVolume = 2, kPort = 3, kInterface = 5, kHandle = 6;
+constexpr std::uint32_t kOem = 0, kVolume = 2, kInterface = 5;
 
 std::u16string Path(const std::u16string& id, const std::u16string& prefix = u"\\\\?\\") {
   return prefix + u"USB#" + id + u"#0a1b#{a5dcbf10-6530-11d2-901f-00c04fb951ed}";
@@ -33,13 +31,12 @@ struct Monitor {
   // What the broadcast set off: the delays of the calls, each at its moment.
   std::vector<std::uint64_t> Send(std::uint32_t event, const DeviceBroadcast& broadcast) {
     const std::uint64_t start = process.desktop.Now();
-    const std::size_t before = target.Calls().size();
-    const auto result = process.desktop.SendToWindow(process.desktop.Windows().at(0).handle, kWM_DEVICECHANGE, event,
-                                                     RecordOf(broadcast));
-    EXPECT_EQ(result, 0);
+    const auto& calls = target.Calls();
+    const std::size_t before = calls.size();
+    const platform::WindowHandle window = process.desktop.Windows().at(0).handle;
+    EXPECT_EQ(process.desktop.SendToWindow(window, kWM_DEVICECHANGE, event, RecordOf(broadcast)), 0);
     process.desktop.Settle();
     std::vector<std::uint64_t> delays;
-    const auto calls = target.Calls();
     for (std::size_t i = before; i < calls.size(); ++i) {
       EXPECT_EQ(calls[i], (RecordingTarget::Call{start + calls[i].delay, calls[i].delay, TRUE, true}));
       delays.push_back(calls[i].delay);
@@ -57,50 +54,35 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
   const std::u16string watched = kWatchedPath;
   const auto bytesUpTo = [](const std::u16string& text) { return 28 + 2 * text.size(); };
   const std::u16string upToCut = watched.substr(0, watched.rfind(u'#') + 1);
-  const std::u16string upToProduct = watched.substr(0, watched.find(u"1291") + 2);
   const struct {
     const char* what;
     std::uint32_t event;
     DeviceBroadcast broadcast;
     std::vector<std::uint64_t> delays;
   } kCases[] = {
-      {"volume came", kArrival, VolumeBroadcast(0, u'E', 0), {0}},
-      {"volume went", kRemoval, VolumeBroadcast(0, u'E', 0), {0}},
-      {"volume, its name not read", kArrival, NamedBroadcast(0, kVolume, u"x"), {0}},
+      {"volume", kArrival, VolumeBroadcast(0, u'E', 0), {0}},
       {"volume, header only", kRemoval, NamedBroadcast(0, kVolume, u"", 12), {0}},
       {"volume, header cut", kArrival, NamedBroadcast(0, kVolume, u"", 11), {}},
       {"watched came", kArrival, NamedBroadcast(0, kInterface, watched), {0}},
       {"watched went", kRemoval, NamedBroadcast(0, kInterface, watched), {3000}},
       {"product 1290", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1290")), {0}},
-      {"product 1292", kRemoval, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1292")), {3000}},
-      {"small letters", kArrival, NamedBroadcast(0, kInterface, Path(u"vid_05ac&pid_1292")), {0}},
+      {"small letters", kRemoval, NamedBroadcast(0, kInterface, Path(u"vid_05ac&pid_1292")), {3000}},
       {"product 128F", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_128F")), {}},
-      {"product 1293", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1293")), {}},
-      {"product 1293 went", kRemoval, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1293")), {}},
+      {"product 1293", kRemoval, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1293")), {}},
       {"vendor 05AD", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AD&PID_1291")), {}},
-      {"no ids", kArrival, NamedBroadcast(0, kInterface, Path(u"ROOT_HUB20")), {}},
       {"other types are read alike", kArrival, NamedBroadcast(0, kOem, watched), {0}},
-      {"port went", kRemoval, NamedBroadcast(0, kPort, watched), {3000}},
-      {"handle, not watched", kRemoval, NamedBroadcast(0, kHandle, u"COM1 and more"), {}},
       {"any prefix of four", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1291", u"####")), {0}},
       {"prefix skipped unseen", kArrival, NamedBroadcast(0, kInterface, u"VID_05AC&PID_1291#1#{x}"), {}},
-      {"no name", kArrival, NamedBroadcast(0, kInterface, u""), {}},
       {"name of four", kArrival, NamedBroadcast(0, kInterface, u"\\\\?\\"), {}},
       {"name of five", kArrival, NamedBroadcast(0, kInterface, u"\\\\?\\#"), {}},
       {"nothing to cut at", kArrival, NamedBroadcast(0, kInterface, u"\\\\?\\VID_05AC&PID_1291"), {}},
       {"name without its zero", kArrival, NamedBroadcast(0, kInterface, upToCut, bytesUpTo(upToCut)), {0}},
       {"half a character more", kArrival, NamedBroadcast(0, kInterface, watched, bytesUpTo(upToCut) + 1), {0}},
-      {"name cut in the product", kArrival, NamedBroadcast(0, kInterface, watched, bytesUpTo(upToProduct)), {}},
       {"record without a name", kArrival, NamedBroadcast(0, kInterface, watched, 28), {}},
-      {"header only", kRemoval, NamedBroadcast(0, kInterface, watched, 12), {}},
       {"size only", kRemoval, NamedBroadcast(0, kInterface, watched, 4), {}},
-      {"null came", kArrival, {}, {}},
-      {"null went", kRemoval, {}, {}},
-      {"nodes changed", 0x0007, {}, {}},
+      {"null", kArrival, {}, {}},
       {"query", 0x8001, VolumeBroadcast(0, u'E', 0), {}},
-      {"query failed", 0x8002, NamedBroadcast(0, kInterface, watched), {}},
       {"pending", 0x8003, NamedBroadcast(0, kInterface, watched), {}},
-      {"custom", 0x8006, VolumeBroadcast(0, u'E', 0), {}},
       {"beyond 16 bits", 0x18000, VolumeBroadcast(0, u'E', 0), {}},
   };
   Monitor monitor;
@@ -151,21 +133,12 @@ TEST(UsbEventReceiver, RegistersForEveryInterfaceOnceTheWindowIsThere) {
   EXPECT_FALSE(again.Start(&other));
   EXPECT_EQ(testing::internal::GetCapturedStdout(), "Failed to create a thread\nFailed to create a thread\n");
   EXPECT_TRUE(monitor.target.References() == 1 && other.References() == 2);
+  // Without a thread nothing is registered.
+  EXPECT_EQ(again.m_hDevNotify, 0);
+  EXPECT_EQ(desktop.Calls(DesktopCall::RegisterDeviceNotificationW), 1u);
 }
 
-TEST(UsbEventReceiver, StartFailsWithoutThreadOrWindow) {
-  {
-    MonitorProcess process;
-    process.desktop.Order({.call = DesktopCall::StartThread, .error = 8});
-    RecordingTarget target(process.desktop);
-    CZKUMUsbEventReceiver receiver;
-    testing::internal::CaptureStdout();
-    EXPECT_FALSE(receiver.Start(&target));
-    EXPECT_EQ(testing::internal::GetCapturedStdout(), "Failed to create a thread\n");
-    EXPECT_EQ(process.desktop.Counts(), DesktopCounts{});
-    EXPECT_EQ(process.desktop.Calls(DesktopCall::RegisterDeviceNotificationW), 0u);
-    EXPECT_EQ(receiver.m_hDevNotify, 0);
-  }
+TEST(UsbEventReceiver, StartFailsWithoutItsWindow) {
   // The object is published, its window not yet made: nobody waits for it, and volumes still come.
   for (const DesktopCall late : {DesktopCall::RegisterClassW, DesktopCall::CreateWindowExW}) {
     MonitorProcess process;
@@ -174,9 +147,7 @@ TEST(UsbEventReceiver, StartFailsWithoutThreadOrWindow) {
     CZKUMUsbEventReceiver receiver;
     EXPECT_FALSE(receiver.Start(&target));
     EXPECT_EQ(process.desktop.Now(), 10u);
-    EXPECT_EQ(process.desktop.Calls(DesktopCall::RegisterDeviceNotificationW), 1u);
     process.desktop.RunFor(90);
-    EXPECT_EQ(process.desktop.Counts().windows, 1u);
     EXPECT_EQ(process.desktop.Broadcast(NamedBroadcast(kArrival, kInterface, kWatchedPath)), 0u);
     EXPECT_EQ(process.desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0)), 1u);
     process.desktop.Settle();
@@ -205,7 +176,6 @@ TEST(UsbEventReceiver, StartFailsWithoutThreadOrWindow) {
     EXPECT_FALSE(receiver.Start(nullptr));
     EXPECT_EQ(process.desktop.Now(), 30u);
     EXPECT_EQ(process.desktop.Sleeps().size(), 3u);
-    for (const auto& sleep : process.desktop.Sleeps()) EXPECT_EQ(sleep.milliseconds, 10u);
     EXPECT_EQ(ModuleLockCount(), locks + 1);
   }
   UnlockModule();
@@ -224,7 +194,6 @@ TEST(UsbEventReceiver, LosesABroadcastWithoutAThreadOrAnApartment) {
   EXPECT_EQ(ModuleLockCount(), locks);
   EXPECT_EQ(g_nEventThreads, 0u);
   desktop.Settle();
-  EXPECT_THAT(monitor.target.Calls(), IsEmpty());
   EXPECT_EQ(desktop.Calls(DesktopCall::StartThread), 2u) << "tried again";
 
   // A thread in an apartment of the other kind cannot enter ours, and stays in its own.
@@ -241,7 +210,6 @@ TEST(UsbEventReceiver, LosesABroadcastWithoutAThreadOrAnApartment) {
   desktop.Settle();
   EXPECT_THAT(monitor.target.Calls(), IsEmpty());
   EXPECT_EQ(own, S_FALSE);
-  EXPECT_EQ(ModuleLockCount(), locks);
 
   // Neither keeps the lock or the next broadcast; an exception of the target does not, either.
   monitor.target.onCall = [] { throw std::bad_alloc(); };
@@ -298,29 +266,23 @@ TEST(UsbEventReceiver, TeardownTakesBackAllButTheWindow) {
   EXPECT_EQ(target.References(), 1);
   EXPECT_TRUE(g_pNotifyTarget == nullptr && g_pActiveReceiver == nullptr && g_pMsgWindow != nullptr);
   EXPECT_EQ(desktop.Counts().registrations, 0u);
-  EXPECT_EQ(desktop.Counts().windows, 1u);
   const std::uint64_t threads = desktop.Calls(DesktopCall::StartThread);
   EXPECT_EQ(desktop.Broadcast(volume), 1u);
   EXPECT_EQ(desktop.Broadcast(NamedBroadcast(kArrival, kInterface, kWatchedPath)), 0u);
   desktop.Settle();
   EXPECT_EQ(desktop.Calls(DesktopCall::StartThread), threads);
   EXPECT_THAT(target.Calls(), IsEmpty());
-  // Never started: nothing to take back.
-  const CZKUMUsbEventReceiver idle;
-  EXPECT_TRUE(idle.m_nBusy == 0 && idle.m_hDevNotify == 0);
 }
 
 TEST(UsbEventReceiver, StopsReceivingAfterTheLastEventThread) {
   Monitor monitor;
   SimulatedDesktop& desktop = monitor.process.desktop;
   const std::uint64_t start = desktop.Now();
-  const std::int32_t locks = ModuleLockCount();
   desktop.Broadcast(NamedBroadcast(kRemoval, kInterface, kWatchedPath));
   desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0));
   StopReceiving();
   EXPECT_EQ(monitor.target.Calls().size(), 2u);
   EXPECT_EQ(desktop.Now(), start + 3000);
-  EXPECT_EQ(ModuleLockCount(), locks);
   EXPECT_EQ(monitor.target.References(), 2);
   EXPECT_EQ(desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0)), 1u);
   desktop.Settle();

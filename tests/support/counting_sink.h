@@ -1,6 +1,8 @@
 // A sink that counts what it is told.
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <atomic>
 #include <cstddef>
 
@@ -9,8 +11,21 @@
 
 namespace testing_support {
 
+// Whoever fires an event knows the member and calls nothing but Invoke.
+struct Callable : IDispatch {
+  HRESULT STDMETHODCALLTYPE GetTypeInfoCount(UINT*) override { return Unexpected(); }
+  HRESULT STDMETHODCALLTYPE GetTypeInfo(UINT, LCID, ITypeInfo**) override { return Unexpected(); }
+  HRESULT STDMETHODCALLTYPE GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override { return Unexpected(); }
+
+ private:
+  static HRESULT Unexpected() {
+    ADD_FAILURE() << "asked for types or names";
+    return E_NOTIMPL;
+  }
+};
+
 // Stands on the stack of a test, which has to give every reference back or end the process.
-class CountingSink final : public IDispatch {
+class CountingSink final : public Callable {
  public:
   std::size_t Events() const { return m_events; }
   LONG References() const { return m_references; }
@@ -24,9 +39,6 @@ class CountingSink final : public IDispatch {
   }
   ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
   ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
-  HRESULT STDMETHODCALLTYPE GetTypeInfoCount(UINT*) override { return E_NOTIMPL; }
-  HRESULT STDMETHODCALLTYPE GetTypeInfo(UINT, LCID, ITypeInfo**) override { return E_NOTIMPL; }
-  HRESULT STDMETHODCALLTYPE GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override { return E_NOTIMPL; }
   HRESULT STDMETHODCALLTYPE Invoke(DISPID, REFIID, LCID, WORD, DISPPARAMS*, VARIANT*, EXCEPINFO*, UINT*) override {
     ++m_events;
     return S_OK;

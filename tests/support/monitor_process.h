@@ -6,7 +6,6 @@
 #include <atomic>
 #include <cstring>
 #include <functional>
-#include <mutex>
 #include <string>
 #include <utility>
 #include <vector>
@@ -31,10 +30,7 @@ class MonitorProcess {
  public:
   explicit MonitorProcess(ClockMode mode = ClockMode::Virtual) : desktop(mode) {
     ForgetMonitorState();
-    platform::System system;
-    system.threads = &desktop;
-    system.desktop = &desktop;
-    platform::SetCurrentSystem(system);
+    platform::SetCurrentSystem({.threads = &desktop, .desktop = &desktop});
   }
   ~MonitorProcess() {
     desktop.EndProcess();
@@ -50,7 +46,8 @@ class MonitorProcess {
   SimulatedDesktop desktop;
 };
 
-// Remembers each call; on one thread at a time, as the lock promises.
+// Remembers each call without a lock of its own: the notification lock lets one thread in at a time. Read when no event
+// thread runs.
 class RecordingTarget final : public IZKUMPrivateNotifier {
  public:
   struct Call {
@@ -62,20 +59,11 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
   };
 
   explicit RecordingTarget(SimulatedDesktop& desktop) : m_desktop(desktop) {}
-  ~RecordingTarget() {
-    EXPECT_EQ(m_references, 1) << "references of others";
-    EXPECT_FALSE(releasedWhileNamed);
-  }
+  ~RecordingTarget() { EXPECT_EQ(m_references, 1) << "references of others"; }
 
-  std::vector<Call> Calls() const {
-    const std::lock_guard lock(m_mutex);
-    return m_calls;
-  }
+  const std::vector<Call>& Calls() const { return m_calls; }
   std::int32_t References() const { return m_references; }
-  // Runs inside each call.
-  std::function<void()> onCall;
-  // Somebody could still have called it while it was let go.
-  std::atomic<bool> releasedWhileNamed = false;
+  std::function<void()> onCall;  // inside each call
 
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID, void** object) override {
     *object = nullptr;
@@ -83,17 +71,14 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
   }
   ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
   ULONG STDMETHODCALLTYPE Release() override {
-    if (g_pNotifyTarget == this) releasedWhileNamed = true;
+    EXPECT_NE(g_pNotifyTarget, this) << "could still be called while it was let go";
     return static_cast<ULONG>(--m_references);
   }
   HRESULT STDMETHODCALLTYPE NotifyDeviceChange(ULONG delay, BYTE fire) override {
     // A thread that is in it already is told so.
     const HRESULT entered = CoInitializeEx(nullptr, COINIT_MULTITHREADED);
     if (SUCCEEDED(entered)) CoUninitialize();
-    {
-      const std::lock_guard lock(m_mutex);
-      m_calls.push_back({m_desktop.Now(), delay, fire, entered == S_FALSE});
-    }
+    m_calls.push_back({m_desktop.Now(), delay, fire, entered == S_FALSE});
     if (onCall) onCall();
     return S_OK;
   }
@@ -101,7 +86,6 @@ class RecordingTarget final : public IZKUMPrivateNotifier {
  private:
   SimulatedDesktop& m_desktop;
   std::atomic<std::int32_t> m_references = 1;
-  mutable std::mutex m_mutex;
   std::vector<Call> m_calls;
 };
 

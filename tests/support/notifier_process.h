@@ -38,8 +38,6 @@ class NotifierProcess {
     CoUninitialize();
     module.reset();
   }
-  NotifierProcess(const NotifierProcess&) = delete;
-  NotifierProcess& operator=(const NotifierProcess&) = delete;
 
   // The class object that creating a tree asks from now on; none for null.
   void UseTreeClass(IUnknown* classObject) {
@@ -48,17 +46,16 @@ class NotifierProcess {
     if (classObject == nullptr) return;
     EXPECT_EQ(CoRegisterClassObject(CLSID_ZKUMUsbTree, classObject, CLSCTX_INPROC_SERVER, 0, &m_treeClass), S_OK);
   }
-  void UseOwnTreeClass() {
-    ComPtr<IUnknown> own;
-    EXPECT_EQ(module->GetClassObject(CLSID_ZKUMUsbTree, platform::IidOf<IUnknown>(), own.PutVoid()), S_OK);
-    UseTreeClass(own.Get());
+  ComPtr<IClassFactory> Class(const CLSID& clsid) {
+    ComPtr<IClassFactory> factory;
+    EXPECT_EQ(module->GetClassObject(clsid, platform::IidOf<IClassFactory>(), factory.PutVoid()), S_OK);
+    return factory;
   }
+  void UseOwnTreeClass() { UseTreeClass(Class(CLSID_ZKUMUsbTree).Get()); }
 
   HRESULT Create(ComPtr<IZKUMEventNotifier>& out) {
-    ComPtr<IClassFactory> factory;
-    EXPECT_EQ(module->GetClassObject(CLSID_ZKUMEventNotifier, platform::IidOf<IClassFactory>(), factory.PutVoid()),
-              S_OK);
-    return factory->CreateInstance(nullptr, platform::IidOf<IZKUMEventNotifier>(), out.PutVoid());
+    return Class(CLSID_ZKUMEventNotifier)
+        ->CreateInstance(nullptr, platform::IidOf<IZKUMEventNotifier>(), out.PutVoid());
   }
   // `notifier` and `point` are there from now on.
   void Start() {

@@ -10,9 +10,13 @@ namespace KelvoUHW {
 // A notifier over a scripted tree, with one device in list 0.
 struct NotifierScene {
   NotifierScene() {
-    process.UseTreeClass(&treeClass);
+    process.UseTreeClass(static_cast<IClassFactory*>(&tree));
     process.Start();
     tree.lists[KDeviceConnected] = {tree.Device(u"c")};
+  }
+  // Whoever is still advised lets go.
+  ~NotifierScene() {
+    for (DWORD cookie = 1; process.point && cookie <= 9; ++cookie) process.point->Unadvise(cookie);
   }
   std::int32_t NotifierReferences() {
     const auto count = static_cast<std::int32_t>(process.notifier->AddRef()) - 1;
@@ -23,7 +27,6 @@ struct NotifierScene {
 
   TestSink::Log log;
   ScriptedTree tree;
-  ScriptedTreeClass treeClass{tree};
   TestSink a{log, "A"};
   TestSink b{log, "B"};
   TestSink c{log, "C"};

@@ -1,4 +1,4 @@
-// A tree object whose builds, codes and lists a test sets, and its class.
+// A tree object whose builds, codes and lists a test sets; it is its own class object.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -14,10 +14,11 @@
 
 namespace KelvoUHW {
 
-class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree {
+class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public IClassFactory {
  public:
   ~ScriptedTree() { EXPECT_EQ(m_references, 1) << "references of others"; }
 
+  HRESULT created = S_OK;
   HRESULT offers = S_OK;  // what a question for IBuildUsbTree is answered with
   HRESULT built = S_OK;
   HRESULT listed = S_OK;
@@ -43,6 +44,8 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree {
     if (iid == platform::IidOf<IBuildUsbTree>()) {
       if (FAILED(offers)) return offers;
       *out = static_cast<IBuildUsbTree*>(this);
+    } else if (iid == platform::IidOf<IClassFactory>()) {
+      *out = static_cast<IClassFactory*>(this);
     } else if (iid == platform::IidOf<IUnknown>() || iid == platform::IidOf<IZKUMUsbTree>()) {
       *out = static_cast<IZKUMUsbTree*>(this);
     } else {
@@ -53,6 +56,14 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree {
   }
   ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
   ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
+
+  HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown* outer, REFIID iid, void** out) override {
+    EXPECT_EQ(outer, nullptr);
+    EXPECT_TRUE(iid == platform::IidOf<IZKUMUsbTree>());
+    *out = nullptr;
+    return FAILED(created) ? created : QueryInterface(iid, out);
+  }
+  HRESULT STDMETHODCALLTYPE LockServer(BOOL) override { return S_OK; }
 
   HRESULT STDMETHODCALLTYPE get_RootNode(IZKUMUsbTreeNode**) override { return E_NOTIMPL; }
   HRESULT STDMETHODCALLTYPE get_PortDevicesWithVendorId(ULONG, IZKUMUsbTreeNodeEnumerator**) override {
@@ -83,33 +94,6 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree {
 
   std::int32_t m_references = 1;
   std::vector<NodePtr> m_ports;
-};
-
-// Hands out the tree it is given, or fails.
-class ScriptedTreeClass final : public IClassFactory {
- public:
-  ScriptedTreeClass(ScriptedTree& tree, HRESULT code = S_OK) : m_tree(tree), m_code(code) {}
-  ~ScriptedTreeClass() { EXPECT_EQ(m_references, 1) << "references of others"; }
-
-  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID, void** out) override {
-    *out = this;
-    AddRef();
-    return S_OK;
-  }
-  ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
-  ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
-  HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown* outer, REFIID iid, void** out) override {
-    EXPECT_EQ(outer, nullptr);
-    EXPECT_TRUE(iid == platform::IidOf<IZKUMUsbTree>());
-    *out = nullptr;
-    return FAILED(m_code) ? m_code : m_tree.QueryInterface(iid, out);
-  }
-  HRESULT STDMETHODCALLTYPE LockServer(BOOL) override { return S_OK; }
-
- private:
-  ScriptedTree& m_tree;
-  const HRESULT m_code;
-  std::int32_t m_references = 1;
 };
 
 }  // namespace KelvoUHW

@@ -12,6 +12,7 @@
 #include "com/com_ptr.h"
 #include "com/zkusb_monitor.h"
 #include "platform/text.h"
+#include "tests/support/counting_sink.h"
 
 namespace KelvoUHW {
 
@@ -59,26 +60,16 @@ class TestSink final : public IUnknown {
   static constexpr HRESULT kThrows = 1;
 
  private:
-  struct Face final : IDispatch {
+  struct Face final : testing_support::Callable {
     explicit Face(TestSink& s) : sink(s) {}
     HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override { return sink.QueryInterface(iid, out); }
     ULONG STDMETHODCALLTYPE AddRef() override { return sink.AddRef(); }
     ULONG STDMETHODCALLTYPE Release() override { return sink.Release(); }
-    HRESULT STDMETHODCALLTYPE GetTypeInfoCount(UINT*) override { return Unexpected("GetTypeInfoCount"); }
-    HRESULT STDMETHODCALLTYPE GetTypeInfo(UINT, LCID, ITypeInfo**) override { return Unexpected("GetTypeInfo"); }
-    HRESULT STDMETHODCALLTYPE GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override {
-      return Unexpected("GetIDsOfNames");
-    }
     HRESULT STDMETHODCALLTYPE Invoke(DISPID member, REFIID iid, LCID locale, WORD flags, DISPPARAMS* parameters,
                                      VARIANT* result, EXCEPINFO* exception, UINT* argumentError) override {
       ++calls;
       return sink.Called(member, iid, locale, flags, parameters, result, exception, argumentError);
     }
-    static HRESULT Unexpected(const char* call) {
-      ADD_FAILURE() << call;
-      return E_NOTIMPL;
-    }
-
     TestSink& sink;
     int calls = 0;
   };
@@ -108,7 +99,7 @@ class TestSink final : public IUnknown {
   static std::string NameOf(const ComPtr<IZKUMUsbTreeNode>& node) {
     BSTR id = nullptr;
     if (!node || FAILED(node->get_InstanceId(&id))) return "?";
-    const std::u16string text(id, SysStringLen(id));
+    const std::u16string text(platform::BstrText(id));
     SysFreeString(id);
     return platform::ToUtf8(text.substr(text.rfind(u'\\') + 1));
   }
