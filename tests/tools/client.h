@@ -4,7 +4,6 @@
 
 #include <gmock/gmock.h>
 
-#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <functional>
@@ -13,6 +12,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/text.h"
 #include "tests/support/program.h"
 #include "tools/zkusb/run.h"
 
@@ -56,7 +56,12 @@ inline Json LoadJson(const std::filesystem::path& path) {
 // A file that is gone with its owner.
 class TemporaryFile {
  public:
-  explicit TemporaryFile(const std::string& text) : m_path(FreePath()) { std::ofstream(m_path) << text; }
+  explicit TemporaryFile(const std::string& text) {
+    static int count = 0;
+    const auto* test = testing::UnitTest::GetInstance()->current_test_info();
+    m_path = testing::TempDir() + "zkusb-" + test->test_suite_name() + test->name() + std::to_string(++count);
+    std::ofstream(m_path) << text;
+  }
   ~TemporaryFile() { std::filesystem::remove(m_path); }
   TemporaryFile(const TemporaryFile&) = delete;
   TemporaryFile& operator=(const TemporaryFile&) = delete;
@@ -64,11 +69,6 @@ class TemporaryFile {
   std::string Path() const { return m_path; }
 
  private:
-  static std::string FreePath() {
-    static int count = 0;
-    const auto* test = testing::UnitTest::GetInstance()->current_test_info();
-    return testing::TempDir() + "zkusb-" + test->test_suite_name() + "-" + test->name() + "-" + std::to_string(++count);
-  }
   std::string m_path;
 };
 
@@ -83,10 +83,8 @@ inline std::string ChangedMachine(const std::function<void(Json&)>& change) {
 inline std::string IdOf(const Json& node) {
   const int vendor = node.at("VendorId").get<int>();
   const int product = node.at("ProductId").get<int>();
-  if (vendor < 0 || product < 0) return "";
-  char text[32];
-  std::snprintf(text, sizeof text, "%04X:%04X", static_cast<unsigned>(vendor), static_cast<unsigned>(product));
-  return text;
+  const auto hex = [](int id) { return platform::ToUtf8(platform::Hex(static_cast<std::uint32_t>(id), 4)); };
+  return vendor < 0 || product < 0 ? "" : hex(vendor) + ":" + hex(product);
 }
 
 }  // namespace zkusb

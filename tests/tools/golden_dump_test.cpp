@@ -1,8 +1,5 @@
 #include <algorithm>
-#include <filesystem>
-#include <fstream>
 #include <iterator>
-#include <string>
 
 #include "tests/tools/client.h"
 
