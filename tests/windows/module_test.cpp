@@ -4,8 +4,10 @@
 
 #include <dbt.h>
 #include <gtest/gtest.h>
+#include <process.h>
 
-#include <condition_variable>
+#include <algorithm>
+#include <array>
 #include <filesystem>
 #include <fstream>
 #include <functional>
@@ -20,6 +22,7 @@
 #include "platform/system.h"
 #include "platform/text.h"
 #include "platform/windows/server_classes.h"
+#include "tests/support/object_reader.h"
 #include "tests/windows/module_files.h"
 #include "tools/zkusb/event_sink.h"
 
@@ -45,44 +48,25 @@ struct Entry {
   std::string text;
 };
 
+// Keys and values of every kind: which there are is tested with the registration itself.
 std::vector<Entry> Entries(const std::u16string& modulePath) {
   const std::string module = platform::ToUtf8(modulePath);
   const std::u16string library = u"TypeLib\\{A2AC77FD-36C6-4C2A-B238-F89B35DAA570}\\1.0";
-  std::vector<Entry> entries = {
+  const std::u16string tree = u"CLSID\\{34349D2D-14C6-414B-9771-A7BD2A7C7180}";
+  return {
       {u"AppID\\{A0C53575-7F3D-4FF2-B5A7-BFA873492510}", u"", "ZKUsbMonitor"},
       {u"AppID\\ZKUsbMonitor.DLL", u"AppID", "{A0C53575-7F3D-4FF2-B5A7-BFA873492510}"},
       {library, u"", "ZKUsbMonitor 1.0 Type Library"},
       {library + u"\\0\\win32", u"", module},
       {u"Interface\\{8080AF8D-857A-45C4-8296-AB1301ADFA28}", u"", "IZKUMUsbTreeNode"},
       {u"Interface\\{8080AF8D-857A-45C4-8296-AB1301ADFA28}\\TypeLib", u"", "{A2AC77FD-36C6-4C2A-B238-F89B35DAA570}"},
+      {u"KelvoUsbMonitor.UsbTree\\CurVer", u"", "KelvoUsbMonitor.UsbTree.1"},
+      {tree, u"", "ZKUMUsbTree Class"},
+      {tree + u"\\Programmable", u"", "no value"},
+      {tree + u"\\InprocServer32", u"", module},
+      {tree + u"\\InprocServer32", u"ThreadingModel", "Free"},
+      {u"CLSID\\{1D7E7A5B-648D-4236-8604-8F5F3C82433A}\\InprocServer32", u"", module},
   };
-  const struct {
-    std::u16string progId, clsid;
-    std::string description;
-  } classes[] = {
-      {kTreeProgId, u"{34349D2D-14C6-414B-9771-A7BD2A7C7180}", "ZKUMUsbTree Class"},
-      {kNotifierProgId, u"{1D7E7A5B-648D-4236-8604-8F5F3C82433A}", "ZKUMEventNotifier Class"},
-  };
-  for (const auto& [progId, clsid, description] : classes) {
-    const std::u16string key = u"CLSID\\" + clsid;
-    const std::string versioned = platform::ToUtf8(progId) + ".1";
-    const std::vector<Entry> own = {
-        {progId + u".1", u"", description},
-        {progId + u".1\\CLSID", u"", platform::ToUtf8(clsid)},
-        {progId, u"", description},
-        {progId + u"\\CLSID", u"", platform::ToUtf8(clsid)},
-        {progId + u"\\CurVer", u"", versioned},
-        {key, u"", description},
-        {key + u"\\ProgID", u"", versioned},
-        {key + u"\\VersionIndependentProgID", u"", platform::ToUtf8(progId)},
-        {key + u"\\Programmable", u"", "no value"},
-        {key + u"\\InprocServer32", u"", module},
-        {key + u"\\InprocServer32", u"ThreadingModel", "Free"},
-        {key + u"\\TypeLib", u"", "{A2AC77FD-36C6-4C2A-B238-F89B35DAA570}"},
-    };
-    entries.insert(entries.end(), own.begin(), own.end());
-  }
-  return entries;
 }
 
 void ExpectRegistered(const std::u16string& modulePath) {
@@ -106,25 +90,13 @@ TEST(WindowsModule, RegistersAndUnregisters) {
 }
 
 TEST(WindowsModule, IsRegisteredByTheSystemsOwnProgram) {
-  const auto regsvr32 = [](const std::u16string& option) {
-    std::u16string command = u"regsvr32 /s " + option + u"\"" + Module() + u"\"";
-    STARTUPINFOW startup{};
-    startup.cb = sizeof startup;
-    PROCESS_INFORMATION process{};
-    if (!CreateProcessW(nullptr, platform::ToSystemText(command.data()), nullptr, nullptr, FALSE, 0, nullptr, nullptr,
-                        &startup, &process)) {
-      return DWORD{999};
-    }
-    DWORD code = 998;
-    WaitForSingleObject(process.hProcess, 60000);
-    GetExitCodeProcess(process.hProcess, &code);
-    CloseHandle(process.hThread);
-    CloseHandle(process.hProcess);
-    return code;
+  const auto regsvr32 = [](std::u16string arguments) {
+    arguments.append(u" \"").append(Module()).append(u"\"");
+    return _wspawnlp(_P_WAIT, L"regsvr32.exe", L"regsvr32", platform::ToSystemText(arguments.c_str()), nullptr);
   };
-  EXPECT_EQ(regsvr32(u""), 0u);
+  EXPECT_EQ(regsvr32(u"/s"), 0);
   ExpectRegistered(Module());
-  EXPECT_EQ(regsvr32(u"/u "), 0u);
+  EXPECT_EQ(regsvr32(u"/s /u"), 0);
   EXPECT_EQ(Read(kTreeProgId, u""), "no key");
 }
 
@@ -209,29 +181,27 @@ class Events {
       if (device) device->get_VendorId(&vendor);
       const std::lock_guard lock(m_mutex);
       m_told.push_back({kind, vendor});
-      m_changed.notify_all();
     });
   }
-  std::size_t Count(TDeviceEventType kind, LONG vendor = 0) {
+  std::size_t Count(TDeviceEventType kind, LONG vendor) {
     const std::lock_guard lock(m_mutex);
-    return CountLocked(kind, vendor);
+    return static_cast<std::size_t>(std::ranges::count(m_told, std::pair(kind, vendor)));
   }
-  bool WaitFor(TDeviceEventType kind, LONG vendor) {
-    std::unique_lock lock(m_mutex);
-    return m_changed.wait_for(lock, 20s, [&] { return CountLocked(kind, vendor) != 0; });
+  std::size_t Count(TDeviceEventType kind) {
+    const std::lock_guard lock(m_mutex);
+    return static_cast<std::size_t>(std::ranges::count(m_told, kind, &std::pair<TDeviceEventType, LONG>::first));
   }
 
  private:
-  std::size_t CountLocked(TDeviceEventType kind, LONG vendor) const {
-    std::size_t count = 0;
-    for (const auto& [toldKind, toldVendor] : m_told)
-      count += toldKind == kind && (vendor == 0 || vendor == toldVendor);
-    return count;
-  }
   std::mutex m_mutex;
-  std::condition_variable m_changed;
   std::vector<std::pair<TDeviceEventType, LONG>> m_told;
 };
+
+template <class Condition>
+bool WaitUntil(Condition condition) {
+  for (int i = 0; i < 1000 && !condition(); ++i) std::this_thread::sleep_for(20ms);
+  return condition();
+}
 
 // The window that the component makes for this process, on a thread of its own.
 HWND FindReceiver() {
@@ -248,54 +218,35 @@ HWND Receiver() {
   return FindReceiver();
 }
 
-std::string InstanceId(IZKUMUsbTreeNode& node) {
-  BSTR text = nullptr;
-  EXPECT_EQ(node.get_InstanceId(&text), S_OK);
-  const std::string result = platform::ToUtf8(platform::BstrText(text));
-  SysFreeString(text);
-  return result;
-}
-
-std::size_t CountNodes(IZKUMUsbTreeNodeEnumerator& nodes) {
+// Of a list, which may be missing; `visit` is called with each node.
+std::size_t CountNodes(
+    const ComPtr<IZKUMUsbTreeNodeEnumerator>& nodes,
+    const std::function<void(const ComPtr<IZKUMUsbTreeNode>&)>& visit = [](const auto&) {}) {
   std::size_t count = 0;
-  VARIANT_BOOL more = VARIANT_FALSE;
-  while (nodes.MoveNext(&more) == S_OK && more != VARIANT_FALSE) {
-    ComPtr<IZKUMUsbTreeNode> node;
-    EXPECT_EQ(nodes.GetCurrent(node.Put()), S_OK);
+  if (!nodes) return count;
+  testing_support::ForEachNode(*nodes.Get(), [&](HRESULT result, const ComPtr<IZKUMUsbTreeNode>& node) {
+    EXPECT_EQ(result, S_OK);
+    if (node) visit(node);
     ++count;
-  }
+  });
   return count;
 }
 
-// How many nodes the three methods whose parameters carry no direction bring, together with what they answer.
-struct Undirected {
-  std::size_t subtree = 0, volumes = 0;
-  bool child = false;
-};
-Undirected CallUndirected(IZKUMUsbTree& tree, IZKUMUsbTreeNode& root) {
-  Undirected brought;
-  ComPtr<IZKUMUsbTreeNodeEnumerator> devices;
-  EXPECT_EQ(root.get_InSubtreeDevicesOfType(KUDTPortDevice, devices.Put()), S_OK);
-  if (devices) brought.subtree = CountNodes(*devices.Get());
-  ComPtr<IZKUMUsbTreeNodeEnumerator> volumes;
-  EXPECT_EQ(tree.get_PortDevicesWithVolume(volumes.Put()), S_OK);
-  if (volumes) brought.volumes = CountNodes(*volumes.Get());
-
-  ComPtr<IZKUMUsbTreeNodeEnumerator> stick;
-  EXPECT_EQ(tree.get_PortDevicesWithVendorId(0x0781, stick.Put()), S_OK);
-  VARIANT_BOOL more = VARIANT_FALSE;
-  EXPECT_EQ(stick->MoveNext(&more), S_OK);
-  ComPtr<IZKUMUsbTreeNode> node;
-  EXPECT_EQ(stick->GetCurrent(node.Put()), S_OK);
-  const auto device = node.As<IZKUMPortDevice>();
+// How many nodes the three methods whose parameters carry no direction bring, together with what they answer: those of
+// a subtree, those with a volume, and a child.
+std::array<std::size_t, 3> CallUndirected(IZKUMUsbTree& tree, IZKUMUsbTreeNode& root) {
+  ComPtr<IZKUMUsbTreeNodeEnumerator> devices, volumes, sticks;
   ComPtr<IZKUMUsbTreeNode> child;
-  if (!device) {
-    ADD_FAILURE() << "no port device";
-    return brought;
-  }
-  EXPECT_EQ(device->get_FirstChildOfType(node.Get(), KUDTInterfaceDevice, child.Put()), S_OK);
-  brought.child = child.Get() != nullptr;
-  return brought;
+  EXPECT_EQ(root.get_InSubtreeDevicesOfType(KUDTPortDevice, devices.Put()), S_OK);
+  EXPECT_EQ(tree.get_PortDevicesWithVolume(volumes.Put()), S_OK);
+  EXPECT_EQ(tree.get_PortDevicesWithVendorId(0x0781, sticks.Put()), S_OK);
+  const std::size_t found = CountNodes(sticks, [&](const ComPtr<IZKUMUsbTreeNode>& stick) {
+    const auto device = stick.As<IZKUMPortDevice>();
+    ASSERT_TRUE(device);
+    EXPECT_EQ(device->get_FirstChildOfType(stick.Get(), KUDTInterfaceDevice, child.Put()), S_OK);
+  });
+  EXPECT_EQ(found, 1u);
+  return {CountNodes(devices), CountNodes(volumes), child ? 1u : 0u};
 }
 
 TEST_F(Client, HearsOfDevicesAndReadsTheTreeFromBothApartments) {
@@ -313,14 +264,14 @@ TEST_F(Client, HearsOfDevicesAndReadsTheTreeFromBothApartments) {
     EXPECT_EQ(events.Count(KDeviceConnected), 3u);
     ComPtr<IZKUMUsbTreeNode> root;
     ASSERT_EQ(tree->get_RootNode(root.Put()), S_OK);
-    const Undirected here = CallUndirected(*tree.Get(), *root.Get());
-    EXPECT_EQ(here.subtree, 3u);
-    EXPECT_GT(here.volumes, 0u);
-    EXPECT_TRUE(here.child);
+    const auto [subtree, volumes, child] = CallUndirected(*tree.Get(), *root.Get());
+    EXPECT_EQ(subtree, 3u);
+    EXPECT_GT(volumes, 0u);
+    EXPECT_EQ(child, 1u);
 
     // The window hears only what is sent to it.
-    const HWND window = Receiver();
-    ASSERT_NE(window, nullptr);
+    ASSERT_TRUE(WaitUntil([] { return FindReceiver() != nullptr; }));
+    const HWND window = FindReceiver();
     platform::DEV_BROADCAST_VOLUME volume;
     volume.dbcv_size = sizeof volume;
     volume.dbcv_unitmask = 1 << 5;
@@ -329,7 +280,7 @@ TEST_F(Client, HearsOfDevicesAndReadsTheTreeFromBothApartments) {
     EXPECT_EQ(events.Count(KDeviceAttached), 0u);
     EXPECT_FALSE(PostMessageW(window, WM_DEVICECHANGE, DBT_DEVICEARRIVAL, record));
     EXPECT_EQ(SendMessageW(window, WM_DEVICECHANGE, DBT_DEVICEARRIVAL, record), 0);
-    EXPECT_TRUE(events.WaitFor(KDeviceAttached, 0x0951));
+    EXPECT_TRUE(WaitUntil([&] { return events.Count(KDeviceAttached, 0x0951) != 0; }));
 
     InApartment(COINIT_APARTMENTTHREADED, [&] {
       const auto proxy = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree, kTreeProgId);
@@ -338,18 +289,15 @@ TEST_F(Client, HearsOfDevicesAndReadsTheTreeFromBothApartments) {
       EXPECT_NE(proxy.Get(), tree.Get());
       ComPtr<IZKUMUsbTreeNode> remote;
       ASSERT_EQ(proxy->get_RootNode(remote.Put()), S_OK);
-      EXPECT_EQ(InstanceId(*remote.Get()), InstanceId(*root.Get()));
+      EXPECT_EQ(testing_support::InstanceIdOf(remote), testing_support::InstanceIdOf(root));
       TUsbDeviceType type = KUDTUnknown;
       EXPECT_EQ(remote->get_Type(&type), S_OK);
       EXPECT_EQ(type, KUDTRoot);
       ComPtr<IZKUMUsbTreeNodeEnumerator> childs;
       ASSERT_EQ(remote->get_Childs(childs.Put()), S_OK);
-      EXPECT_GT(CountNodes(*childs.Get()), 0u);
+      EXPECT_GT(CountNodes(childs), 0u);
       // Through a proxy, a parameter without direction brings nothing back. This is published and meant.
-      const Undirected there = CallUndirected(*proxy.Get(), *remote.Get());
-      EXPECT_EQ(there.subtree, 0u);
-      EXPECT_EQ(there.volumes, 0u);
-      EXPECT_FALSE(there.child);
+      EXPECT_EQ(CallUndirected(*proxy.Get(), *remote.Get()), (std::array<std::size_t, 3>{}));
     });
     EXPECT_EQ(point->Unadvise(cookie), S_OK);
   });

@@ -1,6 +1,8 @@
 #include "tests/windows/type_library_dump.h"
 
+#include <algorithm>
 #include <cstdio>
+#include <iterator>
 #include <stdexcept>
 #include <vector>
 
@@ -81,36 +83,27 @@ std::string Referred(ITypeInfo& type, HREFTYPE reference) {
   return Name(*referred.Get());
 }
 
-std::string TypeText(ITypeInfo& type, const TYPEDESC& description) {
-  switch (description.vt) {
-    case VT_PTR:
-      return TypeText(type, *description.lptdesc) + "*";
-    case VT_USERDEFINED:
-      return Referred(type, description.hreftype);
-    case VT_BSTR:
-      return "BSTR";
-    case VT_BOOL:
-      return "VARIANT_BOOL";
-    case VT_I4:
-      return "long";
-    case VT_UI4:
-      return "unsigned long";
-    case VT_UI1:
-      return "unsigned char";
-    case VT_UNKNOWN:
-      return "IUnknown*";
-    case VT_HRESULT:
-      return "HRESULT";
-    case VT_VOID:
-      return "void";
-    default:
-      return "vt" + Number(description.vt);
-  }
+// The name of a number, or `other` and the number.
+template <std::size_t Count>
+std::string NameOf(unsigned value, const Flag (&names)[Count], const char* other) {
+  const auto found = std::ranges::find(names, value, &Flag::value);
+  return found == std::end(names) ? other + Number(value) : found->name;
 }
 
-std::string Kind(INVOKEKIND kind) {
-  if (kind == INVOKE_FUNC) return "method";
-  return kind == INVOKE_PROPERTYGET ? "propget" : "kind" + Number(kind);
+constexpr Flag kTypes[] = {{VT_BSTR, "BSTR"},         {VT_BOOL, "VARIANT_BOOL"}, {VT_I4, "long"},
+                           {VT_UI4, "unsigned long"}, {VT_UI1, "unsigned char"}, {VT_UNKNOWN, "IUnknown*"},
+                           {VT_HRESULT, "HRESULT"},   {VT_VOID, "void"}};
+constexpr Flag kInvocations[] = {{INVOKE_FUNC, "method"}, {INVOKE_PROPERTYGET, "propget"}};
+constexpr Flag kTypeKinds[] = {{TKIND_INTERFACE, "interface"},
+                               {TKIND_DISPATCH, "dispinterface"},
+                               {TKIND_ENUM, "enum"},
+                               {TKIND_ALIAS, "alias"},
+                               {TKIND_COCLASS, "coclass"}};
+
+std::string TypeText(ITypeInfo& type, const TYPEDESC& description) {
+  if (description.vt == VT_PTR) return TypeText(type, *description.lptdesc) + "*";
+  if (description.vt == VT_USERDEFINED) return Referred(type, description.hreftype);
+  return NameOf(description.vt, kTypes, "vt");
 }
 
 // `slots` are those of IUnknown before the interface's own.
@@ -128,7 +121,8 @@ std::string FunctionText(ITypeInfo& type, const FUNCDESC& function, FUNCKIND exp
     text += TypeText(type, parameter.tdesc) + " " + (position < count ? Take(names[position]) : "?");
     parameters += (parameters.empty() ? "" : ", ") + text;
   }
-  std::string text = Number(static_cast<unsigned long>(function.memid), "0x%lx") + " " + Kind(function.invkind) + " " +
+  std::string text = Number(static_cast<unsigned long>(function.memid), "0x%lx") + " " +
+                     NameOf(function.invkind, kInvocations, "kind") + " " +
                      TypeText(type, function.elemdescFunc.tdesc) + " " + name + "(" + parameters + ")" +
                      Help(type, function.memid);
   if (function.callconv != CC_STDCALL) text += " call" + Number(static_cast<unsigned long>(function.callconv));
@@ -184,25 +178,8 @@ std::string Implemented(ITypeInfo& type, const TYPEATTR& attributes) {
   return text;
 }
 
-std::string TypeKind(TYPEKIND kind) {
-  switch (kind) {
-    case TKIND_INTERFACE:
-      return "interface";
-    case TKIND_DISPATCH:
-      return "dispinterface";
-    case TKIND_ENUM:
-      return "enum";
-    case TKIND_ALIAS:
-      return "alias";
-    case TKIND_COCLASS:
-      return "coclass";
-    default:
-      return "kind" + Number(kind);
-  }
-}
-
 std::string DumpType(ITypeInfo& type, const TYPEATTR& attributes) {
-  std::string text = TypeKind(attributes.typekind) + " " + Name(type);
+  std::string text = NameOf(attributes.typekind, kTypeKinds, "kind") + " " + Name(type);
   if (attributes.typekind == TKIND_ALIAS) text += " of " + TypeText(type, attributes.tdescAlias);
   if (attributes.typekind == TKIND_INTERFACE) {
     HREFTYPE base = 0;

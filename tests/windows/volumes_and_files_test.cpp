@@ -69,13 +69,12 @@ TEST(Volumes, OfTheSystemDriveAgreeWithEachOther) {
   EXPECT_TRUE(mountPoints.empty());
 }
 
-TEST(Volumes, TellTheirSizesAndSerialNumbers) {
+TEST(Volumes, TellTheirSizesAndFileSystems) {
   WindowsHost host;
   std::array<char16_t, 512> roots{};
   const std::uint32_t written = host.LogicalDriveStrings(512, roots.data());
   ASSERT_GE(written, 4u);
   EXPECT_EQ(host.LogicalDriveStrings(2, roots.data()), written + 1);
-
   std::uint32_t serial = 0;
   std::uint32_t flags = 0;
   Name fileSystem;
@@ -87,47 +86,33 @@ TEST(Volumes, TellTheirSizesAndSerialNumbers) {
 // Every call that fails says why, and a failed one that opens something leaves the invalid handle.
 TEST(Failures, SayWhyAndLeaveNoHandle) {
   WindowsHost host;
-  const auto with = [](auto call) { return std::function<Status(std::intptr_t&, Name&, std::uint32_t&)>(call); };
+  Name name;
+  std::uint32_t number = 0;
   struct Case {
     const char* what;
-    std::function<Status(std::intptr_t&, Name&, std::uint32_t&)> call;
-    bool opens;
+    std::function<Status(std::intptr_t&)> call;
+    bool opens = false;
   };
   const Case cases[] = {
-      {"a controller that is not there", with([&](auto& handle, auto&, auto&) {
-         return host.OpenDevice(u"\\\\.\\HCD9", kGENERIC_WRITE, kFILE_SHARE_WRITE, handle);
-       }),
-       true},
-      {"a file that is not there",
-       with([&](auto& handle, auto&, auto&) { return host.OpenDevice(u"C:\\nothing\\here", 0, 3, handle); }), true},
-      {"the mount points of no volume", with([&](auto& handle, auto& name, auto&) {
-         return host.FirstMountPoint(u"\\\\?\\Volume{0}\\", name.Data(), name.Size(), handle);
-       }),
+      {"a controller that is not there",
+       [&](auto& handle) { return host.OpenDevice(u"\\\\.\\HCD9", kGENERIC_WRITE, kFILE_SHARE_WRITE, handle); }, true},
+      {"the mount points of no volume",
+       [&](auto& handle) { return host.FirstMountPoint(u"\\\\?\\Volume{0}\\", name.Data(), name.Size(), handle); },
        true},
       {"a mount point without its backslash",
-       with([&](auto&, auto& name, auto&) { return host.VolumeNameForMountPoint(u"C:", name.Data(), name.Size()); }),
-       false},
+       [&](auto&) { return host.VolumeNameForMountPoint(u"C:", name.Data(), name.Size()); }},
       {"a buffer that is too small for a volume's name",
-       with([&](auto&, auto& name, auto&) { return host.VolumeNameForMountPoint(kSystemRoot, name.Data(), 10); }),
-       false},
+       [&](auto&) { return host.VolumeNameForMountPoint(kSystemRoot, name.Data(), 10); }},
       {"a DOS name that is not there",
-       with([&](auto&, auto& name, auto&) { return host.DosDeviceTarget(u"NoSuchDevice:", name.Data(), name.Size()); }),
-       false},
-      {"the path names of no volume", with([&](auto&, auto& name, auto& number) {
-         return host.VolumePathNames(u"\\\\?\\Volume{0}\\", name.Data(), name.Size(), number);
-       }),
-       false},
-      {"the information of a drive that is not there", with([&](auto&, auto&, auto& number) {
-         std::uint32_t flags = 0;
-         return host.VolumeInformation(u"Q:\\", nullptr, 0, number, flags, nullptr, 0);
-       }),
-       false},
+       [&](auto&) { return host.DosDeviceTarget(u"NoSuchDevice:", name.Data(), name.Size()); }},
+      {"the path names of no volume",
+       [&](auto&) { return host.VolumePathNames(u"\\\\?\\Volume{0}\\", name.Data(), name.Size(), number); }},
+      {"the information of a drive that is not there",
+       [&](auto&) { return host.VolumeInformation(u"Q:\\", nullptr, 0, number, number, nullptr, 0); }},
   };
   for (const Case& c : cases) {
-    Name name;
     std::intptr_t handle = 77;
-    std::uint32_t number = 0;
-    const Status status = c.call(handle, name, number);
+    const Status status = c.call(handle);
     EXPECT_FALSE(status) << c.what;
     EXPECT_NE(status.error, 0u) << c.what;
     EXPECT_EQ(handle, c.opens ? kInvalidHandle : 77) << c.what;
