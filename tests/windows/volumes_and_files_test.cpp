@@ -128,9 +128,7 @@ TEST(Files, AreOpenedAskedAndClosedOnce) {
   EXPECT_FALSE(host.DeviceControl(file, kIOCTL_USB_GET_ROOT_HUB_NAME, nullptr, 0, out.data(), 64, returned));
   EXPECT_EQ(returned, 0u);
   EXPECT_TRUE(host.CloseDevice(file));
-  const Status again = host.CloseDevice(file);
-  EXPECT_FALSE(again);
-  EXPECT_EQ(again.error, kERROR_INVALID_HANDLE);
+  EXPECT_EQ(host.CloseDevice(file).error, kERROR_INVALID_HANDLE);
 
   FileHandle drive = kInvalidHandle;
   ASSERT_TRUE(host.OpenDevice(u"\\\\.\\C:", 0, kFILE_SHARE_READ | kFILE_SHARE_WRITE, drive));
@@ -142,16 +140,12 @@ TEST(Files, AreOpenedAskedAndClosedOnce) {
   EXPECT_TRUE(host.CloseDevice(drive));
   // Nobody reads it here; it only may not harm.
   host.WriteDebugText(u"a text for a debugger\n");
-}
 
-// Whatever the drives of this PC answer, looking for the letters of a disk ends.
-TEST(Files, LookingForLettersEnds) {
-  WindowsHost host;
-  KelvoUHW::DiskLetterFinder finder(host);
+  // Whatever the drives of this PC answer, looking for the letters of a disk ends.
   KelvoUHW::CZKUMInterfaceDeviceImpl disk;
   disk.m_strDevInstId = u"USBSTOR\\DISK\\NOT_HERE";
   std::vector<std::u16string> roots;
-  finder.FindDriveLettersForDisk(disk, roots);
+  KelvoUHW::DiskLetterFinder(host).FindDriveLettersForDisk(disk, roots);
   EXPECT_TRUE(roots.empty());
 }
 
