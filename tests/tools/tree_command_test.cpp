@@ -150,14 +150,5 @@ TEST(TreeCommand, CopesWithMoreHubsThanFitTheWindow) {
   EXPECT_EQ(refused.err, "zkusb: the topology has more than 400 levels\n");
 }
 
-TEST(TreeCommand, LooksAfterTheWholeScript) {
-  const std::string script = (MachinesFolder() / "scripts" / "stick-comes-and-goes.json").string();
-  Json half = LoadJson(script);
-  half["steps"].erase(half["steps"].size() - 1);
-  const TemporaryFile comes(half.dump());
-  EXPECT_THAT(Output({"tree", "--script", comes.Path()}), HasSubstr("0951:1666"));
-  EXPECT_EQ(Output({"tree", "--script", script}), Output({"tree"}));
-}
-
 }  // namespace
 }  // namespace zkusb
