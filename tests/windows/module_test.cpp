@@ -213,10 +213,6 @@ HWND FindReceiver() {
   }
   return window;
 }
-HWND Receiver() {
-  for (int i = 0; i < 1500 && FindReceiver() == nullptr; ++i) std::this_thread::sleep_for(20ms);
-  return FindReceiver();
-}
 
 // Of a list, which may be missing; `visit` is called with each node.
 std::size_t CountNodes(

@@ -1,0 +1,188 @@
+// The road of one event, from registration to the last sink, over COM alone: this program knows the component as any
+// client does, and loads it from where it was registered.
+#include <gtest/gtest.h>
+
+#include <optional>
+
+#include "com/com_ptr.h"
+#include "com/zkusb_monitor.h"
+#include "module/type_library.h"
+#include "platform/server_module.h"
+#include "platform/simulated/module_environment.h"
+#include "platform/simulated/play_step.h"
+#include "platform/simulated/registry.h"
+#include "platform/simulated/simulated_desktop.h"
+#include "platform/simulated/simulated_pc.h"
+#include "platform/simulated/type_libraries.h"
+#include "platform/system.h"
+#include "tests/support/plugs.h"
+#include "tests/support/test_sink.h"
+
+namespace KelvoUHW {
+namespace {
+
+using platform::simulated::BroadcastTime;
+
+// The class of the interface that every USB device has.
+constexpr platform::Guid kUsbDeviceInterface{
+    0xA5DCBF10, 0x6530, 0x11D2, {0x90, 0x1F, 0x00, 0xC0, 0x4F, 0xB9, 0x51, 0xED}};
+
+// A device of the three whose interfaces are watched: no volume, one interface.
+Plug Phone(const Text& serial, std::uint32_t port, const Text& product = u"1291") {
+  const Text id = u"USB\\VID_05AC&PID_" + product + u"\\" + serial;
+  Plug plug;
+  AddNode(plug, id, kRootHubId, u"WPD", u"WUDFRd");
+  AddPort(plug, id, kRootHubId, port);
+  plug.fragment.interfaces.push_back(
+      {kUsbDeviceInterface, u"\\\\?\\" + platform::Replaced(id, u'\\', u'#') + u"#" + GuidText(kUsbDeviceInterface),
+       id});
+  return plug;
+}
+
+// A client's process with a PC of its own, on which the component is registered.
+class Client {
+ public:
+  Client() {
+    for (const Change& change : {Change(Stick(u"S1", 1, u'E')), Change(CardReader(u"CR", 2))}) {
+      EXPECT_EQ(m_pc.Apply({0, u"", change}), u"");
+    }
+    m_typeLibraries.Add(m_path, ModuleTypeLibrary());
+    platform::SetCurrentSystem({&m_pc, &desktop, &desktop, &m_registry, &m_typeLibraries, &m_environment});
+    EXPECT_EQ(CoInitializeEx(nullptr, COINIT_MULTITHREADED), S_OK);
+  }
+  ~Client() {
+    tree.Reset();
+    notifier.Reset();
+    point.Reset();
+    CoUninitialize();
+    desktop.EndProcess();
+    EXPECT_TRUE(desktop.Misuses().empty());
+    EXPECT_TRUE(m_pc.Misuses().empty());
+    platform::SetCurrentSystem({});
+  }
+
+  HRESULT Register() { return platform::RegisterServerModule(m_path); }
+  template <class Interface>
+  HRESULT Create(const CLSID& clsid, ComPtr<Interface>& out) {
+    return CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, platform::IidOf<Interface>(), out.PutVoid());
+  }
+  HRESULT RootNode() const {
+    ComPtr<IZKUMUsbTreeNode> root;
+    return tree->get_RootNode(root.Put());
+  }
+  DWORD Advise(IUnknown& sink) {
+    DWORD cookie = 0;
+    EXPECT_EQ(point->Advise(&sink, &cookie), S_OK);
+    return cookie;
+  }
+  // The change, what the system tells of it, and what follows as far as it takes no time.
+  void Play(const Change& change, BroadcastTime told = BroadcastTime::After) {
+    EXPECT_EQ(platform::simulated::PlayStep(m_pc, desktop, {0, u"", change, told}), u"");
+    desktop.RunFor(0);
+  }
+
+ private:
+  const std::u16string m_path = platform::ServerModulePath();
+  platform::simulated::SimulatedPc m_pc{BarePc()};
+  platform::simulated::SimulatedRegistry m_registry;
+  platform::simulated::SimulatedTypeLibraries m_typeLibraries{m_registry};
+  platform::simulated::SimulatedModuleEnvironment m_environment{m_path};
+
+ public:
+  platform::simulated::SimulatedDesktop desktop;
+  ComPtr<IZKUMUsbTree> tree;
+  ComPtr<IZKUMEventNotifier> notifier;
+  ComPtr<IConnectionPoint> point;
+};
+
+// One process, and so one test: the component stays in this one.
+TEST(EventRoad, FromRegistrationToUnadvise) {
+  TestSink::Log log;
+  TestSink a(log, "A");
+  TestSink b(log, "B");
+  Client client;
+  platform::simulated::SimulatedDesktop& desktop = client.desktop;
+
+  // Registered, created: there is a window, and no tree yet.
+  EXPECT_EQ(client.Create(CLSID_ZKUMEventNotifier, client.notifier), REGDB_E_CLASSNOTREG);
+  ASSERT_EQ(client.Register(), S_OK);
+  ASSERT_EQ(client.Create(CLSID_ZKUMUsbTree, client.tree), S_OK);
+  EXPECT_EQ(desktop.Counts().threads, 0u);
+  ASSERT_EQ(client.Create(CLSID_ZKUMEventNotifier, client.notifier), S_OK);
+  EXPECT_EQ(desktop.Counts(), (platform::simulated::DesktopCounts{1, 1, 1, 1, 0}));
+  EXPECT_EQ(client.RootNode(), E_POINTER);
+
+  // Advised: the tree is there, and what is connected is told inside the call, to that sink only.
+  const auto container = client.notifier.As<IConnectionPointContainer>();
+  ASSERT_EQ(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, client.point.Put()), S_OK);
+  std::uint32_t caller = 0;
+  a.onEvent = [&] {
+    caller = desktop.CurrentThreadId();
+    return S_OK;
+  };
+  const DWORD cookieA = client.Advise(a);
+  EXPECT_EQ(Taken(log), "A 0 S1, A 0 CR");
+  EXPECT_EQ(caller, desktop.CurrentThreadId());
+  EXPECT_EQ(client.RootNode(), S_OK);
+  const DWORD cookieB = client.Advise(b);
+  EXPECT_EQ(Taken(log), "B 0 S1, B 0 CR");
+
+  // S1 goes and S2 comes, of which the system tells at once: 1, 0, 2, 3, each device to both sinks in turn.
+  client.Play(Unplug{UsbId(u"S1")}, BroadcastTime::None);
+  EXPECT_EQ(Taken(log), "");
+  std::vector<ComPtr<IUnknown>> kept;
+  a.keeps = &kept;
+  const std::uint64_t plugged = desktop.Now();
+  client.Play(Stick(u"S2", 3, u'F'));
+  EXPECT_EQ(desktop.Now(), plugged);
+  EXPECT_EQ(Taken(log),
+            "A 1 S2, B 1 S2, A 0 CR, B 0 CR, A 0 S2, B 0 S2, A 2 S1, B 2 S1, A 3 CR, B 3 CR, A 3 CR, B 3 CR");
+  EXPECT_NE(caller, desktop.CurrentThreadId()) << "an event thread";
+  a.keeps = nullptr;
+
+  // A watched device: told at once when it comes, and three seconds late when it goes.
+  client.Play(Phone(u"P1", 4));
+  EXPECT_EQ(Taken(log),
+            "A 1 P1, B 1 P1, A 0 CR, B 0 CR, A 0 S2, B 0 S2, A 0 P1, B 0 P1, A 3 S2, B 3 S2, "
+            "A 3 CR, B 3 CR, A 3 CR, B 3 CR");
+  client.Play(Unplug{u"USB\\VID_05AC&PID_1291\\P1"});
+  desktop.RunFor(2999);
+  EXPECT_EQ(Taken(log), "");
+  desktop.RunFor(1);
+  EXPECT_EQ(Taken(log),
+            "A 0 CR, B 0 CR, A 0 S2, B 0 S2, A 2 P1, B 2 P1, A 3 S2, B 3 S2, A 3 CR, B 3 CR, "
+            "A 3 CR, B 3 CR");
+
+  // A volume at once. B is gone by then and hears nothing.
+  EXPECT_EQ(client.point->Unadvise(cookieB), S_OK);
+  EXPECT_EQ(client.point->Unadvise(cookieB), CONNECT_E_NOCONNECTION);
+  client.Play(Unplug{UsbId(u"S2")});
+  EXPECT_EQ(Taken(log), "A 0 CR, A 2 S2, A 3 CR, A 3 CR");
+
+  // Any other device without a volume is told of by the next volume that comes or goes.
+  client.Play(Phone(u"P2", 5, u"1293"));
+  desktop.Settle();
+  EXPECT_EQ(Taken(log), "");
+  client.Play(Stick(u"S3", 1, u'G'));
+  EXPECT_EQ(Taken(log), "A 1 P2, A 1 S3, A 0 CR, A 0 P2, A 0 S3, A 3 CR, A 3 CR");
+
+  // After the last sink went nobody is called; the next one is told what came meanwhile.
+  EXPECT_EQ(client.point->Unadvise(cookieA), S_OK);
+  client.Play(Unplug{UsbId(u"S3")});
+  desktop.Settle();
+  EXPECT_EQ(Taken(log), "");
+  EXPECT_EQ(client.Advise(b), 1u);
+  EXPECT_EQ(Taken(log), "B 0 CR, B 0 P2");
+  EXPECT_EQ(client.point->Unadvise(1), S_OK);
+  // What was kept answers still.
+  ASSERT_EQ(kept.size(), 6u);
+  const auto removed = kept[3].As<IZKUMUsbDevice>();
+  BSTR text = nullptr;
+  EXPECT_EQ(removed->get_ToString(&text), S_OK);
+  EXPECT_NE(platform::ToUtf8(std::u16string(text, SysStringLen(text))).find("S1"), std::string::npos);
+  SysFreeString(text);
+  EXPECT_EQ(desktop.Counts(), (platform::simulated::DesktopCounts{1, 1, 1, 1, 0}));
+}
+
+}  // namespace
+}  // namespace KelvoUHW
