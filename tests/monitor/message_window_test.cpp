@@ -124,7 +124,6 @@ TEST(MessageWindow, EndsTheProcessWithoutAWindow) {
     std::optional<std::u16string> text;
   } kCases[] = {
       {"window", {{DesktopCall::CreateWindowExW, 1, 1400}}, u"Invalid window handle.\r\n"},
-      {"unknown code", {{DesktopCall::CreateWindowExW, 1, 0xDEAD}}, std::nullopt},
       {"no text", {{DesktopCall::RegisterClassW, 1, 5}, {DesktopCall::FormatMessageW, 1, 8}}, std::nullopt},
   };
   for (const auto& test : kCases) {

@@ -23,7 +23,6 @@ constexpr std::uint32_t kEventThreadsAtOnce = 24;
 
 struct Seen {
   std::array<std::atomic<int>, 4> events{};  // by kind
-  std::atomic<int> named = 0;                // events whose device has an id
   std::atomic<int> fromInside = 0;           // advises by sinks
   std::atomic<int> left = 0;                 // sinks that unadvised themselves
   std::atomic<int> alive = 0;
@@ -75,7 +74,6 @@ class BusySink final : public testing_support::Callable {
     BSTR id = nullptr;
     // Empty for a device that went while the build looked at it.
     EXPECT_TRUE(node && node->get_InstanceId(&id) == S_OK && id != nullptr);
-    m_seen.named += SysStringLen(id) != 0;
     SysFreeString(id);
     if (t_depth == 1 && number % 16 == 0) {
       ++m_seen.fromInside;
@@ -138,7 +136,6 @@ TEST_F(NotifierStress, ClientsComeAndGoWhileBroadcastsArrive) {
   for (const std::atomic<int>& count : seen.events) EXPECT_GE(count, 50);
   EXPECT_GE(seen.fromInside, 20);
   EXPECT_GE(seen.left, 5);
-  EXPECT_GE(seen.named, 1000);
 }
 
 }  // namespace
