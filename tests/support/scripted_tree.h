@@ -18,8 +18,6 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
  public:
   ~ScriptedTree() { EXPECT_EQ(m_references, 1) << "references of others"; }
 
-  HRESULT created = S_OK;
-  HRESULT offers = S_OK;  // what a question for IBuildUsbTree is answered with
   HRESULT built = S_OK;
   HRESULT listed = S_OK;
   HRESULT reset = S_OK;
@@ -42,7 +40,6 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
     *out = nullptr;
     if (iid == platform::IidOf<IBuildUsbTree>()) {
-      if (FAILED(offers)) return offers;
       *out = static_cast<IBuildUsbTree*>(this);
     } else if (iid == platform::IidOf<IClassFactory>()) {
       *out = static_cast<IClassFactory*>(this);
@@ -59,9 +56,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
 
   HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown* outer, REFIID iid, void** out) override {
     EXPECT_EQ(outer, nullptr);
-    EXPECT_TRUE(iid == platform::IidOf<IZKUMUsbTree>());
-    *out = nullptr;
-    return FAILED(created) ? created : QueryInterface(iid, out);
+    return QueryInterface(iid, out);
   }
   HRESULT STDMETHODCALLTYPE LockServer(BOOL) override { return S_OK; }
 

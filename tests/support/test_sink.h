@@ -95,7 +95,6 @@ class TestSink final : public IUnknown {
     result->bstrVal = SysAllocString(u"result");
     return onEvent ? onEvent() : S_OK;
   }
-  // The last component of the id.
   static std::string NameOf(const ComPtr<IZKUMUsbTreeNode>& node) {
     BSTR id = nullptr;
     if (!node || FAILED(node->get_InstanceId(&id))) return "?";
