@@ -1,9 +1,6 @@
 // Runs of the notifier over whole PCs: what sinks hear of what happened.
 #include <gtest/gtest.h>
 
-#include <optional>
-
-#include "platform/simulated/play_step.h"
 #include "tests/support/notifier_process.h"
 #include "tests/support/plugs.h"
 #include "tests/support/test_sink.h"
@@ -124,53 +121,6 @@ TEST_F(EventRuns, TellEachSinkWhatItIsMeantToHear) {
       EXPECT_EQ(Taken(pc.log), step.log) << test.what;
     }
   }
-}
-
-// A device of the three whose interfaces are watched, or one beside them: no volume, one interface.
-Plug Phone(const Text& serial, std::uint32_t port, const Text& product = u"1291") {
-  constexpr platform::Guid kUsbDevice{0xA5DCBF10, 0x6530, 0x11D2, {0x90, 0x1F, 0x00, 0xC0, 0x4F, 0xB9, 0x51, 0xED}};
-  const Text id = u"USB\\VID_05AC&PID_" + product + u"\\" + serial;
-  const Text path = u"\\\\?\\" + platform::Replaced(id, u'\\', u'#') + u"#" + GuidText(kUsbDevice);
-  Plug plug;
-  AddNode(plug, id, kRootHubId, u"WPD", u"WUDFRd");
-  AddPort(plug, id, kRootHubId, port);
-  plug.fragment.interfaces.push_back({kUsbDevice, path, id});
-  return plug;
-}
-
-// From what the system broadcasts of a change to the sink. A watched device is told of at once when it comes and three
-// seconds late when it goes, a volume at once, any other device by the next volume that comes or goes.
-TEST_F(EventRuns, FollowWhatTheSystemTells) {
-  const struct {
-    std::optional<Change> change;
-    std::uint32_t milliseconds;
-    const char* log;
-  } kSteps[] = {
-      {Stick(u"S2", 3, u'F'), 0, "A 1 S2, A 0 CR, A 0 S2, A 2 S1, A 3 CR, A 3 CR"},
-      {Phone(u"P1", 4), 0, "A 1 P1, A 0 CR, A 0 S2, A 0 P1, A 3 S2, A 3 CR, A 3 CR"},
-      {Unplug{u"USB\\VID_05AC&PID_1291\\P1"}, 2999, ""},
-      {{}, 1, "A 0 CR, A 0 S2, A 2 P1, A 3 S2, A 3 CR, A 3 CR"},
-      {Unplug{UsbId(u"S2")}, 0, "A 0 CR, A 2 S2, A 3 CR, A 3 CR"},
-      {Phone(u"P2", 5, u"1293"), 5000, ""},
-      {Stick(u"S3", 1, u'G'), 0, "A 1 P2, A 1 S3, A 0 CR, A 0 P2, A 0 S3, A 3 CR, A 3 CR"},
-  };
-  Pc pc;
-  pc.Do({Unplug{UsbId(u"S1")}});
-  const auto play = [&](const Change& change) {
-    const platform::simulated::Step step{0, u"", change, platform::simulated::BroadcastTime::After};
-    EXPECT_EQ(platform::simulated::PlayStep(pc.process.pc, pc.process.desktop, step), u"");
-  };
-  for (const auto& step : kSteps) {
-    if (step.change) play(*step.change);
-    pc.process.desktop.RunFor(step.milliseconds);
-    EXPECT_EQ(Taken(pc.log), step.log);
-  }
-  // After the last sink went nobody is called; the next one is told what came meanwhile.
-  EXPECT_EQ(pc.process.point->Unadvise(1), S_OK);
-  play(Unplug{UsbId(u"S3")});
-  pc.process.desktop.Settle();
-  EXPECT_EQ(pc.process.Advise(pc.b), 1u);
-  EXPECT_EQ(Taken(pc.log), "B 0 CR, B 0 P2");
 }
 
 }  // namespace
