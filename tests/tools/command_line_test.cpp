@@ -56,7 +56,8 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
 TEST(CommandLine, SaysWhatWasNotFound) {
   const TemporaryFile storageOnly(ChangedMachine([](Json& machine) { machine.erase("hostControllers"); }));
   const TemporaryFile controllersOnly(ChangedMachine([](Json& machine) { machine.erase("hubs"); }));
-  const TemporaryFile noStick(R"({"steps": [{"wait": true}, {"unplug": "USB\\VID_0781&PID_5580\\AA010603160707470215"}]})");
+  const TemporaryFile noStick(
+      R"({"steps": [{"wait": true}, {"unplug": "USB\\VID_0781&PID_5580\\AA010603160707470215"}]})");
   const std::string noController = "zkusb: no USB host controller found\n";
   const struct {
     Args args;
