@@ -64,7 +64,12 @@ make_wine_prefix() {
   timeout 30 wineserver -p || return 1
   timeout 180 wineboot -i || return 1
   # Windows that no display has to show.
-  timeout 60 wine reg add 'HKCU\Software\Wine\Drivers' /v Graphics /d null /f
+  timeout 60 wine reg add 'HKCU\Software\Wine\Drivers' /v Graphics /d null /f || return 1
+  # The desktop that is there already has looked for a display, and would refuse every window.
+  stop_wine
+  timeout 30 wineserver -p || return 1
+  # Wine's services keep the output of the program that started them open: not one that is read.
+  timeout 60 wine cmd /c exit >/dev/null 2>&1
 }
 
 # Ends the programs of this prefix and its server.
