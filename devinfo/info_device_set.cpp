@@ -57,8 +57,7 @@ InfoDeviceSet::Entry InfoDeviceSet::First(const Value& value) const {
 }
 
 const InfoDevicePtr& InfoDeviceSet::Found(Entry entry) const noexcept {
-  static const InfoDevicePtr none;
-  return entry == FlatIndex::kNone ? none : *m_places[entry].record;
+  return entry == FlatIndex::kNone ? m_none : *m_places[entry].record;
 }
 
 bool InfoDeviceSet::Insert(const InfoDevicePtr& record) {
