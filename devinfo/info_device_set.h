@@ -86,7 +86,7 @@ class InfoDeviceSet {
 
   Records m_records;
   std::vector<Place> m_places;  // by entry, in the order of the records, erased ones between them
-  InfoDevicePtr m_none;  // always empty: what a search that finds nothing refers to
+  InfoDevicePtr m_none;         // always empty: what a search that finds nothing refers to
   mutable Indexes m_indexes;
 };
 
