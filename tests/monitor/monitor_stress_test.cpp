@@ -37,7 +37,8 @@ TEST(MonitorStress, FourThreadsShareTheLock) {
     });
   }
   for (std::thread& thread : threads) thread.join();
-  EXPECT_GE(process.desktop.Calls(DesktopCall::Sleep), kThreads - 1) << "nobody had to wait";
+  // How many had to is up to the scheduler.
+  EXPECT_GE(process.desktop.Calls(DesktopCall::Sleep), 1u) << "nobody had to wait";
 }
 
 TEST(MonitorStress, StartsAndTearsDownInFreshProcesses) {
