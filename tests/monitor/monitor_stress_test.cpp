@@ -29,7 +29,8 @@ TEST(MonitorStress, FourThreadsShareTheLock) {
         EXPECT_EQ(++inside, 1) << "two threads inside";
         lock.Lock();
         lock.Unlock();
-        std::this_thread::sleep_for(std::chrono::microseconds(100));
+        // The first owner keeps the others waiting, however coarse the system's sleeps are.
+        std::this_thread::sleep_for(round == 0 ? std::chrono::milliseconds(20) : std::chrono::milliseconds(0));
         --inside;
         lock.Unlock();  // and once more by the guard, which is nothing to the next owner
         std::this_thread::yield();
