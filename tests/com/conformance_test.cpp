@@ -2,6 +2,7 @@
 // methods in their published slots.
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <string>
 
 #include "tests/support/com_objects.h"
@@ -66,6 +67,8 @@ std::string Answers(IUnknown* pointer, IUnknown* identity, std::vector<ComPtr<IU
 class Conformance : public ComObjects {
  protected:
   Conformance() {
+    desk.Do(Stick(u"S1", 1, u'E'));
+    EXPECT_EQ(desk.Rebuild(), S_OK);
     sample.device->m_interfaceDescrs.push_back(MakeRecord<InterfaceEntry>());
     device = Wrap(sample.device);
     disk = Wrap(sample.disk);
@@ -112,6 +115,58 @@ TEST_F(Conformance, EveryObjectAnswersForItsInterfacesFromEachOfThem) {
     std::vector<ComPtr<IUnknown>> found;
     EXPECT_EQ(Answers(object.Get(), identity.Get(), &found), expected);
     for (const auto& pointer : found) EXPECT_EQ(Answers(pointer.Get(), identity.Get(), nullptr), expected);
+  }
+}
+
+// The out pointer of any interface.
+struct AnyOut {
+  IUnknown** out;
+  template <class Interface>
+  operator Interface**() const {
+    return reinterpret_cast<Interface**>(out);
+  }
+};
+
+TEST_F(Conformance, WhatIsHandedOutCarriesOneReferenceOfTheCallers) {
+  IZKUMUsbTree* const query = desk.tree.Get();
+  VARIANT_BOOL more = VARIANT_FALSE;
+  ASSERT_EQ(nodes->MoveNext(&more), S_OK);
+  const struct {
+    const char* what;
+    IUnknown* callee;
+    std::function<HRESULT(AnyOut)> call;
+    ULONG references;  // 2: the list has one of its own
+  } rows[] = {
+      {"Childs", device.Get(), [&](AnyOut out) { return device->get_Childs(out); }, 1},
+      {"InSubtreeDevicesOfType", device.Get(),
+       [&](AnyOut out) { return device->get_InSubtreeDevicesOfType(KUDTPortDevice, out); }, 1},
+      {"FirstChildOfType", device.Get(),
+       [&](AnyOut out) {
+         return device.As<IZKUMPortDevice>()->get_FirstChildOfType(device.Get(), KUDTInterfaceDevice, out);
+       },
+       1},
+      {"InterfaceDescriptors", device.Get(),
+       [&](AnyOut out) { return device.As<IZKUMPortDevice>()->get_InterfaceDescriptors(out); }, 1},
+      {"MountPoints", disk.Get(), [&](AnyOut out) { return disk.As<IZKUMInterfaceDevice>()->get_MountPoints(out); }, 1},
+      {"GetCurrent", nodes.Get(), [&](AnyOut out) { return nodes->GetCurrent(out); }, 2},
+      {"Clone", descriptors.Get(), [&](AnyOut out) { return descriptors->Clone(out); }, 1},
+      {"RootNode", query, [&](AnyOut out) { return query->get_RootNode(out); }, 1},
+      {"PortDevicesWithVendorId", query, [&](AnyOut out) { return query->get_PortDevicesWithVendorId(0x0781, out); },
+       1},
+      {"VendorProductDevices", query, [&](AnyOut out) { return query->get_VendorProductDevices(0x0781, 0x5567, out); },
+       1},
+      {"PortDevicesWithVolume", query, [&](AnyOut out) { return query->get_PortDevicesWithVolume(out); }, 1},
+  };
+  for (const auto& row : rows) {
+    const ULONG before = References(row.callee);
+    IUnknown* out = Mark<IUnknown>();
+    EXPECT_EQ(row.call({&out}), S_OK) << row.what;
+    ASSERT_NE(out, Mark<IUnknown>()) << row.what;
+    EXPECT_EQ(References(out), row.references) << row.what;
+    EXPECT_EQ(References(row.callee), before) << row.what;
+    out->Release();
+    EXPECT_EQ(row.call({nullptr}), E_POINTER) << row.what;
+    EXPECT_EQ(References(row.callee), before) << row.what;
   }
 }
 

@@ -1,18 +1,23 @@
-// What clients see of whole PCs: the dump, the children and the subtrees of every node, trees that were replaced.
+// What clients see of whole PCs: every property of every node, the queries, trees that were replaced.
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "devinfo/info_device.h"
+#include "devinfo/interface_device.h"
 #include "platform/simulated/machine_file.h"
 #include "platform/text.h"
+#include "platform/usb_ioctl.h"
 #include "tests/support/object_reader.h"
 #include "tests/support/tree_desk.h"
+#include "tree/port_device.h"
 #include "tree/records.h"
 #include "tree/tree_builder.h"
 
@@ -34,18 +39,102 @@ platform::simulated::Machine Load(const std::string& name) {
   return platform::simulated::LoadMachine(kFolder + name + ".json");
 }
 
-// Every property but ToString, a line each.
+// Properties as lines of text, whoever tells them.
+class Facts {
+ public:
+  void operator()(const char* name, HRESULT result, std::u16string_view value) { Add(name, result, ToUtf8(value)); }
+  void operator()(const char* name, HRESULT result, std::int64_t value) { Add(name, result, std::to_string(value)); }
+  const std::string& Text() const { return m_text; }
+
+ private:
+  void Add(const char* name, HRESULT result, const std::string& value) {
+    m_text.append(name).append(result == S_OK ? "=" : " fails=").append(value).append("\n");
+  }
+  std::string m_text;
+};
+
+void DescribeInfo(const CZKUMInfoDeviceImpl* info, Facts& facts) {
+  static const CZKUMInfoDeviceImpl kNone;
+  const HRESULT result = info ? S_OK : E_FAIL;
+  const CZKUMInfoDeviceImpl& record = info ? *info : kNone;
+  facts("Service", result, record.Service);
+  facts("FriendlyName", result, record.FriendlyName);
+  facts("Location", result, record.Location);
+  facts("Manufacturer", result, record.Manufacturer);
+  facts("HardwareId", result, record.HardwareId);
+  facts("PhysicalName", result, record.PhysicalName);
+  facts("DevClass", result, record.DevClass);
+  facts("EnumName", result, record.EnumName);
+  facts("ClassGuid", result, platform::GuidText(record.ClassGuid));
+}
+
+void DescribePortDevice(const CZKUMPortDeviceImpl& record, Facts& facts) {
+  facts("Product", S_OK, record.m_strUsbProduct);
+  facts("Manufacturer1", S_OK, record.m_strUsbManufacturer);
+  facts("Speed", S_OK, record.Speed());
+  facts("NumberInterfaces", S_OK, record.NumberInterfaces());
+  for (const InterfaceEntryPtr& entry : record.m_interfaceDescrs) {
+    facts("InterfaceClass", S_OK, entry->Descriptor.at(5));
+    facts("InterfaceSubClass", S_OK, entry->Descriptor.at(6));
+    facts("InterfaceProtocol", S_OK, entry->Descriptor.at(7));
+  }
+  facts("InterfaceDescriptors", S_OK, u"");
+  DescribeInfo(static_cast<const CZKUMInfoDeviceImpl*>(record.m_infoDevice.Get()), facts);
+}
+
+void DescribeInterfaceDevice(const CZKUMInterfaceDeviceImpl& record, Facts& facts) {
+  facts("VolumeName", S_OK, record.VolumeName);
+  facts("VendorId", S_OK, record.StorageVendorId);
+  facts("ProductId", S_OK, record.StorageProductId);
+  facts("ProductRev", S_OK, record.ProductRev);
+  facts("DevicePath", S_OK, record.DevicePath());
+  facts("MountPoint", S_OK, record.MountPoint());
+  for (const std::u16string& mountPoint : record.MountPoints) facts("one of MountPoints", S_OK, mountPoint);
+  facts("MountPoints", S_OK, u"");
+}
+
+std::string Describe(const NodePtr& node) {
+  Facts facts;
+  const TUsbDeviceType kind = node->m_nType;
+  facts("InstanceId", S_OK, node->m_strDevInstId);
+  facts("Type", S_OK, kind);
+  facts("Description", S_OK, node->m_strDeviceDescr);
+  facts("SerialNumber", S_OK, node->m_strSerialNumber);
+  facts("VendorId", S_OK, static_cast<std::int32_t>(node->m_nVendorId));
+  facts("ProductId", S_OK, static_cast<std::int32_t>(node->m_nProductId));
+  facts("DriverKeyName", S_OK, node->m_strDriverKeyName);
+  facts("Vendor", S_OK, node->m_strVendor);
+  facts("Product", S_OK,
+        kind == KUDTPortDevice ? node.StaticCast<CZKUMPortDeviceImpl>()->m_strUsbProduct : node->m_strProduct);
+  if (kind == KUDTHostController) {
+    facts("LeafName", S_OK, node.StaticCast<CZKUMHostControllerImpl>()->m_strLeafName);
+  } else if (kind == KUDTHub) {
+    facts("PathName", S_OK, node.StaticCast<CZKUMHubDeviceImpl>()->m_strPathName);
+    facts("ConnectionName", S_OK, node.StaticCast<CZKUMHubDeviceImpl>()->m_strConnectionName);
+  } else if (kind == KUDTHubPort) {
+    facts("PortIndex", S_OK, node.StaticCast<CZKUMHubPortImpl>()->m_nPortIndex);
+  } else if (kind == KUDTPortDevice) {
+    DescribePortDevice(*node.StaticCast<CZKUMPortDeviceImpl>(), facts);
+  } else if (kind == KUDTInfoDevice) {
+    DescribeInfo(node.StaticCast<CZKUMInfoDeviceImpl>().Get(), facts);
+  } else if (kind == KUDTInterfaceDevice) {
+    DescribeInterfaceDevice(*node.StaticCast<CZKUMInterfaceDeviceImpl>(), facts);
+  }
+  std::u16string dump;
+  node->ToString(dump, u"");
+  facts("ToString", S_OK, dump);
+  return facts.Text();
+}
+
+// All but ToString.
 std::string Properties(const Node& node) {
-  std::string text;
-  testing_support::ReadProperties(node, [&](const char* name, HRESULT result, auto value) {
-    text.append(name).append(result == S_OK ? "=" : " fails=");
-    if constexpr (std::is_same_v<decltype(value), std::u16string_view>) {
-      text += ToUtf8(value) + "\n";
-    } else {
-      text += std::to_string(value) + "\n";
-    }
-  });
-  return text;
+  Facts facts;
+  testing_support::ReadProperties(node, [&](auto... property) { facts(property...); });
+  return facts.Text();
+}
+
+std::string Describe(const Node& node) {
+  return Properties(node) + "ToString=" + ToUtf8(testing_support::DumpOf(node)) + "\n";
 }
 
 std::string IdText(std::int64_t kind, const std::u16string& id) { return std::to_string(kind) + ": " + ToUtf8(id); }
@@ -61,6 +150,17 @@ Ids IdsOf(const Nodes& nodes) {
   return ids;
 }
 
+// A plain filter over a plain walk.
+template <class Passes>
+Ids Filtered(const NodePtr& root, Passes passes) {
+  Ids ids;
+  VisitPreOrder(root, [&](const NodePtr& node) {
+    if (passes(node)) ids.push_back(IdText(node->m_nType, node->m_strDevInstId));
+    return true;
+  });
+  return ids;
+}
+
 // Compares a subtree seen through the interfaces with its records; returns how many nodes it has.
 std::size_t CompareNodes(const Node& root, const NodePtr& model) {
   std::vector<NodePtr> records;
@@ -72,9 +172,7 @@ std::size_t CompareNodes(const Node& root, const NodePtr& model) {
   WalkChilds(root, [&](const Node& node) {
     if (next >= records.size()) return;
     const NodePtr& record = records[next++];
-    std::u16string dump;
-    record->ToString(dump, u"");
-    EXPECT_TRUE(testing_support::DumpOf(node) == dump) << ToUtf8(record->m_strDevInstId);
+    EXPECT_EQ(Describe(node), Describe(record));
     Ids childs;
     for (const NodePtr& child : record->m_childs) childs.push_back(IdText(child->m_nType, child->m_strDevInstId));
     Nodes list;
@@ -82,16 +180,39 @@ std::size_t CompareNodes(const Node& root, const NodePtr& model) {
     EXPECT_EQ(IdsOf(list), childs);
     for (int kind = KUDTUnknown; kind <= KUDTInterfaceDevice; ++kind) {
       EXPECT_EQ(node->get_InSubtreeDevicesOfType(static_cast<TUsbDeviceType>(kind), list.Put()), S_OK);
-      Ids ofKind;
-      VisitPreOrder(record, [&](const NodePtr& below) {
-        if (below->m_nType == kind) ofKind.push_back(IdText(kind, below->m_strDevInstId));
-        return true;
-      });
-      EXPECT_EQ(IdsOf(list), ofKind) << kind;
+      EXPECT_EQ(IdsOf(list), Filtered(record, [&](const NodePtr& below) { return below->m_nType == kind; })) << kind;
     }
   });
   EXPECT_EQ(next, records.size());
   return next;
+}
+
+void CompareQueries(IZKUMUsbTree& tree, const NodePtr& model) {
+  std::set<std::uint32_t> vendors{0x1234};  // of all nodes, hubs included, and one nobody has
+  std::set<std::uint32_t> products{0x1234};
+  VisitPreOrder(model, [&](const NodePtr& node) {
+    vendors.insert(node->m_nVendorId);
+    products.insert(node->m_nProductId);
+    return true;
+  });
+  Nodes list;
+  for (const std::uint32_t vendor : vendors) {
+    const auto ofVendor = [&](const NodePtr& node) {
+      return node->m_nType == KUDTPortDevice && node->m_nVendorId == vendor;
+    };
+    EXPECT_EQ(tree.get_PortDevicesWithVendorId(vendor, list.Put()), S_OK);
+    EXPECT_EQ(IdsOf(list), Filtered(model, ofVendor)) << vendor;
+    for (const std::uint32_t product : products) {
+      EXPECT_EQ(tree.get_VendorProductDevices(vendor, product, list.Put()), S_OK);
+      EXPECT_EQ(IdsOf(list),
+                Filtered(model, [&](const NodePtr& node) { return ofVendor(node) && node->m_nProductId == product; }));
+    }
+  }
+  EXPECT_EQ(tree.get_PortDevicesWithVolume(list.Put()), S_OK);
+  EXPECT_EQ(IdsOf(list), Filtered(model, [](const NodePtr& node) {
+              const auto isVolume = [](const NodePtr& below) { return below->m_nType == KUDTInterfaceDevice; };
+              return node->m_nType == KUDTPortDevice && !Filtered(node, isVolume).empty();
+            }));
 }
 
 TEST(Machines, ClientsSeeWhatTheRecordsHold) {
@@ -104,6 +225,7 @@ TEST(Machines, ClientsSeeWhatTheRecordsHold) {
     ASSERT_TRUE(model.Build());
     const Node root = desk.Root();
     nodes += CompareNodes(root, model.Root());
+    CompareQueries(*desk.tree.Get(), model.Root());
 
     std::ifstream stream(ZKUSB_SOURCE_DIR "/tests/golden/" + std::string(name) + ".txt", std::ios::binary);
     const std::string golden{std::istreambuf_iterator<char>(stream), {}};
@@ -119,10 +241,27 @@ TEST(Machines, ClientsSeeWhatTheRecordsHold) {
   EXPECT_EQ(files, std::size(kMachines));
 }
 
-// A tree that a client holds when it is replaced: its nodes, and what they said.
+// A tree that a client holds when it is replaced: its nodes, what they said, and a list of which the first was taken.
 struct HeldTree {
+  explicit HeldTree(const Node& root) {
+    WalkChilds(root, [&](const Node& node) {
+      nodes.push_back(node);
+      properties.push_back(Properties(node));
+    });
+    Nodes whole;
+    EXPECT_EQ(root->get_InSubtreeDevicesOfType(KUDTPortDevice, whole.Put()), S_OK);
+    rest = IdsOf(whole);
+    rest.erase(rest.begin());
+    EXPECT_EQ(root->get_InSubtreeDevicesOfType(KUDTPortDevice, list.Put()), S_OK);
+    VARIANT_BOOL more = VARIANT_FALSE;
+    list->MoveNext(&more);
+    EXPECT_EQ(more, VARIANT_TRUE);
+  }
+
   std::vector<Node> nodes;
   std::vector<std::string> properties;
+  Nodes list;
+  Ids rest;
   int replaced = 0;
 };
 
@@ -146,11 +285,7 @@ TEST(Machines, ReplacedTreesGoOnAnswering) {
       }
       if (desk.Rebuild() != S_OK) continue;
       for (HeldTree& tree : held) ++tree.replaced;
-      held.emplace_back();
-      WalkChilds(desk.Root(), [&](const Node& node) {
-        held.back().nodes.push_back(node);
-        held.back().properties.push_back(Properties(node));
-      });
+      held.emplace_back(desk.Root());
     }
     ASSERT_FALSE(held.empty()) << script;
     EXPECT_GE(held.front().replaced, 2) << script;
@@ -160,6 +295,7 @@ TEST(Machines, ReplacedTreesGoOnAnswering) {
             << script << ", replaced " << tree.replaced << " times";
       }
       EXPECT_GT(tree.nodes.size(), 20u);
+      EXPECT_EQ(IdsOf(tree.list), tree.rest) << script;
     }
   }
 }

@@ -9,6 +9,7 @@
 #include "devinfo/info_device_cache.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
+#include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/intercepting_host.h"
 #include "tests/devinfo/storage_machine.h"
 
@@ -296,6 +297,21 @@ TEST_F(StorageCacheTest, DriveLettersOfDisks) {
     finder.FindDriveLettersForDisk(disk, roots);
     EXPECT_EQ(roots, id == std::u16string(u"Disk\\b") ? Texts{} : (Texts{u"A:\\", u"Z:\\"}));
   }
+}
+
+TEST_F(StorageCacheTest, AsksForTheWholePcOnceInAPass) {
+  constexpr unsigned kSticks = 20;
+  for (unsigned i = 0; i < kSticks; ++i) AddStick(machine, i, i < 3 ? static_cast<char16_t>(u'E' + i) : u'\0');
+  Start();
+  platform::wrappers::CountingHost host(*pc);
+  cache.emplace(host);
+  Pass();
+  EXPECT_EQ(cache->Volumes().size(), kSticks);
+  EXPECT_EQ(host.Count(Operation::OpenDevice), 2 * kSticks + 26);  // volumes, disks, letters
+  EXPECT_EQ(host.Count(Operation::FirstVolume), 1u);
+  EXPECT_EQ(host.Count(Operation::VolumePathNames), kSticks);
+  EXPECT_EQ(host.Count(Operation::VolumeNameForMountPoint), kSticks + 3);
+  EXPECT_EQ(host.Count(Operation::DriveType), 3u + 3u + 3u);  // roots, path names, letters
 }
 
 }  // namespace

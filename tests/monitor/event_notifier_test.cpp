@@ -18,6 +18,42 @@ using EventNotifier = ComObjects;
 constexpr HRESULT kOtherCode = static_cast<HRESULT>(0x80070005);
 constexpr char kCaught[] = "Error caught\t-\tterminating";
 
+TEST_F(EventNotifier, IsNotCreatedWithoutATree) {
+  const struct {
+    const char* what;
+    HRESULT created;
+    HRESULT offers;
+    bool registered;
+    HRESULT result;
+    std::uint64_t threads;  // started and left behind: the window's
+  } kCases[] = {
+      {"no class", S_OK, S_OK, false, REGDB_E_CLASSNOTREG, 0},
+      {"class fails", kOtherCode, S_OK, true, kOtherCode, 0},
+      {"no building", S_OK, E_NOINTERFACE, true, E_NOINTERFACE, 1},
+      {"building fails", S_OK, kOtherCode, true, kOtherCode, 1},
+      {"fine", S_OK, S_OK, true, S_OK, 1},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    ScriptedTree tree;
+    tree.created = test.created;
+    tree.offers = test.offers;
+    NotifierProcess process;
+    if (test.registered) process.UseTreeClass(static_cast<IClassFactory*>(&tree));
+    EXPECT_EQ(process.Create(process.notifier), test.result);
+    EXPECT_EQ(process.notifier.Get() != nullptr, SUCCEEDED(test.result));
+    // What was started without a target is torn down again.
+    EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), test.threads);
+    EXPECT_EQ(process.desktop.Calls(DesktopCall::RegisterDeviceNotificationW), test.threads);
+    EXPECT_EQ(process.desktop.Counts().registrations, test.result == S_OK ? 1u : 0u);
+    EXPECT_EQ(g_pActiveReceiver != nullptr, test.result == S_OK);
+    EXPECT_EQ(g_pNotifyTarget != nullptr, test.result == S_OK);
+    process.desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
+    process.desktop.Settle();
+    EXPECT_EQ(tree.calls, test.result == S_OK ? "build list1 list0 list2 list3 reset" : "");
+  }
+}
+
 TEST_F(EventNotifier, BuildsNothingByItselfAndOutlivesItsClients) {
   Scene scene;
   EXPECT_EQ(scene.tree.calls, "");
@@ -122,6 +158,22 @@ TEST_F(EventNotifier, SinksActInsideACall) {
          EXPECT_GE(s.a.References(), 2) << "kept while it is called";
        },
        "A 1 d1, B 1 d1, B 1 d2, B 0 c"},
+      {"unadvises the next",
+       [&](Scene& s) {
+         unadvise(s, 2);
+         EXPECT_EQ(s.b.References(), 1);
+       },
+       "A 1 d1, A 1 d2, A 0 c"},
+      {"advises another, into a slot of this round", [](Scene& s) { EXPECT_EQ(s.process.Advise(s.c), 3u); },
+       "A 1 d1, C 0 c, B 1 d1, C 1 d1, A 1 d2, B 1 d2, C 1 d2, A 0 c, B 0 c, C 0 c"},
+      {"advises itself again: told once for each slot", [](Scene& s) { EXPECT_EQ(s.process.Advise(s.a), 3u); },
+       "A 1 d1, A 0 c, A 0 c, B 1 d1, A 1 d1, A 1 d2, B 1 d2, A 1 d2, A 0 c, B 0 c, A 0 c"},
+      {"leaves and comes again",
+       [&](Scene& s) {
+         unadvise(s, 1);
+         EXPECT_EQ(s.process.Advise(s.a), 1u);
+       },
+       "A 1 d1, A 0 c, B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c"},
       {"advises another, into a slot that was passed",
        [&](Scene& s) {
          unadvise(s, 1);

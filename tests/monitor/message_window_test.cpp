@@ -98,7 +98,7 @@ TEST(MessageWindow, AnswersZeroForDeviceMessagesAndForExceptions) {
   }
   process.desktop.SetDefaultProcedure({});
   EXPECT_TRUE(process.desktop.Boxes().empty()) << "the texts are dropped";
-  for (const std::uint32_t event : {7u, 0x8000u, 0x8004u}) {
+  for (const std::uint32_t event : {0u, 7u, 0x8000u, 0x8001u, 0x8002u, 0x8003u, 0x8004u, 0x8005u, 0xFFFFu}) {
     EXPECT_EQ(process.desktop.SendToWindow(window, kWM_DEVICECHANGE, event, RecordOf(watched)), 0) << event;
   }
   // No memory for the name: the broadcast is lost, and nothing escapes.
@@ -124,6 +124,8 @@ TEST(MessageWindow, EndsTheProcessWithoutAWindow) {
     std::optional<std::u16string> text;
   } kCases[] = {
       {"window", {{DesktopCall::CreateWindowExW, 1, 1400}}, u"Invalid window handle.\r\n"},
+      {"class", {{DesktopCall::RegisterClassW, 1, 5}}, u"Access is denied.\r\n"},
+      {"unknown code", {{DesktopCall::CreateWindowExW, 1, 0xDEAD}}, std::nullopt},
       {"no text", {{DesktopCall::RegisterClassW, 1, 5}, {DesktopCall::FormatMessageW, 1, 8}}, std::nullopt},
   };
   for (const auto& test : kCases) {

@@ -17,7 +17,7 @@ using testing::IsEmpty;
 
 constexpr std::uint32_t kArrival = kDBT_DEVICEARRIVAL;
 constexpr std::uint32_t kRemoval = kDBT_DEVICEREMOVECOMPLETE;
-constexpr std::uint32_t kOem = 0, kVolume = 2, kInterface = 5;
+constexpr std::uint32_t kOem = 0, kVolume = 2, kPort = 3, kInterface = 5, kHandle = 6;
 
 std::u16string Path(const std::u16string& id, const std::u16string& prefix = u"\\\\?\\") {
   return prefix + u"USB#" + id + u"#0a1b#{a5dcbf10-6530-11d2-901f-00c04fb951ed}";
@@ -58,7 +58,9 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
     DeviceBroadcast broadcast;
     std::vector<std::uint64_t> delays;
   } kCases[] = {
-      {"volume", kArrival, VolumeBroadcast(0, u'E', 0), {0}},
+      {"volume came", kArrival, VolumeBroadcast(0, u'E', 0), {0}},
+      {"volume went", kRemoval, VolumeBroadcast(0, u'E', 0), {0}},
+      {"volume, its name not read", kArrival, NamedBroadcast(0, kVolume, u"x"), {0}},
       {"volume, header only", kRemoval, NamedBroadcast(0, kVolume, u"", 12), {0}},
       {"volume, header cut", kArrival, NamedBroadcast(0, kVolume, u"", 11), {}},
       {"watched came", kArrival, NamedBroadcast(0, kInterface, watched), {0}},
@@ -66,8 +68,13 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
       {"product 1290", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1290")), {0}},
       {"small letters", kRemoval, NamedBroadcast(0, kInterface, Path(u"vid_05ac&pid_1292")), {3000}},
       {"product 128F", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_128F")), {}},
-      {"product 1293", kRemoval, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1293")), {}},
+      {"product 1293 came", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1293")), {}},
+      {"product 1293 went", kRemoval, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1293")), {}},
       {"vendor 05AD", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AD&PID_1291")), {}},
+      {"no ids", kArrival, NamedBroadcast(0, kInterface, Path(u"ROOT_HUB20")), {}},
+      {"no name", kArrival, NamedBroadcast(0, kInterface, u""), {}},
+      {"port went", kRemoval, NamedBroadcast(0, kPort, watched), {3000}},
+      {"handle, not watched", kRemoval, NamedBroadcast(0, kHandle, u"COM1 and more"), {}},
       {"other types are read alike", kArrival, NamedBroadcast(0, kOem, watched), {0}},
       {"any prefix of four", kArrival, NamedBroadcast(0, kInterface, Path(u"VID_05AC&PID_1291", u"####")), {0}},
       {"prefix skipped unseen", kArrival, NamedBroadcast(0, kInterface, u"VID_05AC&PID_1291#1#{x}"), {}},
@@ -75,9 +82,15 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
       {"name of five", kArrival, NamedBroadcast(0, kInterface, u"\\\\?\\#"), {}},
       {"name without its zero", kArrival, NamedBroadcast(0, kInterface, upToCut, bytesUpTo(upToCut)), {0}},
       {"half a character more", kArrival, NamedBroadcast(0, kInterface, watched, bytesUpTo(upToCut) + 1), {0}},
+      {"header only", kRemoval, NamedBroadcast(0, kInterface, watched, 12), {}},
       {"size only", kRemoval, NamedBroadcast(0, kInterface, watched, 4), {}},
-      {"null", kArrival, {}, {}},
+      {"null came", kArrival, {}, {}},
+      {"null went", kRemoval, {}, {}},
+      {"nodes changed", 0x0007, {}, {}},
+      {"query", 0x8001, VolumeBroadcast(0, u'E', 0), {}},
+      {"query failed", 0x8002, NamedBroadcast(0, kInterface, watched), {}},
       {"pending", 0x8003, NamedBroadcast(0, kInterface, watched), {}},
+      {"custom", 0x8006, VolumeBroadcast(0, u'E', 0), {}},
       {"beyond 16 bits", 0x18000, VolumeBroadcast(0, u'E', 0), {}},
   };
   Monitor monitor;

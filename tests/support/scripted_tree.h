@@ -18,6 +18,8 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
  public:
   ~ScriptedTree() { EXPECT_EQ(m_references, 1) << "references of others"; }
 
+  HRESULT created = S_OK;  // by the class
+  HRESULT offers = S_OK;   // when asked for what builds
   HRESULT built = S_OK;
   HRESULT listed = S_OK;
   HRESULT reset = S_OK;
@@ -40,6 +42,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
     *out = nullptr;
     if (iid == platform::IidOf<IBuildUsbTree>()) {
+      if (FAILED(offers)) return offers;
       *out = static_cast<IBuildUsbTree*>(this);
     } else if (iid == platform::IidOf<IClassFactory>()) {
       *out = static_cast<IClassFactory*>(this);
@@ -56,6 +59,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
 
   HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown* outer, REFIID iid, void** out) override {
     EXPECT_EQ(outer, nullptr);
+    if (FAILED(created)) return created;
     return QueryInterface(iid, out);
   }
   HRESULT STDMETHODCALLTYPE LockServer(BOOL) override { return S_OK; }
