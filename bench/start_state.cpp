@@ -1,7 +1,6 @@
 #include "bench/start_state.h"
 
 #include <cstddef>
-#include <memory>
 #include <vector>
 
 #ifdef __GLIBC__
@@ -17,6 +16,7 @@ void KeepFreedMemory() noexcept {
   constexpr int kNever = 1 << 30;
   mallopt(M_TRIM_THRESHOLD, kNever);
   mallopt(M_MMAP_THRESHOLD, kNever);
+  mallopt(M_MXFAST, 0);
 #endif
 }
 
@@ -28,10 +28,6 @@ void StartCold() {
   static std::vector<unsigned char> other(kBytes);
   for (std::size_t at = 0; at < kBytes; at += kLine) ++other[at];
   benchmark::ClobberMemory();
-  // A large request makes the heap join small free pieces that it has put aside.
-  constexpr std::size_t kLargeRequest = std::size_t{1} << 16;
-  const std::unique_ptr<unsigned char[]> request(new unsigned char[kLargeRequest]);
-  benchmark::DoNotOptimize(request.get());
 }
 
 }  // namespace bench

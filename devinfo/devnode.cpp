@@ -31,6 +31,11 @@ std::optional<std::u16string> ReadTextProperty(platform::DeviceManager& manager,
   return ReceivedText(buffer);
 }
 
+// The part of a driver key before its last backslash; all of it where it has none.
+std::u16string_view ClassOf(std::u16string_view key) noexcept {
+  return key.substr(0, key.rfind(u'\\'));
+}
+
 // Calls `visit` with each node, depth first from the root, until it returns true. The way up asks
 // the system for the parent: a node without one ends the walk, as the root does. No two nodes are
 // visited or climbed to twice, so the walk ends on a system that answers in circles.
@@ -97,7 +102,8 @@ platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
 platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
   if (!m_filled) Fill();
   const std::u16string key = platform::ToLower(driverKey);
-  const auto found = m_index.First(platform::HashOf(key), [&](auto i) { return KeyOf(i) == key; });
+  const auto found =
+      m_index.First(platform::HashOf(key), [&](auto entry) { return IsKeyOf(entry, key); });
   return found == platform::FlatIndex::kNone ? 0 : m_nodes[found].handle;
 }
 
@@ -113,14 +119,32 @@ void DriverKeyIndex::Fill() {
 
 // A key that an earlier node has is entered behind that one, and never found.
 void DriverKeyIndex::Add(std::u16string_view key, platform::DevInst node) {
-  m_nodes.push_back({m_keys.size(), key.size(), node});
-  m_keys += key;
+  const std::u16string_view keyClass = ClassOf(key);
+  m_nodes.push_back({m_rests.size(), PlaceOfClass(keyClass), node});
+  m_rests += key.substr(keyClass.size());
   m_index.Add(platform::HashOf(key), static_cast<platform::FlatIndex::Entry>(m_nodes.size() - 1),
-              [&](auto i) { return KeyOf(i) == key; });
+              [&](auto entry) { return IsKeyOf(entry, key); });
 }
 
-std::u16string_view DriverKeyIndex::KeyOf(platform::FlatIndex::Entry entry) const noexcept {
-  return std::u16string_view(m_keys).substr(m_nodes[entry].keyBegin, m_nodes[entry].keyLength);
+std::uint32_t DriverKeyIndex::PlaceOfClass(std::u16string_view keyClass) {
+  const std::size_t hash = platform::HashOf(keyClass);
+  const auto same = [&](auto entry) { return m_classes[entry] == keyClass; };
+  const auto known = m_classIndex.First(hash, same);
+  if (known != platform::FlatIndex::kNone) return known;
+  const auto place = static_cast<std::uint32_t>(m_classes.size());
+  m_classes.emplace_back(keyClass);
+  m_classIndex.Add(hash, place, same);
+  return place;
+}
+
+bool DriverKeyIndex::IsKeyOf(platform::FlatIndex::Entry entry,
+                             std::u16string_view key) const noexcept {
+  const std::size_t begin = m_nodes[entry].restBegin;
+  const std::size_t end =
+      entry + 1 < m_nodes.size() ? m_nodes[entry + 1].restBegin : m_rests.size();
+  const std::u16string_view keyClass = m_classes[m_nodes[entry].keyClass];
+  return key.starts_with(keyClass) &&
+         key.substr(keyClass.size()) == std::u16string_view(m_rests).substr(begin, end - begin);
 }
 
 }  // namespace KelvoUHW

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -42,19 +43,23 @@ class DriverKeyIndex {
   platform::DevInst Find(const std::u16string& driverKey);
 
  private:
+  // A key is its class, "{...}", which most others have too, and what tells it from those.
   struct Node {
-    std::size_t keyBegin;  // in m_keys
-    std::size_t keyLength;
+    std::size_t restBegin;   // in m_rests, up to where the next one's begins
+    std::uint32_t keyClass;  // position in m_classes
     platform::DevInst handle;
   };
 
   void Fill();
   void Add(std::u16string_view key, platform::DevInst node);
-  std::u16string_view KeyOf(platform::FlatIndex::Entry entry) const noexcept;
+  std::uint32_t PlaceOfClass(std::u16string_view keyClass);
+  bool IsKeyOf(platform::FlatIndex::Entry entry, std::u16string_view key) const noexcept;
 
   platform::DeviceManager& m_manager;
-  std::vector<Node> m_nodes;  // in the order of the walk
-  std::u16string m_keys;      // lower-cased, one behind the other
+  std::vector<Node> m_nodes;              // in the order of the walk
+  std::u16string m_rests;                 // lower-cased, one behind the other
+  std::vector<std::u16string> m_classes;  // lower-cased
+  platform::FlatIndex m_classIndex;
   platform::FlatIndex m_index;
   bool m_filled = false;
 };

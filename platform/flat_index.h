@@ -5,6 +5,7 @@
 // nothing then.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
@@ -48,20 +49,24 @@ class FlatIndex {
     return slot == kNoSlot ? kNone : m_slots[slot].first;
   }
   // The next one with the same key, or kNone.
-  Entry Next(Entry entry) const noexcept { return m_links[entry].next; }
+  Entry Next(Entry entry) const noexcept {
+    return entry < m_links.size() ? m_links[entry].next : kNone;
+  }
 
   // `entry` must not be in the index.
   template <class Same>
   void Add(std::size_t hash, Entry entry, Same same) {
-    Reserve(entry);
+    Reserve();
     const std::size_t slot = SlotOf(hash, same);
     if (slot == kNoSlot) {
-      m_links[entry] = {};
+      if (entry < m_links.size()) m_links[entry] = {};
       Put({Folded(hash), entry, entry});
       ++m_used;
       return;
     }
     Slot& key = m_slots[slot];
+    const std::size_t linked = std::max(entry, key.last) + std::size_t{1};
+    if (m_links.size() < linked) m_links.resize(linked);
     m_links[entry] = {key.last, kNone};
     m_links[key.last].next = entry;
     key.last = entry;
@@ -73,11 +78,11 @@ class FlatIndex {
     const std::size_t slot = SlotOf(hash, same);
     if (slot == kNoSlot) return;
     Slot& key = m_slots[slot];
-    const Links links = m_links[entry];
     if (key.first == key.last) {
       Vacate(slot);
       return;
     }
+    const Links links = m_links[entry];
     (links.previous == kNone ? key.first : m_links[links.previous].next) = links.next;
     (links.next == kNone ? key.last : m_links[links.next].previous) = links.previous;
   }
@@ -104,7 +109,8 @@ class FlatIndex {
   static std::uint32_t Folded(std::size_t hash) noexcept {
     return static_cast<std::uint32_t>(hash ^ (static_cast<std::uint64_t>(hash) >> 32));
   }
-  // The number of slots is a power of two, and more than half of them are free.
+  // The number of slots is a power of two, and a quarter of them are free at least: fuller ones
+  // make searches long, emptier ones spread a large table over more memory than the caches hold.
   std::size_t Mask() const noexcept { return m_slots.size() - 1; }
 
   template <class Same>
@@ -137,9 +143,8 @@ class FlatIndex {
     m_slots[free] = {};
   }
 
-  void Reserve(Entry entry) {
-    if (m_links.size() <= entry) m_links.resize(entry + std::size_t{1});
-    if ((m_used + 1) * 2 <= m_slots.size()) return;
+  void Reserve() {
+    if ((m_used + 1) * 4 <= m_slots.size() * 3) return;
     std::vector<Slot> old(m_slots.empty() ? kFewestSlots : m_slots.size() * 2);
     old.swap(m_slots);
     for (const Slot& key : old) {
@@ -148,7 +153,7 @@ class FlatIndex {
   }
 
   std::vector<Slot> m_slots;
-  std::vector<Links> m_links;  // by entry
+  std::vector<Links> m_links;  // by entry, as far as entries share keys; missing ones are empty
   std::size_t m_used = 0;
 };
 
@@ -178,7 +183,7 @@ class FlatNumberSet {
  public:
   // False where the number was in the set already.
   bool Insert(std::uint32_t number) {
-    if ((m_used + 1) * 2 > m_slots.size()) Grow();
+    if ((m_used + 1) * 4 > m_slots.size() * 3) Grow();
     std::uint32_t& slot = m_slots[PlaceOf(number)];
     if (slot == number) return false;
     slot = number;
@@ -204,7 +209,7 @@ class FlatNumberSet {
     }
   }
 
-  std::vector<std::uint32_t> m_slots;  // a power of two of them, more than half of them free
+  std::vector<std::uint32_t> m_slots;  // a power of two of them, a quarter free
   std::size_t m_used = 0;
 };
 

@@ -5,13 +5,13 @@
 #include <optional>
 #include <string>
 #include <string_view>
-#include <unordered_map>
 #include <utility>
 
 #include "devinfo/device_set.h"
 #include "devinfo/devnode.h"
 #include "devinfo/property_reader.h"
 #include "devinfo/received_text.h"
+#include "platform/flat_index.h"
 #include "platform/text.h"
 #include "tree/port_device.h"
 #include "tree/records.h"
@@ -134,15 +134,15 @@ class Forest {
  public:
   explicit Forest(std::vector<DeviceNodeRecord>& records) : m_records(records) {
     m_places.resize(records.size());
-    for (std::size_t index = 0; index < records.size(); ++index) Link(index);
-    for (std::size_t index = 0; index < records.size(); ++index) {
+    for (Index index = 0; index < records.size(); ++index) Link(index);
+    for (Index index = 0; index < records.size(); ++index) {
       if (IsClass(records[index], u"DiskDrive")) MarkWayTo(index);
     }
   }
 
   std::vector<DeviceNodeRecord> TakePruned() {
     std::vector<DeviceNodeRecord> top;
-    for (std::size_t index = 0; index < m_records.size(); ++index) {
+    for (Index index = 0; index < m_records.size(); ++index) {
       if (m_places[index].parent == kNone && m_places[index].leadsToDisk) {
         top.push_back(Take(index));
       }
@@ -151,46 +151,65 @@ class Forest {
   }
 
  private:
-  static constexpr std::size_t kNone = static_cast<std::size_t>(-1);
+  using Index = platform::FlatIndex::Entry;
+  static constexpr Index kNone = platform::FlatIndex::kNone;
   struct Place {
-    std::size_t parent = kNone;
-    std::vector<std::size_t> children;
+    Index parent = kNone;
+    Index firstChild = kNone;
+    Index lastChild = kNone;
+    Index nextSibling = kNone;
     bool leadsToDisk = false;
   };
 
-  void Link(std::size_t index) {
+  // Where a number is entered twice the first record counts.
+  auto HasHandle(platform::DevInst handle) const {
+    return [this, handle](Index index) { return m_records[index].DevInst == handle; };
+  }
+  auto WaitsFor(platform::DevInst parent) const {
+    return [this, parent](Index index) { return m_records[index].ParentDevInst == parent; };
+  }
+
+  void Link(Index index) {
     const DeviceNodeRecord& record = m_records[index];
-    if (const auto waiting = m_waiting.find(record.DevInst); waiting != m_waiting.end()) {
-      m_places[index].children = std::move(waiting->second);
-      m_waiting.erase(waiting);
-      for (const std::size_t child : m_places[index].children) m_places[child].parent = index;
+    const std::size_t hash = platform::HashOf(record.DevInst);
+    for (Index child; (child = m_waiting.First(hash, WaitsFor(record.DevInst))) != kNone;) {
+      m_waiting.Remove(hash, child, WaitsFor(record.DevInst));
+      Adopt(index, child);
     }
-    const auto parent = m_byHandle.find(record.ParentDevInst);
-    if (parent != m_byHandle.end() && !IsBelow(parent->second, index)) {
-      m_places[index].parent = parent->second;
-      m_places[parent->second].children.push_back(index);
+    const std::size_t parentHash = platform::HashOf(record.ParentDevInst);
+    const Index parent = m_byHandle.First(parentHash, HasHandle(record.ParentDevInst));
+    if (parent != kNone && !IsBelow(parent, index)) {
+      Adopt(parent, index);
     } else {
-      m_waiting[record.ParentDevInst].push_back(index);
+      m_waiting.Add(parentHash, index, WaitsFor(record.ParentDevInst));
     }
-    m_byHandle.emplace(record.DevInst, index);
+    m_byHandle.Add(hash, index, HasHandle(record.DevInst));
+  }
+
+  void Adopt(Index parent, Index child) {
+    Place& place = m_places[parent];
+    (place.lastChild == kNone ? place.firstChild : m_places[place.lastChild].nextSibling) = child;
+    place.lastChild = child;
+    m_places[child].parent = parent;
   }
 
   // Parents that form a circle leave the record that closes it at the top.
-  bool IsBelow(std::size_t index, std::size_t above) const {
+  bool IsBelow(Index index, Index above) const {
     while (index != kNone && index != above) index = m_places[index].parent;
     return index == above;
   }
 
-  void MarkWayTo(std::size_t index) {
+  void MarkWayTo(Index index) {
     while (index != kNone && !m_places[index].leadsToDisk) {
       m_places[index].leadsToDisk = true;
       index = m_places[index].parent;
     }
   }
 
-  DeviceNodeRecord Take(std::size_t index) {
+  DeviceNodeRecord Take(Index index) {
     DeviceNodeRecord record = std::move(m_records[index]);
-    for (const std::size_t child : m_places[index].children) {
+    for (Index child = m_places[index].firstChild; child != kNone;
+         child = m_places[child].nextSibling) {
       if (m_places[child].leadsToDisk && !IsClass(m_records[child], u"USB")) {
         record.Children.push_back(Take(child));
       }
@@ -200,9 +219,8 @@ class Forest {
 
   std::vector<DeviceNodeRecord>& m_records;
   std::vector<Place> m_places;
-  std::unordered_map<platform::DevInst, std::size_t> m_byHandle;
-  // Top-level records by the parent they wait for.
-  std::unordered_map<platform::DevInst, std::vector<std::size_t>> m_waiting;
+  platform::FlatIndex m_byHandle;
+  platform::FlatIndex m_waiting;  // top-level records, by the parent they wait for
 };
 
 // A node of the tree with the two ids of a record.

@@ -28,10 +28,9 @@ Publication::Publication(platform::DeviceManager& manager, InfoDeviceCache& devi
       m_published(std::move(published)) {}
 
 void Publication::Run(DeviceLists& lists) {
-  ForgetWhatLeft();
   // A record that came back still held the children of its first stay, and refused the same nodes
   // of the second as being there already; those it forgot have made room.
-  LinkToParents(m_devices.Current());
+  if (ForgetWhatLeft()) LinkToParents(m_devices.Current());
   AttachInterfaceDevices();
 
   TreeIndex index(m_building);
@@ -62,17 +61,20 @@ void Publication::Run(DeviceLists& lists) {
 
 // Device records live on from build to build and only ever gain children. What is no longer there
 // has to go, or a swapped card would go on showing the first card's volume. Removed records are
-// left alone: they say what went with them.
-void Publication::ForgetWhatLeft() {
+// left alone: they say what went with them. Returns whether anything had to go.
+bool Publication::ForgetWhatLeft() {
   const InfoDeviceSet& current = m_devices.Current();
+  bool forgotten = false;
   for (const InfoDevicePtr& record : current) {
-    std::erase_if(record->m_childs, [&](const NodePtr& child) {
-      const bool gone = child->m_nType == KUDTInterfaceDevice ||
-                        (child->m_nType == KUDTInfoDevice && !current.HasRecord(child.Get()));
-      if (gone) child->m_pParent.ClearIfNaming(record.Get());
-      return gone;
+    const std::size_t gone = std::erase_if(record->m_childs, [&](const NodePtr& child) {
+      const bool leaves = child->m_nType == KUDTInterfaceDevice ||
+                          (child->m_nType == KUDTInfoDevice && !current.HasRecord(child.Get()));
+      if (leaves) child->m_pParent.ClearIfNaming(record.Get());
+      return leaves;
     });
+    forgotten = forgotten || gone != 0;
   }
+  return forgotten;
 }
 
 void Publication::AttachInterfaceDevices() {

@@ -29,7 +29,7 @@ class Publication {
   void Run(DeviceLists& lists);
 
  private:
-  void ForgetWhatLeft();
+  bool ForgetWhatLeft();
   void AttachInterfaceDevices();
   DeviceList MatchAll(const InfoDeviceSet& entries, TreeIndex& index);
   void Merge(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device, TreeIndex& index);
