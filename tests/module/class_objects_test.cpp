@@ -9,7 +9,9 @@
 #include <thread>
 #include <vector>
 
-#include "tests/support/com_objects.h"
+#include "com/usb_tree.h"
+#include "module/singleton.h"
+#include "monitor/event_notifier.h"
 #include "tests/support/counting_sink.h"
 #include "tests/support/failing_memory.h"
 #include "tests/support/module_process.h"
@@ -60,7 +62,8 @@ class FakeClass final : public IClassFactory {
 };
 
 bool HasInstance(const CLSID& clsid) {
-  return clsid == CLSID_ZKUMUsbTree ? TreeState::s_pInstance != nullptr : NotifierState::s_pInstance != nullptr;
+  return clsid == CLSID_ZKUMUsbTree ? SingletonState<CZKUMUsbTree, IUnknown>::s_pInstance != nullptr
+                                    : SingletonState<CZKUMEventNotifier, IUnknown>::s_pInstance != nullptr;
 }
 
 TEST(ClassObjects, RefuseWhatTheyCannotMake) {
@@ -159,17 +162,17 @@ TEST(ClassObjects, LeaveNothingOfAHalfBuiltObject) {
     ModuleProcess process;
     const ComPtr<IClassFactory> factory = test.what == kClass ? nullptr : process.Class(test.clsid);
     if (test.what == kWithoutPc) platform::SetCurrentSystem({.threads = &process.desktop, .desktop = &process.desktop});
-    if (test.what == kWithoutTreeClass) process.Withdraw();
+    if (test.what == kWithoutTreeClass) process.UseTreeClass(nullptr);
     const LONG locks = ModuleLockCount();
     void* object = Mark<void>();
-    HRESULT result = S_OK;
-    {
-      const FailingAllocation failing(test.failingAllocation);
-      FailCriticalSection(test.failingLock, kNoResources);
-      result = factory ? factory->CreateInstance(nullptr, IUnknown::kIid, &object)
-                       : process.module->GetClassObject(test.clsid, IUnknown::kIid, &object);
-    }
-    EXPECT_EQ(result, test.result);
+    bool failed = false;
+    FailCriticalSection(test.failingLock, kNoResources);
+    EXPECT_EQ(WithoutAllocation(test.failingAllocation, failed,
+                                [&] {
+                                  return factory ? factory->CreateInstance(nullptr, IUnknown::kIid, &object)
+                                                 : process.module->GetClassObject(test.clsid, IUnknown::kIid, &object);
+                                }),
+              test.result);
     EXPECT_EQ(object, nullptr);
     EXPECT_FALSE(HasInstance(CLSID_ZKUMUsbTree) || HasInstance(CLSID_ZKUMEventNotifier));
     EXPECT_EQ(ModuleLockCount(), locks);
@@ -182,7 +185,7 @@ TEST(ClassObjects, LeaveNothingOfAHalfBuiltObject) {
 
 TEST(ClassObjects, TearTheMonitorDownWhenTheTreeCannotBuild) {
   ModuleProcess process;
-  process.Withdraw();
+  process.UseTreeClass(nullptr);
   FakeClass tree(IZKUMUsbTree::kIid);
   EXPECT_FALSE(process.Make<IUnknown>(CLSID_ZKUMEventNotifier, E_NOINTERFACE));
   EXPECT_EQ(tree.created, 1);
@@ -196,7 +199,7 @@ TEST(ClassObjects, TearTheMonitorDownWhenTheTreeCannotBuild) {
 
 TEST(ClassObjects, AreCachedAndLockTheModuleWhileAClientHoldsThem) {
   ModuleProcess process;
-  process.Withdraw();
+  process.UseTreeClass(nullptr);
   CZKUsbMonitorModule& module = *process.module;
   const auto expectLocks = [&](LONG locks, const char* after) {
     EXPECT_EQ(module.GetLockCount(), locks) << after;
@@ -314,7 +317,7 @@ TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {
       ModuleProcess process;
       CountingSink sink;
       IUnknown* notifier = process.Make<IUnknown>(CLSID_ZKUMEventNotifier).Detach();
-      process.Withdraw();
+      process.UseTreeClass(nullptr);
       {
         ComPtr<IConnectionPoint> point;
         DWORD cookie = 0;
@@ -324,7 +327,7 @@ TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {
       }
       // What a stick that comes leads to as long as the module is not unloaded, and no longer.
       const auto plug = [&](const char16_t* serial, std::uint32_t port, char16_t letter) {
-        EXPECT_EQ(process.pc.Apply({0, u"", Change(Stick(serial, port, letter))}), u"");
+        process.Do({Stick(serial, port, letter)});
         EXPECT_EQ(process.desktop.Broadcast(volume), 1u);
         process.desktop.Settle();
         return sink.Events();
@@ -362,7 +365,7 @@ TEST(ModuleStress, EightThreadsMakeAndReleaseTheTree) {
   constexpr std::size_t kThreads = 8;
   constexpr std::size_t kRounds = 500;
   ModuleProcess process(ClockMode::Real);
-  process.Withdraw();
+  process.UseTreeClass(nullptr);
   std::atomic<std::size_t> made = 0, shared = 0;
   std::barrier round(kThreads);
   std::vector<std::thread> threads;

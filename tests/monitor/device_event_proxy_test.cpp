@@ -24,13 +24,13 @@ using DeviceEventProxy = ComObjects;
 
 TEST_F(DeviceEventProxy, HasItsOwnIdentityAndCountsOnTheNotifier) {
   Scene scene;
-  IConnectionPoint* point = scene.process.point.Get();
+  const auto& point = scene.point;
   const auto container = scene.Container();
   const std::int32_t before = scene.NotifierReferences();
-  const auto unknown = scene.process.point.As<IUnknown>();
+  const auto unknown = scene.point.As<IUnknown>();
   EXPECT_EQ(scene.NotifierReferences(), before + 1);
-  EXPECT_FALSE(unknown.Get() == scene.process.notifier.As<IUnknown>().Get());
-  EXPECT_TRUE(unknown.As<IConnectionPoint>().Get() == point);
+  EXPECT_FALSE(unknown.Get() == scene.notifier.As<IUnknown>().Get());
+  EXPECT_TRUE(unknown.As<IConnectionPoint>().Get() == point.Get());
   for (const IID& iid : {platform::IidOf<IConnectionPointContainer>(), platform::IidOf<IZKUMEventNotifier>(),
                          platform::IidOf<IZKUMPrivateNotifier>(), DIID_IZKDeviceEventCallBack}) {
     void* out = Mark<void>();
@@ -50,7 +50,7 @@ TEST_F(DeviceEventProxy, HasItsOwnIdentityAndCountsOnTheNotifier) {
     EXPECT_EQ(container->FindConnectionPoint(other, &found), kNoConnection);
     EXPECT_EQ(found, nullptr);
   }
-  const auto support = scene.process.notifier.As<ISupportErrorInfo>();
+  const auto support = scene.notifier.As<ISupportErrorInfo>();
   EXPECT_EQ(support->InterfaceSupportsErrorInfo(platform::IidOf<IZKUMPrivateNotifier>()), S_FALSE);
   EXPECT_EQ(support->InterfaceSupportsErrorInfo(platform::IidOf<IZKUMEventNotifier>()), S_OK);
 
@@ -68,7 +68,7 @@ TEST_F(DeviceEventProxy, HasItsOwnIdentityAndCountsOnTheNotifier) {
 // Whether a sink that could not be told is advised all the same, and what was asked of the tree.
 TEST_F(DeviceEventProxy, AdviseCodes) {
   const auto answers = [](std::vector<HRESULT> codes) { return [=](Scene& s) { s.a.eventCodes = codes; }; };
-  const auto unadvises = [](Scene& s) { s.tree.onBuild = [&s] { EXPECT_EQ(s.process.point->Unadvise(1), S_OK); }; };
+  const auto unadvises = [](Scene& s) { s.tree.onBuild = [&s] { EXPECT_EQ(s.point->Unadvise(1), S_OK); }; };
   const struct {
     const char* what;
     std::function<void(Scene&)> prepare;
@@ -95,11 +95,11 @@ TEST_F(DeviceEventProxy, AdviseCodes) {
     Scene scene;
     test.prepare(scene);
     DWORD cookie = kMark;
-    EXPECT_EQ(scene.process.point->Advise(&scene.a, &cookie), test.result);
+    EXPECT_EQ(scene.point->Advise(&scene.a, &cookie), test.result);
     EXPECT_TRUE(test.advised ? cookie == 1 : cookie == kMark || cookie == 1) << cookie;
     EXPECT_EQ(scene.tree.calls, test.calls);
     EXPECT_EQ(Taken(scene.log), test.log);
-    EXPECT_EQ(scene.process.point->Unadvise(1), test.advised ? S_OK : kNoConnection);
+    EXPECT_EQ(scene.point->Unadvise(1), test.advised ? S_OK : kNoConnection);
     EXPECT_EQ(scene.a.References(), 1);
   }
 }
@@ -109,49 +109,45 @@ TEST_F(DeviceEventProxy, AdviseWithoutMemory) {
   for (const std::size_t advised : {0u, 4u, 3u}) {
     SCOPED_TRACE(advised);
     Scene scene;
-    for (std::size_t i = 0; i < advised; ++i) scene.process.Advise(scene.b);
+    for (std::size_t i = 0; i < advised; ++i) scene.Advise(scene.b);
     scene.log.clear();
     DWORD cookie = kMark;
-    HRESULT result = S_OK;
-    {
-      const FailingAllocation failing(1);
-      result = scene.process.point->Advise(&scene.a, &cookie);
-      EXPECT_TRUE(failing.Failed());
-    }
-    EXPECT_EQ(result, advised == 3 ? E_OUTOFMEMORY : kAdviseLimit);
+    bool failed = false;
+    EXPECT_EQ(WithoutAllocation(1, failed, [&] { return scene.point->Advise(&scene.a, &cookie); }),
+              advised == 3 ? E_OUTOFMEMORY : kAdviseLimit);
+    EXPECT_TRUE(failed);
     EXPECT_EQ(cookie, advised == 3 ? 4u : kMark);
     EXPECT_EQ(scene.a.References(), advised == 3 ? 2 : 1);
     EXPECT_EQ(Taken(scene.log), "");
-    scene.process.point->Unadvise(4);
-    scene.process.Advise(scene.a);
+    scene.point->Unadvise(4);
+    scene.Advise(scene.a);
     EXPECT_EQ(Taken(scene.log), "A 0 c");
   }
 }
 
 TEST_F(DeviceEventProxy, LowestFreeSlotGivesTheCookie) {
   Scene scene;
-  IConnectionPoint* point = scene.process.point.Get();
-  for (DWORD expected = 1; expected <= 5; ++expected) EXPECT_EQ(scene.process.Advise(scene.b), expected);
-  for (const DWORD removed : {4u, 2u}) EXPECT_EQ(point->Unadvise(removed), S_OK);
-  for (const DWORD expected : {2u, 4u, 6u, 7u, 8u, 9u}) EXPECT_EQ(scene.process.Advise(scene.a), expected);
-  EXPECT_EQ(point->Unadvise(3), S_OK);
-  for (const DWORD free : {0u, 3u, 16u, 17u, 0xFFFFFFFF}) EXPECT_EQ(point->Unadvise(free), kNoConnection) << free;
+  for (DWORD expected = 1; expected <= 5; ++expected) EXPECT_EQ(scene.Advise(scene.b), expected);
+  for (const DWORD removed : {4u, 2u}) EXPECT_EQ(scene.point->Unadvise(removed), S_OK);
+  for (const DWORD expected : {2u, 4u, 6u, 7u, 8u, 9u}) EXPECT_EQ(scene.Advise(scene.a), expected);
+  EXPECT_EQ(scene.point->Unadvise(3), S_OK);
+  for (const DWORD free : {0u, 3u, 16u, 17u, 0xFFFFFFFF}) EXPECT_EQ(scene.point->Unadvise(free), kNoConnection) << free;
   // In the order of the slots, whatever the order in which they came.
   scene.log.clear();
   scene.tree.lists = {};
   scene.tree.lists[KDeviceAttached] = {scene.tree.Device(u"d")};
-  EXPECT_EQ(scene.process.Notify(), S_OK);
+  EXPECT_EQ(scene.Notify(), S_OK);
   EXPECT_EQ(Taken(scene.log), "B 1 d, A 1 d, A 1 d, B 1 d, A 1 d, A 1 d, A 1 d, A 1 d");
   // Four slots became eight and then sixteen: of those advised inside a call, into slots 3 and 10 to 17, only the last
   // one stands behind the end of this round.
   scene.b.onEvent = [&] {
     scene.b.onEvent = {};
-    for (int i = 0; i < 9; ++i) scene.process.Advise(scene.c);
+    for (int i = 0; i < 9; ++i) scene.Advise(scene.c);
     return S_OK;
   };
-  EXPECT_EQ(scene.process.Notify(), S_OK);
+  EXPECT_EQ(scene.Notify(), S_OK);
   EXPECT_EQ(std::ranges::count(scene.log, "C 1 d"), 8);
-  for (DWORD each = 1; each <= 17; ++each) EXPECT_EQ(point->Unadvise(each), S_OK);
+  for (DWORD each = 1; each <= 17; ++each) EXPECT_EQ(scene.point->Unadvise(each), S_OK);
 }
 
 // What the sink answered for the event interface when it was advised is what is called, though it answers with another
@@ -159,9 +155,9 @@ TEST_F(DeviceEventProxy, LowestFreeSlotGivesTheCookie) {
 TEST_F(DeviceEventProxy, SlotHoldsTheFirstAnswer) {
   Scene scene;
   scene.a.severalFaces = true;
-  scene.process.Advise(scene.a);
+  scene.Advise(scene.a);
   scene.tree.lists[KDeviceRemoved] = {scene.tree.Device(u"r")};
-  EXPECT_EQ(scene.process.Notify(), S_OK);
+  EXPECT_EQ(scene.Notify(), S_OK);
   EXPECT_EQ(Taken(scene.log), "A 0 c, A 0 c, A 2 r");
   EXPECT_EQ(scene.a.Calls(0), 3);
   EXPECT_EQ(scene.a.Calls(1), 0);
@@ -181,10 +177,10 @@ TEST_F(DeviceEventProxy, FiringAnswersTheLastCode) {
   Scene scene;
   scene.tree.lists = {};
   TestSink* const sinks[] = {&scene.a, &scene.b, &scene.c};
-  for (TestSink* sink : sinks) scene.process.Advise(*sink);
+  for (TestSink* sink : sinks) scene.Advise(*sink);
   ComPtr<IUnknown> b;
   EXPECT_EQ(scene.b.QueryInterface(DIID_IZKDeviceEventCallBack, b.PutVoid()), S_OK);
-  auto* notifier = static_cast<CZKUMEventNotifier*>(scene.process.notifier.Get());
+  auto* notifier = static_cast<CZKUMEventNotifier*>(scene.notifier.Get());
   const auto node = Wrap(scene.tree.Device(u"d"));
   for (const auto& test : kCases) {
     for (std::size_t i = 0; i < 3; ++i) sinks[i]->onEvent = [code = test.codes[i]] { return code; };
@@ -193,7 +189,7 @@ TEST_F(DeviceEventProxy, FiringAnswersTheLastCode) {
     EXPECT_EQ(References(node.Get()), 1u);
   }
   // Nobody is called by empty slots.
-  for (const DWORD cookie : {1u, 2u, 3u}) EXPECT_EQ(scene.process.point->Unadvise(cookie), S_OK);
+  for (const DWORD cookie : {1u, 2u, 3u}) EXPECT_EQ(scene.point->Unadvise(cookie), S_OK);
   EXPECT_EQ(notifier->Fire_OnDeviceChanged(KDeviceAttached, node.Get(), nullptr), S_OK);
   EXPECT_EQ(Taken(scene.log), "");
 }
@@ -239,8 +235,8 @@ TEST_F(DeviceEventProxy, EnumeratesConnections) {
       {"n1 c n2 r n1", "S_OK:A1#1 S_OK S_FALSE:C3#1 S_OK S_OK:A1#1"},
   };
   Scene scene;
-  for (TestSink* sink : {&scene.a, &scene.b, &scene.c}) scene.process.Advise(*sink);
-  EXPECT_EQ(scene.process.point->Unadvise(2), S_OK);
+  for (TestSink* sink : {&scene.a, &scene.b, &scene.c}) scene.Advise(*sink);
+  EXPECT_EQ(scene.point->Unadvise(2), S_OK);
   const auto nameOf = [&](const CONNECTDATA& item) -> std::string {
     if (item.pUnk == nullptr) return "";
     const auto sink = ComPtr<IUnknown>::Attach(item.pUnk).As<IUnknown>();
@@ -248,14 +244,14 @@ TEST_F(DeviceEventProxy, EnumeratesConnections) {
   };
   for (const auto& test : kCases) {
     ComPtr<IEnumConnections> list;
-    ASSERT_EQ(scene.process.point->EnumConnections(list.Put()), S_OK);
+    ASSERT_EQ(scene.point->EnumConnections(list.Put()), S_OK);
     EXPECT_EQ(Play(list, test.operations, nameOf), test.outcome) << test.operations;
   }
   EXPECT_TRUE(scene.a.References() == 2 && scene.c.References() == 2) << "all but those of the slots given back";
   // A list is what was advised when it was made.
   ComPtr<IEnumConnections> list;
-  ASSERT_EQ(scene.process.point->EnumConnections(list.Put()), S_OK);
-  for (const DWORD cookie : {1u, 3u}) EXPECT_EQ(scene.process.point->Unadvise(cookie), S_OK);
+  ASSERT_EQ(scene.point->EnumConnections(list.Put()), S_OK);
+  for (const DWORD cookie : {1u, 3u}) EXPECT_EQ(scene.point->Unadvise(cookie), S_OK);
   EXPECT_EQ(scene.a.References(), 2);
   EXPECT_EQ(Play(list, "n2", nameOf), "S_OK:A1:C3#2");
 }
@@ -268,18 +264,18 @@ TEST_F(DeviceEventProxy, EnumeratesTheOnePoint) {
   ULONG fetched = 0;
   EXPECT_EQ(list->Next(2, points, &fetched), S_FALSE);
   EXPECT_EQ(fetched, 1u);
-  EXPECT_TRUE(ComPtr<IConnectionPoint>::Attach(points[0]).Get() == scene.process.point.Get());
+  EXPECT_TRUE(ComPtr<IConnectionPoint>::Attach(points[0]).Get() == scene.point.Get());
 }
 
 TEST_F(DeviceEventProxy, EnumeratesWithoutMemory) {
   Scene scene;
-  scene.process.Advise(scene.a);
+  scene.Advise(scene.a);
   HRESULT result = E_OUTOFMEMORY;
   int failures = 0;
   for (std::uint64_t nth = 1; result == E_OUTOFMEMORY && nth < 50; ++nth) {
     auto* out = Mark<IEnumConnections>();
     const FailingAllocation failing(nth);
-    result = scene.process.point->EnumConnections(&out);
+    result = scene.point->EnumConnections(&out);
     failures += failing.Failed() ? 1 : 0;
     EXPECT_EQ(failing.Failed(), out == nullptr);
     if (out != nullptr) out->Release();

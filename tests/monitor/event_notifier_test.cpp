@@ -38,9 +38,9 @@ TEST_F(EventNotifier, IsNotCreatedWithoutATree) {
     ScriptedTree tree;
     tree.created = test.created;
     tree.offers = test.offers;
-    NotifierProcess process;
-    if (test.registered) process.UseTreeClass(static_cast<IClassFactory*>(&tree));
-    EXPECT_EQ(process.Create(process.notifier), test.result);
+    ModuleProcess process;
+    process.UseTreeClass(test.registered ? static_cast<IClassFactory*>(&tree) : nullptr);
+    process.notifier = process.Make<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier, test.result);
     EXPECT_EQ(process.notifier.Get() != nullptr, SUCCEEDED(test.result));
     // What was started without a target is torn down again.
     EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), test.threads);
@@ -57,10 +57,10 @@ TEST_F(EventNotifier, IsNotCreatedWithoutATree) {
 TEST_F(EventNotifier, BuildsNothingByItselfAndOutlivesItsClients) {
   Scene scene;
   EXPECT_EQ(scene.tree.calls, "");
-  scene.process.point.Reset();
-  scene.process.notifier.Reset();
-  scene.process.desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
-  scene.process.desktop.Settle();
+  scene.point.Reset();
+  scene.notifier.Reset();
+  scene.desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
+  scene.desktop.Settle();
   EXPECT_EQ(scene.tree.calls, "build list1 list0 list2 list3 reset");
 }
 
@@ -83,7 +83,7 @@ TEST_F(EventNotifier, NotifyDeviceChangeCodes) {
       {"unchanged", S_FALSE, S_FALSE, TRUE, kWithoutLists, ""},
   };
   Scene scene;
-  scene.process.Advise(scene.a);
+  scene.Advise(scene.a);
   const std::atomic<std::int32_t>& busy = g_pActiveReceiver.load()->m_nBusy;
   for (const auto& test : kCases) {
     SCOPED_TRACE(test.what);
@@ -92,7 +92,7 @@ TEST_F(EventNotifier, NotifyDeviceChangeCodes) {
     scene.tree.built = test.built;
     scene.tree.reset = test.reset;
     scene.tree.onBuild = [&] { EXPECT_EQ(busy, 1); };
-    EXPECT_EQ(scene.process.Notify(test.fire), test.reset);
+    EXPECT_EQ(scene.Notify(test.fire), test.reset);
     EXPECT_EQ(scene.tree.calls, test.calls);
     EXPECT_EQ(Taken(scene.log), test.log);
     EXPECT_EQ(busy, 0);
@@ -121,12 +121,12 @@ TEST_F(EventNotifier, FiresInOrderWhatSitsOnHubPorts) {
                                  ScriptedTree::Below(device, u"x"), ScriptedTree::Below(NodePtr(), u"x")};
   tree.lists[KDeviceRemoved] = {tree.Device(u"r1")};
   tree.lists[KDeviceModified] = {twice, twice};
-  scene.process.Advise(scene.a);
-  scene.process.Advise(scene.b);
+  scene.Advise(scene.a);
+  scene.Advise(scene.b);
   EXPECT_EQ(Taken(scene.log), "A 0 c1, A 0 c2, B 0 c1, B 0 c2");
   std::vector<ComPtr<IUnknown>> data;
   scene.b.keeps = &data;
-  EXPECT_EQ(scene.process.Notify(), S_OK);
+  EXPECT_EQ(scene.Notify(), S_OK);
   EXPECT_EQ(Taken(scene.log),
             "A 1 a1, B 1 a1, A 0 c1, B 0 c1, A 0 c2, B 0 c2, A 2 r1, B 2 r1, A 3 m, B 3 m, A 3 m, B 3 m");
   ASSERT_EQ(data.size(), 6u);
@@ -143,7 +143,7 @@ TEST_F(EventNotifier, FiresInOrderWhatSitsOnHubPorts) {
 // connected. A does it in its first call.
 TEST_F(EventNotifier, SinksActInsideACall) {
   const std::string all = "A 1 d1, B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c";
-  const auto unadvise = [](Scene& s, DWORD cookie) { EXPECT_EQ(s.process.point->Unadvise(cookie), S_OK); };
+  const auto unadvise = [](Scene& s, DWORD cookie) { EXPECT_EQ(s.point->Unadvise(cookie), S_OK); };
   const struct {
     const char* what;
     std::function<void(Scene&)> act;
@@ -154,7 +154,7 @@ TEST_F(EventNotifier, SinksActInsideACall) {
       {"unadvises itself",
        [&](Scene& s) {
          unadvise(s, 1);
-         EXPECT_EQ(s.process.point->Unadvise(1), CONNECT_E_NOCONNECTION);
+         EXPECT_EQ(s.point->Unadvise(1), CONNECT_E_NOCONNECTION);
          EXPECT_GE(s.a.References(), 2) << "kept while it is called";
        },
        "A 1 d1, B 1 d1, B 1 d2, B 0 c"},
@@ -164,37 +164,37 @@ TEST_F(EventNotifier, SinksActInsideACall) {
          EXPECT_EQ(s.b.References(), 1);
        },
        "A 1 d1, A 1 d2, A 0 c"},
-      {"advises another, into a slot of this round", [](Scene& s) { EXPECT_EQ(s.process.Advise(s.c), 3u); },
+      {"advises another, into a slot of this round", [](Scene& s) { EXPECT_EQ(s.Advise(s.c), 3u); },
        "A 1 d1, C 0 c, B 1 d1, C 1 d1, A 1 d2, B 1 d2, C 1 d2, A 0 c, B 0 c, C 0 c"},
-      {"advises itself again: told once for each slot", [](Scene& s) { EXPECT_EQ(s.process.Advise(s.a), 3u); },
+      {"advises itself again: told once for each slot", [](Scene& s) { EXPECT_EQ(s.Advise(s.a), 3u); },
        "A 1 d1, A 0 c, A 0 c, B 1 d1, A 1 d1, A 1 d2, B 1 d2, A 1 d2, A 0 c, B 0 c, A 0 c"},
       {"leaves and comes again",
        [&](Scene& s) {
          unadvise(s, 1);
-         EXPECT_EQ(s.process.Advise(s.a), 1u);
+         EXPECT_EQ(s.Advise(s.a), 1u);
        },
        "A 1 d1, A 0 c, B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c"},
       {"advises another, into a slot that was passed",
        [&](Scene& s) {
          unadvise(s, 1);
-         EXPECT_EQ(s.process.Advise(s.c), 1u);
+         EXPECT_EQ(s.Advise(s.c), 1u);
        },
        "A 1 d1, C 0 c, B 1 d1, C 1 d2, B 1 d2, C 0 c, B 0 c"},
       {"advises many: the fifth slot is called from the next device on",
        [](Scene& s) {
-         for (const DWORD slot : {3u, 4u, 5u}) EXPECT_EQ(s.process.Advise(s.c), slot);
+         for (const DWORD slot : {3u, 4u, 5u}) EXPECT_EQ(s.Advise(s.c), slot);
        },
        "A 1 d1, C 0 c, C 0 c, C 0 c, C 0 c, C 0 c, C 0 c, B 1 d1, C 1 d1, C 1 d1, A 1 d2, B 1 d2, C 1 d2, C 1 d2, "
        "C 1 d2, A 0 c, B 0 c, C 0 c, C 0 c, C 0 c"},
-      {"starts a run of its own", [](Scene& s) { EXPECT_EQ(s.process.Notify(), S_OK); },
+      {"starts a run of its own", [](Scene& s) { EXPECT_EQ(s.Notify(), S_OK); },
        "A 1 d1, " + all + ", B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c"},
   };
   for (const auto& test : kCases) {
     SCOPED_TRACE(test.what);
     Scene scene;
     scene.tree.lists[KDeviceAttached] = {scene.tree.Device(u"d1"), scene.tree.Device(u"d2")};
-    scene.process.Advise(scene.a);
-    scene.process.Advise(scene.b);
+    scene.Advise(scene.a);
+    scene.Advise(scene.b);
     scene.log.clear();
     bool done = false;
     scene.a.onEvent = [&] {
@@ -202,7 +202,7 @@ TEST_F(EventNotifier, SinksActInsideACall) {
       return S_OK;
     };
     testing::internal::CaptureStdout();
-    EXPECT_EQ(scene.process.Notify(), S_OK);
+    EXPECT_EQ(scene.Notify(), S_OK);
     EXPECT_EQ(testing::internal::GetCapturedStdout(), test.out);
     EXPECT_EQ(Taken(scene.log), test.log);
   }
@@ -212,20 +212,15 @@ TEST_F(EventNotifier, SinksActInsideACall) {
 // afterwards.
 TEST_F(EventNotifier, NotifiesWithoutMemory) {
   Scene scene;
-  scene.process.Advise(scene.a);
+  scene.Advise(scene.a);
   scene.log.clear();
   scene.log.reserve(8);
-  const auto target = scene.process.notifier.As<IZKUMPrivateNotifier>();
+  const auto target = scene.notifier.As<IZKUMPrivateNotifier>();
   int failures = 0;
   bool failed = true;
   for (std::uint64_t nth = 1; failed && nth < 200; ++nth) {
-    HRESULT result = S_OK;
     testing::internal::CaptureStdout();
-    {
-      const FailingAllocation failing(nth);
-      result = target->NotifyDeviceChange(0, TRUE);
-      failed = failing.Failed();
-    }
+    const HRESULT result = WithoutAllocation(nth, failed, [&] { return target->NotifyDeviceChange(0, TRUE); });
     const std::string out = testing::internal::GetCapturedStdout();
     const std::string log = Taken(scene.log);
     failures += failed ? 1 : 0;
@@ -233,11 +228,11 @@ TEST_F(EventNotifier, NotifiesWithoutMemory) {
     EXPECT_TRUE(result == E_OUTOFMEMORY ? out.empty() : result == S_OK) << nth << " " << CodeName(result);
     EXPECT_EQ(g_pActiveReceiver.load()->m_nBusy, 0);
     bool taken = false;
-    testing_support::Launch(scene.process.desktop, [&] {
+    scene.Launch([&] {
       const ThreadLockGuard guard(g_notifyLock);
       taken = true;
     });
-    scene.process.desktop.RunFor(0);
+    scene.desktop.RunFor(0);
     EXPECT_TRUE(taken) << nth;
   }
   EXPECT_GE(failures, 3);
@@ -246,23 +241,23 @@ TEST_F(EventNotifier, NotifiesWithoutMemory) {
 // The lock as other threads meet it, on virtual time.
 TEST_F(EventNotifier, OtherThreadsWaitToAdviseAndNotToUnadvise) {
   Scene scene;
-  SimulatedDesktop& desktop = scene.process.desktop;
-  scene.process.Advise(scene.a);
-  scene.process.Advise(scene.b);
+  SimulatedDesktop& desktop = scene.desktop;
+  scene.Advise(scene.a);
+  scene.Advise(scene.b);
   scene.log.clear();
   scene.tree.lists = {};
   scene.tree.lists[KDeviceAttached] = {scene.tree.Device(u"d"), scene.tree.Device(u"e")};
   std::uint64_t advised = 0;
   std::uint64_t unadvised = 1;
   scene.a.onEvent = [&] {
-    testing_support::Launch(desktop, [&] {
+    scene.Launch([&] {
       DWORD cookie = 0;
-      EXPECT_EQ(scene.process.point->Advise(&scene.c, &cookie), S_OK);
+      EXPECT_EQ(scene.point->Advise(&scene.c, &cookie), S_OK);
       advised = desktop.Now();
     });
-    testing_support::Launch(desktop, [&] {
-      EXPECT_EQ(scene.process.point->Unadvise(2), S_OK);
-      EXPECT_EQ(scene.process.point->Unadvise(1), S_OK);
+    scene.Launch([&] {
+      EXPECT_EQ(scene.point->Unadvise(2), S_OK);
+      EXPECT_EQ(scene.point->Unadvise(1), S_OK);
       unadvised = desktop.Now();
     });
     desktop.Sleep(120);

@@ -1,9 +1,5 @@
 // Runs of the notifier over whole PCs: what sinks hear of what happened.
-#include <gtest/gtest.h>
-
-#include "tests/support/notifier_process.h"
-#include "tests/support/plugs.h"
-#include "tests/support/test_sink.h"
+#include "tests/support/notifier_scene.h"
 
 namespace KelvoUHW {
 namespace {
@@ -11,25 +7,11 @@ namespace {
 using EventRuns = ComObjects;
 
 // A PC with a stick S1 and a card reader CR, and a notifier over its own tree, which has told A of them.
-struct Pc {
-  Pc() {
-    Do({Stick(u"S1", 1, u'E'), CardReader(u"CR", 2)});
-    process.UseOwnTreeClass();
-    process.Start();
-    process.Advise(a);
+struct Pc : NotifierScene {
+  Pc() : NotifierScene({Stick(u"S1", 1, u'E'), CardReader(u"CR", 2)}) {
+    Advise(a);
     EXPECT_EQ(Taken(log), "A 0 S1, A 0 CR");
   }
-  ~Pc() {
-    for (const DWORD cookie : {1u, 2u}) process.point->Unadvise(cookie);
-  }
-  void Do(const std::vector<Change>& changes) {
-    for (const Change& change : changes) process.Do(change);
-  }
-
-  TestSink::Log log;
-  TestSink a{log, "A"};
-  TestSink b{log, "B"};
-  NotifierProcess process{BarePc()};
 };
 
 // A sink advises another from inside a call, with devices in lists 1 and 2: S1 went and S2 came before the run. The
@@ -57,19 +39,19 @@ TEST_F(EventRuns, AdvisingAnotherInsideACall) {
     pc.a.onEvent = [&] {
       pc.a.onEvent = {};
       pc.Do(test.meanwhile);
-      pc.process.Advise(pc.b);
+      pc.Advise(pc.b);
       return S_OK;
     };
-    EXPECT_EQ(pc.process.Notify(), S_OK);
+    EXPECT_EQ(pc.Notify(), S_OK);
     EXPECT_EQ(Taken(pc.log), "A 1 S2, " + std::string(test.toB) +
                                  "B 1 S2, A 0 CR, B 0 CR, A 0 S2, B 0 S2, A 2 S1, B 2 S1, "
                                  "A 3 CR, B 3 CR, A 3 CR, B 3 CR");
     pc.a.keeps = nullptr;
-    EXPECT_EQ(pc.process.point->Unadvise(2), S_OK);
+    EXPECT_EQ(pc.point->Unadvise(2), S_OK);
     // Both the advise and the run settled what was found, after which nothing counts as known: the next run tells of
     // all that is there as attached. It is meant so.
     for (const char* told : {test.after, ""}) {
-      EXPECT_EQ(pc.process.Notify(), S_OK);
+      EXPECT_EQ(pc.Notify(), S_OK);
       EXPECT_EQ(Taken(pc.log), told);
     }
     // Nodes answer for themselves when their trees are gone.
@@ -114,9 +96,9 @@ TEST_F(EventRuns, TellEachSinkWhatItIsMeantToHear) {
     for (const Step& step : test.steps) {
       pc.Do(step.changes);
       DWORD cookie = 0;
-      EXPECT_EQ(step.act == kRun       ? pc.process.Notify()
-                : step.act == kAdviseB ? pc.process.point->Advise(&pc.b, &cookie)
-                                       : pc.process.point->Unadvise(2),
+      EXPECT_EQ(step.act == kRun       ? pc.Notify()
+                : step.act == kAdviseB ? pc.point->Advise(&pc.b, &cookie)
+                                       : pc.point->Unadvise(2),
                 S_OK);
       EXPECT_EQ(Taken(pc.log), step.log) << test.what;
     }

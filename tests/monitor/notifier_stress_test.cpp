@@ -9,8 +9,7 @@
 
 #include "monitor/usb_event_receiver.h"
 #include "tests/support/counting_sink.h"
-#include "tests/support/notifier_process.h"
-#include "tests/support/plugs.h"
+#include "tests/support/module_process.h"
 
 namespace KelvoUHW {
 namespace {
@@ -99,9 +98,8 @@ using NotifierStress = ComObjects;
 TEST_F(NotifierStress, ClientsComeAndGoWhileBroadcastsArrive) {
   Seen seen;
   {
-    NotifierProcess process(BarePc(), ClockMode::Real);
-    process.Do(Stick(u"S1", 1, u'E'));
-    process.UseOwnTreeClass();
+    ModuleProcess process(ClockMode::Real);
+    process.Do({Stick(u"S1", 1, u'E')});
     process.Start();
     std::atomic<bool> done = false;
     std::vector<std::thread> clients;
@@ -120,8 +118,8 @@ TEST_F(NotifierStress, ClientsComeAndGoWhileBroadcastsArrive) {
     }
     // Every second one after a change, which the next build meets.
     for (int number = 0; number < kBroadcasts; ++number) {
-      if (number % 4 == 0) process.Do(Stick(u"S2", 2, u'F'));
-      if (number % 4 == 2) process.Do(Unplug{UsbId(u"S2")});
+      if (number % 4 == 0) process.Do({Stick(u"S2", 2, u'F')});
+      if (number % 4 == 2) process.Do({Unplug{UsbId(u"S2")}});
       const std::uint32_t event = number % 4 < 2 ? platform::kDBT_DEVICEARRIVAL : platform::kDBT_DEVICEREMOVECOMPLETE;
       EXPECT_EQ(process.desktop.Broadcast(VolumeBroadcast(event, u'F', 0)), 1u);
       while (g_nEventThreads > kEventThreadsAtOnce) std::this_thread::sleep_for(std::chrono::milliseconds(1));

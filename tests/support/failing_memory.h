@@ -16,6 +16,16 @@ struct FailingAllocation {
   bool Failed() const noexcept;  // whether it came to the failure
 };
 
+// What a call returns while its n-th allocation fails, and whether it came to that. With 0 none fails, and
+// `failed` says nothing.
+template <class Call>
+auto WithoutAllocation(std::uint64_t allocation, bool& failed, Call call) {
+  const FailingAllocation failing(allocation);
+  const auto result = call();
+  failed = failing.Failed();
+  return result;
+}
+
 // Platform calls of the component get their memory from the system: what a simulated PC allocates
 // does not count and does not fail.
 struct WellFedHost final : platform::wrappers::InterceptingHost {

@@ -3,40 +3,41 @@
 
 #include <gtest/gtest.h>
 
-#include <cstdint>
 #include <optional>
-#include <string>
+#include <utility>
+#include <vector>
 
 #include "com/com_ptr.h"
-#include "com/module_lock.h"
-#include "com/usb_tree.h"
 #include "com/zkusb_monitor.h"
 #include "module/module.h"
-#include "module/singleton.h"
-#include "monitor/event_notifier.h"
 #include "platform/simulated/simulated_pc.h"
-#include "tests/support/desk_pc.h"
+#include "tests/support/com_objects.h"
 #include "tests/support/monitor_process.h"
+#include "tests/support/plugs.h"
 
 namespace KelvoUHW {
 
-using TreeState = SingletonState<CZKUMUsbTree, IUnknown>;
-using NotifierState = SingletonState<CZKUMEventNotifier, IUnknown>;
-
-// From its start to its end, at which the module is unloaded and nothing of it may be left. The module's class of the
-// tree is registered with the process, where the notifier finds it.
+// From its start to its end, at which the module is unloaded and nothing of it may be left: many of them, one after the
+// other, live in one program. The class of the tree is the module's own, over `pc`, unless a test registers another
+// one. What a test holds it gives back before the end.
 class ModuleProcess : public MonitorProcess {
  public:
   explicit ModuleProcess(ClockMode mode = ClockMode::Virtual) : MonitorProcess(mode) {
     platform::SetCurrentSystem({.host = &pc, .threads = &desktop, .desktop = &desktop});
+    EXPECT_TRUE(SUCCEEDED(CoInitializeEx(nullptr, COINIT_MULTITHREADED)));
     module.emplace();
     EXPECT_EQ(CurrentModule(), &*module);
-    const ComPtr<IClassFactory> tree = Class(CLSID_ZKUMUsbTree);
-    EXPECT_EQ(CoRegisterClassObject(CLSID_ZKUMUsbTree, tree.Get(), CLSCTX_INPROC_SERVER, 0, &m_cookie), S_OK);
+    UseTreeClass(Class(CLSID_ZKUMUsbTree).Get());
   }
   ~ModuleProcess() {
-    Withdraw();
+    notifier.Reset();
+    point.Reset();
+    UseTreeClass(nullptr);
+    desktop.Settle();
     module->Unload();
+    EXPECT_EQ(g_pNotifyTarget, nullptr);
+    EXPECT_EQ(desktop.Counts().registrations, 0u) << "the notifier lives on";
+    CoUninitialize();
     module.reset();
     EXPECT_EQ(CurrentModule(), nullptr);
     EXPECT_EQ(ModuleLockCount(), 0);
@@ -45,11 +46,12 @@ class ModuleProcess : public MonitorProcess {
     EXPECT_TRUE(pc.Misuses().empty());
   }
 
-  // Takes the class of the tree back from the process, and with it a lock of the module.
-  void Withdraw() {
-    if (m_cookie == 0) return;
-    EXPECT_EQ(CoRevokeClassObject(m_cookie), S_OK);
-    m_cookie = 0;
+  // The class object that creating a tree asks from now on; none for null.
+  void UseTreeClass(IUnknown* classObject) {
+    const DWORD before = std::exchange(m_treeClass, 0);
+    EXPECT_TRUE(before == 0 || CoRevokeClassObject(before) == S_OK);
+    if (classObject == nullptr) return;
+    EXPECT_EQ(CoRegisterClassObject(CLSID_ZKUMUsbTree, classObject, CLSCTX_INPROC_SERVER, 0, &m_treeClass), S_OK);
   }
   ComPtr<IClassFactory> Class(const CLSID& clsid) {
     ComPtr<IClassFactory> factory;
@@ -64,11 +66,31 @@ class ModuleProcess : public MonitorProcess {
     return object;
   }
 
+  // `notifier` and `point` are there from now on.
+  void Start() {
+    notifier = Make<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier);
+    ASSERT_TRUE(notifier);
+    ASSERT_EQ(notifier.As<IConnectionPointContainer>()->FindConnectionPoint(DIID_IZKDeviceEventCallBack, point.Put()),
+              S_OK);
+  }
+  DWORD Advise(IUnknown& sink) {
+    DWORD cookie = 0;
+    EXPECT_EQ(point->Advise(&sink, &cookie), S_OK);
+    return cookie;
+  }
+  // A run on this thread, as an event thread makes it.
+  HRESULT Notify(BYTE fire = TRUE) { return notifier.As<IZKUMPrivateNotifier>()->NotifyDeviceChange(0, fire); }
+  void Do(const std::vector<Change>& changes) {
+    for (const Change& change : changes) ASSERT_EQ(pc.Apply({0, u"", change}), u"");
+  }
+
   platform::simulated::SimulatedPc pc{BarePc()};
   std::optional<CZKUsbMonitorModule> module;
+  ComPtr<IZKUMEventNotifier> notifier;
+  ComPtr<IConnectionPoint> point;
 
  private:
-  DWORD m_cookie = 0;
+  DWORD m_treeClass = 0;
 };
 
 }  // namespace KelvoUHW
