@@ -1,10 +1,6 @@
 // The tree of a real PC, read while each allocation in turn fails: texts with the system's allocator, all else
 // with ours.
-#include <gtest/gtest.h>
-
-#include <algorithm>
-#include <string>
-#include <vector>
+#include <gmock/gmock.h>
 
 #include "platform/simulated/machine_file.h"
 #include "platform/simulated/simulated_pc.h"
@@ -26,10 +22,9 @@ struct Outcome {
 template <class T, class Call>
 Outcome Try(Call call) {
   T* out = Mark<T>();
-  Outcome outcome;
-  outcome.code = call(&out);
-  outcome.cleared = out == nullptr;
-  if (outcome.code == S_OK) LetGo(out);
+  const HRESULT code = call(&out);
+  const Outcome outcome{code, out == nullptr};
+  if (code == S_OK) LetGo(out);
   return outcome;
 }
 
@@ -41,11 +36,9 @@ class ComMemory : public ComObjects {
       nodes.push_back(node);
       return true;
     });
-    for (const NodePtr& node : nodes) m_rings.push_back(node.RingSize());
+    m_rings = Rings();
   }
-  ~ComMemory() override {
-    for (std::size_t i = 0; i < nodes.size(); ++i) EXPECT_EQ(nodes[i].RingSize(), m_rings[i]);
-  }
+  ~ComMemory() override { EXPECT_EQ(Rings(), m_rings); }
 
   // Fails the 1st, 2nd, ... allocation until there is none left; returns how many there were.
   template <class Call>
@@ -53,20 +46,15 @@ class ComMemory : public ComObjects {
     const std::int32_t objects = ModuleLockCount();
     const std::int64_t texts = platform::native::CountBstrs().alive;
     for (std::uint64_t allocation = 1;; ++allocation) {
-      Outcome outcome;
       bool failed = false;
-      {
-        const FailingAllocation failing(allocation);
-        outcome = call();
-        failed = failing.Failed();
-      }
+      const Outcome outcome = WithoutAllocation(allocation, failed, call);
       EXPECT_EQ(ModuleLockCount(), objects) << allocation;
       EXPECT_EQ(platform::native::CountBstrs().alive, texts) << allocation;
       if (!failed) {
         EXPECT_EQ(outcome.code, S_OK);
         return allocation - 1;
       }
-      EXPECT_TRUE(std::count(codes.begin(), codes.end(), outcome.code)) << allocation << CodeName(outcome.code);
+      EXPECT_THAT(codes, testing::Contains(outcome.code)) << allocation;
       EXPECT_TRUE(outcome.cleared) << allocation;
       if (HasFailure()) return 0;
     }
@@ -78,6 +66,11 @@ class ComMemory : public ComObjects {
   std::vector<NodePtr> nodes;
 
  private:
+  std::vector<std::size_t> Rings() const {
+    std::vector<std::size_t> sizes;
+    for (const NodePtr& node : nodes) sizes.push_back(node.RingSize());
+    return sizes;
+  }
   std::vector<std::size_t> m_rings;
 };
 
@@ -105,12 +98,10 @@ TEST_F(ComMemory, ListsAndCollectionsOfEveryNode) {
     failures += FailEach({E_POINTER, E_OUTOFMEMORY}, [&] {
       return Try<IZKUMUsbTreeNodeEnumerator>([&](auto out) { return object->get_Childs(out); });
     });
-    if (node->m_nType == KUDTPortDevice) {
-      failures += failCollection(node, &Read<&IZKUMPortDevice::get_InterfaceDescriptors>);
-    }
-    if (node->m_nType == KUDTInterfaceDevice) {
-      failures += failCollection(node, &Read<&IZKUMInterfaceDevice::get_MountPoints>);
-    }
+    failures +=
+        node->m_nType == KUDTPortDevice        ? failCollection(node, &Read<&IZKUMPortDevice::get_InterfaceDescriptors>)
+        : node->m_nType == KUDTInterfaceDevice ? failCollection(node, &Read<&IZKUMInterfaceDevice::get_MountPoints>)
+                                               : 0;
   }
   EXPECT_GT(failures, 2 * all.size());
 }
@@ -134,16 +125,13 @@ TEST_F(ComObjects, SearchWithoutMemory) {
   const SampleTree sample;
   const auto root = Wrap(sample.root);
   const auto searcher = Wrap(sample.device).As<IZKUMPortDevice>();
-  HRESULT result = E_FAIL;
   std::uint64_t allocation = 0;
-  while (result != S_OK) {
+  for (bool failed = true; failed;) {
     IZKUMUsbTreeNode* found = Mark<IZKUMUsbTreeNode>();
     const std::int32_t objects = ModuleLockCount();
-    {
-      const FailingAllocation failing(++allocation);
-      result = searcher->get_FirstChildOfType(root.Get(), KUDTInterfaceDevice, &found);
-      ASSERT_EQ(failing.Failed(), result != S_OK) << allocation;
-    }
+    const HRESULT result = WithoutAllocation(
+        ++allocation, failed, [&] { return searcher->get_FirstChildOfType(root.Get(), KUDTInterfaceDevice, &found); });
+    ASSERT_EQ(failed, result != S_OK) << allocation;
     ASSERT_TRUE(result == S_OK || result == S_FALSE || result == E_OUTOFMEMORY) << CodeName(result);
     ASSERT_EQ(found == Mark<IZKUMUsbTreeNode>(), result != S_OK);
     if (result == S_OK) found->Release();

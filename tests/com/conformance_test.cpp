@@ -1,9 +1,7 @@
 // What COM asks of every object: which interfaces it answers for, one identity, exact reference counts, and
 // methods in their published slots.
-#include <gtest/gtest.h>
-
+#include <fstream>
 #include <functional>
-#include <string>
 
 #include "tests/support/com_objects.h"
 #include "tests/support/desk_pc.h"
@@ -12,54 +10,44 @@
 namespace KelvoUHW {
 namespace {
 
-// The identifiers as they are published, and not those of the header.
 struct InterfaceRow {
-  const char* name;
-  const char16_t* iid;
+  std::string name;
+  IID iid;
 };
-const InterfaceRow kInterfaces[] = {{"IUnknown", u"{00000000-0000-0000-C000-000000000046}"},
-                                    {"IDispatch", u"{00020400-0000-0000-C000-000000000046}"},
-                                    {"IEnumVARIANT", u"{00020404-0000-0000-C000-000000000046}"},
-                                    {"ISupportErrorInfo", u"{DF0B3D60-548F-101B-8E65-08002B2BD119}"},
-                                    {"IConnectionPointContainer", u"{B196B284-BAB4-101A-B69C-00AA00341D07}"},
-                                    {"IZKUMEventNotifier", u"{565B8FB4-EE30-4EE3-9B5B-E285678F1F9D}"},
-                                    {"IZKUMDeviceEvent", u"{931F33F5-525B-4613-A5A7-D0E28115DD9A}"},
-                                    {"IZKUMUsbTreeNode", u"{8080AF8D-857A-45C4-8296-AB1301ADFA28}"},
-                                    {"IZKUMUsbTreeNodeEnumerator", u"{904023D8-3EB6-4079-B062-45C68095682E}"},
-                                    {"IZKUMUsbDevice", u"{5B584C94-8FB4-4647-AFE6-879085600DBF}"},
-                                    {"IZKUMHostController", u"{DFDABA17-D518-42A6-81DE-C90C8EC32BCF}"},
-                                    {"IZKUMHubDevice", u"{92A25D95-3963-45EF-895F-EA42B4DD37AA}"},
-                                    {"IZKUMHubPort", u"{A49B9696-751E-4402-A733-3AD46F48A5A0}"},
-                                    {"IZKUMPortDevice", u"{E5E8F6BE-7753-4041-880B-16D31F61397E}"},
-                                    {"IZKUMInterfaceDescr", u"{D107033F-3A53-4406-AF19-13543470DDB2}"},
-                                    {"IZKUMInfoDevice", u"{F089A5D3-01B2-4B44-817B-200F94489BBD}"},
-                                    {"IZKUMInterfaceDevice", u"{B67689B6-7C60-465C-A541-9878368A6AE5}"},
-                                    {"IZKUMUsbTree", u"{236C9B37-B991-48C2-B14A-340A28638282}"},
-                                    {"IZKDeviceEventCallBack", u"{8C4D3DF5-889F-434C-BA1C-22F23FD7CB1B}"},
-                                    {"IBuildUsbTree", u"{D3A5B9E2-4C71-4F0A-9E26-81B7C05F3A94}"},
-                                    {"IZKUMPrivateNotifier", u"{6E0F2C8B-93D4-4B57-A1E8-5C2D7B90F416}"},
-                                    {"one of nobody", u"{12345678-9ABC-DEF0-1234-56789ABCDEF0}"}};
 
-IID IidOfRow(const InterfaceRow& row) { return platform::ToSystemGuid(ParseGuidText(row.iid)); }
+// The identifiers as they are published, and not those of the header; the first is that of IUnknown, the last one
+// nobody's.
+const std::vector<InterfaceRow>& Interfaces() {
+  static const std::vector<InterfaceRow> rows = [] {
+    std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/interface-ids.txt");
+    std::vector<InterfaceRow> read;
+    for (std::string iid, name; file >> iid && std::getline(file >> std::ws, name);) {
+      read.push_back({name, platform::ToSystemGuid(ParseGuidText(platform::FromUtf8(iid).c_str()))});
+    }
+    EXPECT_EQ(read.size(), 22u);
+    return read;
+  }();
+  return rows;
+}
 
 // The names of the interfaces that a pointer answers for; the pointers go to `found`.
 std::string Answers(IUnknown* pointer, IUnknown* identity, std::vector<ComPtr<IUnknown>>* found) {
   std::string names;
-  for (const InterfaceRow& row : kInterfaces) {
+  for (const auto& [name, iid] : Interfaces()) {
     const ULONG before = References(pointer);
     void* out = Mark<void>();
-    const HRESULT result = pointer->QueryInterface(IidOfRow(row), &out);
-    EXPECT_EQ(References(pointer), before + (result == S_OK ? 1 : 0)) << row.name;
+    const HRESULT result = pointer->QueryInterface(iid, &out);
+    EXPECT_EQ(References(pointer), before + (result == S_OK ? 1 : 0)) << name;
     if (result == S_OK) {
       auto answered = ComPtr<IUnknown>::Attach(static_cast<IUnknown*>(out));
-      EXPECT_TRUE(row.iid != kInterfaces[0].iid || answered.Get() == identity);
-      names += (names.empty() ? "" : " ") + std::string(row.name);
+      EXPECT_TRUE(iid != Interfaces()[0].iid || answered.Get() == identity);
+      names += (names.empty() ? "" : " ") + name;
       if (found) found->push_back(std::move(answered));
     } else {
-      EXPECT_EQ(result, E_NOINTERFACE) << row.name;
-      EXPECT_EQ(out, nullptr) << row.name;
+      EXPECT_EQ(result, E_NOINTERFACE) << name;
+      EXPECT_EQ(out, nullptr) << name;
     }
-    EXPECT_EQ(pointer->QueryInterface(IidOfRow(row), nullptr), E_POINTER) << row.name;
+    EXPECT_EQ(pointer->QueryInterface(iid, nullptr), E_POINTER) << name;
   }
   return names;
 }
@@ -129,33 +117,30 @@ struct AnyOut {
 
 TEST_F(Conformance, WhatIsHandedOutCarriesOneReferenceOfTheCallers) {
   IZKUMUsbTree* const query = desk.tree.Get();
+  const auto port = device.As<IZKUMPortDevice>();
+  const auto volume = disk.As<IZKUMInterfaceDevice>();
   VARIANT_BOOL more = VARIANT_FALSE;
   ASSERT_EQ(nodes->MoveNext(&more), S_OK);
   const struct {
     const char* what;
     IUnknown* callee;
     std::function<HRESULT(AnyOut)> call;
-    ULONG references;  // 2: the list has one of its own
+    ULONG references = 1;
   } rows[] = {
-      {"Childs", device.Get(), [&](AnyOut out) { return device->get_Childs(out); }, 1},
+      {"Childs", device.Get(), [&](AnyOut out) { return device->get_Childs(out); }},
       {"InSubtreeDevicesOfType", device.Get(),
-       [&](AnyOut out) { return device->get_InSubtreeDevicesOfType(KUDTPortDevice, out); }, 1},
+       [&](AnyOut out) { return device->get_InSubtreeDevicesOfType(KUDTPortDevice, out); }},
       {"FirstChildOfType", device.Get(),
-       [&](AnyOut out) {
-         return device.As<IZKUMPortDevice>()->get_FirstChildOfType(device.Get(), KUDTInterfaceDevice, out);
-       },
-       1},
-      {"InterfaceDescriptors", device.Get(),
-       [&](AnyOut out) { return device.As<IZKUMPortDevice>()->get_InterfaceDescriptors(out); }, 1},
-      {"MountPoints", disk.Get(), [&](AnyOut out) { return disk.As<IZKUMInterfaceDevice>()->get_MountPoints(out); }, 1},
-      {"GetCurrent", nodes.Get(), [&](AnyOut out) { return nodes->GetCurrent(out); }, 2},
-      {"Clone", descriptors.Get(), [&](AnyOut out) { return descriptors->Clone(out); }, 1},
-      {"RootNode", query, [&](AnyOut out) { return query->get_RootNode(out); }, 1},
-      {"PortDevicesWithVendorId", query, [&](AnyOut out) { return query->get_PortDevicesWithVendorId(0x0781, out); },
-       1},
-      {"VendorProductDevices", query, [&](AnyOut out) { return query->get_VendorProductDevices(0x0781, 0x5567, out); },
-       1},
-      {"PortDevicesWithVolume", query, [&](AnyOut out) { return query->get_PortDevicesWithVolume(out); }, 1},
+       [&](AnyOut out) { return port->get_FirstChildOfType(device.Get(), KUDTInterfaceDevice, out); }},
+      {"InterfaceDescriptors", device.Get(), [&](AnyOut out) { return port->get_InterfaceDescriptors(out); }},
+      {"MountPoints", disk.Get(), [&](AnyOut out) { return volume->get_MountPoints(out); }},
+      {"GetCurrent", nodes.Get(), [&](AnyOut out) { return nodes->GetCurrent(out); },
+       2},  // the list has one of its own
+      {"Clone", descriptors.Get(), [&](AnyOut out) { return descriptors->Clone(out); }},
+      {"RootNode", query, [&](AnyOut out) { return query->get_RootNode(out); }},
+      {"PortDevicesWithVendorId", query, [&](AnyOut out) { return query->get_PortDevicesWithVendorId(0x0781, out); }},
+      {"VendorProductDevices", query, [&](AnyOut out) { return query->get_VendorProductDevices(0x0781, 0x5567, out); }},
+      {"PortDevicesWithVolume", query, [&](AnyOut out) { return query->get_PortDevicesWithVolume(out); }},
   };
   for (const auto& row : rows) {
     const ULONG before = References(row.callee);

@@ -1,9 +1,7 @@
 // The two kinds of lists: nodes, and values.
-#include <gtest/gtest.h>
-
 #include <array>
 #include <memory>
-#include <string>
+#include <sstream>
 
 #include "com/node_enumerator.h"
 #include "com/variant_enumerator.h"
@@ -138,41 +136,30 @@ class Collection : public ComObjects {
 };
 
 TEST_F(Collection, NextSkipResetAndCloneInTurn) {
-  const struct {
-    char step;  // N(ext), S(kip), R(eset), C(lone): go on with the clone
-    ULONG count;
-    const char* expected;
-  } rows[] = {{'N', 0, "S_OK 0:"},
-              {'N', 1, "S_OK 1: a"},
-              {'N', 5, "S_FALSE 2: b c"},
-              {'N', 1, "S_FALSE 0:"},
-              {'S', 0, "S_OK"},
-              {'S', 1, "S_FALSE"},
-              {'R', 0, "S_OK"},
-              {'N', 3, "S_OK 3: a b c"},
-              {'R', 0, "S_OK"},
-              {'S', 1, "S_OK"},
-              {'N', 1, "S_OK 1: b"},
-              {'C', 0, "S_OK"},
-              {'N', 1, "S_OK 1: c"},
-              {'C', 0, "S_OK"},
-              {'N', 1, "S_FALSE 0:"},
-              {'R', 0, "S_OK"},
-              {'S', 0xFFFFFFFF, "S_FALSE"},
-              {'N', 1, "S_FALSE 0:"}};
+  // n(ext) and s(kip) with their count, r(eset), c(lone): go on with the clone.
+  const std::pair<const char*, const char*> rows[] = {
+      {"n0 n1 n5 n1", "S_OK 0:, S_OK 1: a, S_FALSE 2: b c, S_FALSE 0:"},
+      {"s0 s1 r n3", "S_OK, S_FALSE, S_OK, S_OK 3: a b c"},
+      {"r s1 n1 c n1", "S_OK, S_OK, S_OK 1: b, S_OK, S_OK 1: c"},
+      {"c n1 r s4294967295 n1", "S_OK, S_FALSE 0:, S_OK, S_FALSE, S_FALSE 0:"}};
   auto list = Make(&items);
-  for (const auto& row : rows) {
+  for (const auto& [steps, expected] : rows) {
     std::string outcome;
-    if (row.step == 'N') outcome = Next(list.Get(), row.count);
-    if (row.step == 'S') outcome = CodeName(list->Skip(row.count));
-    if (row.step == 'R') outcome = CodeName(list->Reset());
-    if (row.step == 'C') {
-      ComPtr<IEnumVARIANT> clone;
-      outcome = CodeName(list->Clone(clone.Put()));
-      list->Skip(9);  // which the clone does not notice
-      list = clone;
+    std::istringstream words(steps);
+    for (std::string step; words >> step;) {
+      const auto count = static_cast<ULONG>(step.size() > 1 ? std::stoul(step.substr(1)) : 0);
+      outcome += outcome.empty() ? "" : ", ";
+      if (step[0] == 'n') outcome += Next(list.Get(), count);
+      if (step[0] == 's') outcome += CodeName(list->Skip(count));
+      if (step[0] == 'r') outcome += CodeName(list->Reset());
+      if (step[0] == 'c') {
+        ComPtr<IEnumVARIANT> clone;
+        outcome += CodeName(list->Clone(clone.Put()));
+        list->Skip(9);  // which the clone does not notice
+        list = clone;
+      }
     }
-    EXPECT_EQ(outcome, row.expected) << (&row - rows);
+    EXPECT_EQ(outcome, expected) << steps;
   }
   EXPECT_EQ(owner.references, 2u) << "the clone keeps the owner, and nobody else does";
   list.Reset();
@@ -192,14 +179,12 @@ TEST_F(Collection, RefusesWhatItCannotDo) {
   EXPECT_EQ(list->Clone(nullptr), E_POINTER);
   EXPECT_EQ(MakeVariantEnum(nullptr, nullptr, &items), E_POINTER);
 
-  auto* made = Mark<IEnumVARIANT>();
-  FailCriticalSection(1, E_ACCESSDENIED);
-  EXPECT_EQ(list->Clone(&made), E_ACCESSDENIED);
-  EXPECT_EQ(made, nullptr);
-  FailCriticalSection(1, E_ACCESSDENIED);
-  made = Mark<IEnumVARIANT>();
-  EXPECT_EQ(MakeVariantEnum(&made, nullptr, &items), E_ACCESSDENIED);
-  EXPECT_EQ(made, nullptr);
+  for (const bool clone : {true, false}) {
+    auto* made = Mark<IEnumVARIANT>();
+    FailCriticalSection(1, E_ACCESSDENIED);
+    EXPECT_EQ(clone ? list->Clone(&made) : MakeVariantEnum(&made, nullptr, &items), E_ACCESSDENIED);
+    EXPECT_EQ(made, nullptr);
+  }
 
   const auto without = Make(nullptr);
   EXPECT_EQ(Next(without.Get(), 1), "E_FAIL 0:");

@@ -1,10 +1,7 @@
 // IZKUMPortDevice::FirstChildOfType, over the component's nodes and over nodes of a client's own.
 #include "com/first_child.h"
 
-#include <gtest/gtest.h>
-
 #include <new>
-#include <string>
 
 #include "tests/support/client_node.h"
 #include "tests/support/com_objects.h"

@@ -1,9 +1,7 @@
 // What clients see of whole PCs: every property of every node, the queries, trees that were replaced.
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <filesystem>
-#include <fstream>
 #include <iterator>
 #include <set>
 #include <string>
@@ -44,6 +42,12 @@ class Facts {
  public:
   void operator()(const char* name, HRESULT result, std::u16string_view value) { Add(name, result, ToUtf8(value)); }
   void operator()(const char* name, HRESULT result, std::int64_t value) { Add(name, result, std::to_string(value)); }
+  // A name, its value, the next name, its value, ...
+  template <class Value, class... More>
+  void All(HRESULT result, const char* name, const Value& value, const More&... more) {
+    (*this)(name, result, value);
+    if constexpr (sizeof...(more) != 0) All(result, more...);
+  }
   const std::string& Text() const { return m_text; }
 
  private:
@@ -57,38 +61,27 @@ void DescribeInfo(const CZKUMInfoDeviceImpl* info, Facts& facts) {
   static const CZKUMInfoDeviceImpl kNone;
   const HRESULT result = info ? S_OK : E_FAIL;
   const CZKUMInfoDeviceImpl& record = info ? *info : kNone;
-  facts("Service", result, record.Service);
-  facts("FriendlyName", result, record.FriendlyName);
-  facts("Location", result, record.Location);
-  facts("Manufacturer", result, record.Manufacturer);
-  facts("HardwareId", result, record.HardwareId);
-  facts("PhysicalName", result, record.PhysicalName);
-  facts("DevClass", result, record.DevClass);
-  facts("EnumName", result, record.EnumName);
-  facts("ClassGuid", result, platform::GuidText(record.ClassGuid));
+  facts.All(result, "Service", record.Service, "FriendlyName", record.FriendlyName, "Location", record.Location,
+            "Manufacturer", record.Manufacturer, "HardwareId", record.HardwareId, "PhysicalName", record.PhysicalName,
+            "DevClass", record.DevClass, "EnumName", record.EnumName, "ClassGuid",
+            platform::GuidText(record.ClassGuid));
 }
 
 void DescribePortDevice(const CZKUMPortDeviceImpl& record, Facts& facts) {
-  facts("Product", S_OK, record.m_strUsbProduct);
-  facts("Manufacturer1", S_OK, record.m_strUsbManufacturer);
-  facts("Speed", S_OK, record.Speed());
-  facts("NumberInterfaces", S_OK, record.NumberInterfaces());
+  facts.All(S_OK, "Product", record.m_strUsbProduct, "Manufacturer1", record.m_strUsbManufacturer, "Speed",
+            record.Speed(), "NumberInterfaces", record.NumberInterfaces());
   for (const InterfaceEntryPtr& entry : record.m_interfaceDescrs) {
-    facts("InterfaceClass", S_OK, entry->Descriptor.at(5));
-    facts("InterfaceSubClass", S_OK, entry->Descriptor.at(6));
-    facts("InterfaceProtocol", S_OK, entry->Descriptor.at(7));
+    facts.All(S_OK, "InterfaceClass", entry->Descriptor.at(5), "InterfaceSubClass", entry->Descriptor.at(6),
+              "InterfaceProtocol", entry->Descriptor.at(7));
   }
   facts("InterfaceDescriptors", S_OK, u"");
   DescribeInfo(static_cast<const CZKUMInfoDeviceImpl*>(record.m_infoDevice.Get()), facts);
 }
 
 void DescribeInterfaceDevice(const CZKUMInterfaceDeviceImpl& record, Facts& facts) {
-  facts("VolumeName", S_OK, record.VolumeName);
-  facts("VendorId", S_OK, record.StorageVendorId);
-  facts("ProductId", S_OK, record.StorageProductId);
-  facts("ProductRev", S_OK, record.ProductRev);
-  facts("DevicePath", S_OK, record.DevicePath());
-  facts("MountPoint", S_OK, record.MountPoint());
+  facts.All(S_OK, "VolumeName", record.VolumeName, "VendorId", record.StorageVendorId, "ProductId",
+            record.StorageProductId, "ProductRev", record.ProductRev, "DevicePath", record.DevicePath(), "MountPoint",
+            record.MountPoint());
   for (const std::u16string& mountPoint : record.MountPoints) facts("one of MountPoints", S_OK, mountPoint);
   facts("MountPoints", S_OK, u"");
 }
@@ -96,25 +89,20 @@ void DescribeInterfaceDevice(const CZKUMInterfaceDeviceImpl& record, Facts& fact
 std::string Describe(const NodePtr& node) {
   Facts facts;
   const TUsbDeviceType kind = node->m_nType;
-  facts("InstanceId", S_OK, node->m_strDevInstId);
-  facts("Type", S_OK, kind);
-  facts("Description", S_OK, node->m_strDeviceDescr);
-  facts("SerialNumber", S_OK, node->m_strSerialNumber);
-  facts("VendorId", S_OK, static_cast<std::int32_t>(node->m_nVendorId));
-  facts("ProductId", S_OK, static_cast<std::int32_t>(node->m_nProductId));
-  facts("DriverKeyName", S_OK, node->m_strDriverKeyName);
-  facts("Vendor", S_OK, node->m_strVendor);
-  facts("Product", S_OK,
-        kind == KUDTPortDevice ? node.StaticCast<CZKUMPortDeviceImpl>()->m_strUsbProduct : node->m_strProduct);
+  const auto device = kind == KUDTPortDevice ? node.StaticCast<CZKUMPortDeviceImpl>() : nullptr;
+  facts.All(S_OK, "InstanceId", node->m_strDevInstId, "Type", kind, "Description", node->m_strDeviceDescr,
+            "SerialNumber", node->m_strSerialNumber, "VendorId", static_cast<std::int32_t>(node->m_nVendorId),
+            "ProductId", static_cast<std::int32_t>(node->m_nProductId), "DriverKeyName", node->m_strDriverKeyName,
+            "Vendor", node->m_strVendor, "Product", device ? device->m_strUsbProduct : node->m_strProduct);
   if (kind == KUDTHostController) {
     facts("LeafName", S_OK, node.StaticCast<CZKUMHostControllerImpl>()->m_strLeafName);
   } else if (kind == KUDTHub) {
-    facts("PathName", S_OK, node.StaticCast<CZKUMHubDeviceImpl>()->m_strPathName);
-    facts("ConnectionName", S_OK, node.StaticCast<CZKUMHubDeviceImpl>()->m_strConnectionName);
+    const auto hub = node.StaticCast<CZKUMHubDeviceImpl>();
+    facts.All(S_OK, "PathName", hub->m_strPathName, "ConnectionName", hub->m_strConnectionName);
   } else if (kind == KUDTHubPort) {
     facts("PortIndex", S_OK, node.StaticCast<CZKUMHubPortImpl>()->m_nPortIndex);
   } else if (kind == KUDTPortDevice) {
-    DescribePortDevice(*node.StaticCast<CZKUMPortDeviceImpl>(), facts);
+    DescribePortDevice(*device, facts);
   } else if (kind == KUDTInfoDevice) {
     DescribeInfo(node.StaticCast<CZKUMInfoDeviceImpl>().Get(), facts);
   } else if (kind == KUDTInterfaceDevice) {
@@ -223,16 +211,8 @@ TEST(Machines, ClientsSeeWhatTheRecordsHold) {
     // A builder of its own over the same PC makes the same tree of records.
     CZKUMUsbTreeBuilder model(desk.pc);
     ASSERT_TRUE(model.Build());
-    const Node root = desk.Root();
-    nodes += CompareNodes(root, model.Root());
+    nodes += CompareNodes(desk.Root(), model.Root());
     CompareQueries(*desk.tree.Get(), model.Root());
-
-    std::ifstream stream(ZKUSB_SOURCE_DIR "/tests/golden/" + std::string(name) + ".txt", std::ios::binary);
-    const std::string golden{std::istreambuf_iterator<char>(stream), {}};
-    const std::string dump = ToUtf8(testing_support::DumpOf(root));
-    ASSERT_FALSE(golden.empty()) << name;
-    EXPECT_TRUE(dump == golden) << name << " differs from byte "
-                                << std::ranges::mismatch(dump, golden).in1 - dump.begin();
     ASSERT_FALSE(HasFailure()) << name;
   }
   EXPECT_GE(nodes, 200u);

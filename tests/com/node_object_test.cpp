@@ -1,11 +1,7 @@
 // The properties of node objects: each one's value, and what it answers without out pointer, record or memory.
 #include "com/node_object.h"
 
-#include <gtest/gtest.h>
-
 #include <map>
-#include <string>
-#include <vector>
 
 #include "tests/support/com_objects.h"
 
@@ -20,22 +16,19 @@ struct TextRules {
   const char* noRecord;
   const char* noRecordNullOut;
 };
+constexpr char kRaised[] = "raised E_OUTOFMEMORY null", kNoMemory[] = "E_OUTOFMEMORY null";
 // The text is made before the out pointer is looked at, the record is asked for before both.
-constexpr TextRules kBase = {"raised E_OUTOFMEMORY null", "E_OUTOFMEMORY null", "raised E_OUTOFMEMORY", "E_FAIL null",
-                             "E_FAIL"};
+constexpr TextRules kBase = {kRaised, kNoMemory, "raised E_OUTOFMEMORY", "E_FAIL null", "E_FAIL"};
 // The typed record is not tested.
-constexpr TextRules kTyped = {"raised E_OUTOFMEMORY null", "E_OUTOFMEMORY null", "raised E_OUTOFMEMORY", nullptr,
-                              nullptr};
+constexpr TextRules kTyped = {kRaised, kNoMemory, "raised E_OUTOFMEMORY", nullptr, nullptr};
 // Nothing is read for a null out pointer.
-constexpr TextRules kSerialNumber = {"raised E_OUTOFMEMORY null", "E_OUTOFMEMORY null", "E_POINTER", "E_FAIL null",
-                                     "E_POINTER"};
+constexpr TextRules kSerialNumber = {kRaised, kNoMemory, "E_POINTER", "E_FAIL null", "E_POINTER"};
 // Out of memory is not noticed.
 constexpr TextRules kUntested = {"S_OK null", nullptr, "E_POINTER", "E_POINTER null", "E_POINTER"};
 
 struct TextRow {
   const char* name;
-  TextProperty property;
-  TextProperty bySlot;             // the method in its published place
+  TextProperty property, bySlot;   // bySlot: the method in its published place
   std::vector<const char*> kinds;  // of the sample tree
   TextRules rules;
   const char* source;  // whose text it is, where not the object's own
@@ -106,9 +99,7 @@ void CheckText(TextProperty property, IUnknown* object, const TextRules& rules, 
 class NodeObject : public ComObjects {
  protected:
   NodeObject() {
-    for (const NodePtr& node : sample.Nodes()) {
-      objects.emplace(SampleTree::NameOf(node->m_nType), Wrap(node));
-    }
+    for (const NodePtr& node : sample.Nodes()) objects.emplace(SampleTree::NameOf(node->m_nType), Wrap(node));
     ComObject<CZKUMUsbTreeNode>* created = nullptr;
     EXPECT_EQ(ComObject<CZKUMUsbTreeNode>::Create(created), S_OK);
     empty = ComPtr<IZKUMUsbTreeNode>::Attach(created);

@@ -1,15 +1,9 @@
 // Clients on threads of their own read and release while builds replace the tree. Made for the thread sanitizer.
-#include <gtest/gtest.h>
-
 #include <array>
 #include <atomic>
-#include <cstddef>
-#include <string_view>
 #include <thread>
-#include <vector>
 
 #include "tests/support/desk_pc.h"
-#include "tests/support/object_reader.h"
 #include "tests/support/tree_desk.h"
 
 namespace KelvoUHW {

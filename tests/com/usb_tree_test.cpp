@@ -1,14 +1,10 @@
 #include "com/usb_tree.h"
 
-#include <gtest/gtest.h>
-
-#include <cstdint>
 #include <functional>
 #include <limits>
 #include <set>
-#include <string>
-#include <vector>
 
+#include "tests/support/com_objects.h"
 #include "tests/support/desk_pc.h"
 #include "tests/support/tree_desk.h"
 
@@ -96,14 +92,6 @@ std::string Lists(const TreeDesk& desk) {
   return text;
 }
 
-std::string CodeName(HRESULT code) { return platform::ToUtf8(platform::Hex(static_cast<std::uint32_t>(code), 8)); }
-
-// No object can be at this address.
-template <class T>
-T* Mark() {
-  return reinterpret_cast<T*>(std::uintptr_t{1});
-}
-
 TEST(UsbTree, BeforeTheFirstBuildThereIsNothing) {
   TreeDesk desk(QueriedPc());
   auto* root = Mark<IZKUMUsbTreeNode>();
@@ -122,11 +110,7 @@ TEST(UsbTree, BeforeTheFirstBuildThereIsNothing) {
 TEST(UsbTree, QueriesFindPortDevicesInTheOrderOfTheTree) {
   TreeDesk desk(QueriedPc());
   ASSERT_EQ(desk.Rebuild(), S_OK);
-  const struct {
-    const char* what;
-    Query query;
-    const char* names;
-  } cases[] = {
+  const std::tuple<const char*, Query, const char*> cases[] = {
       {"behind one hub and behind two", kMice, "M2 M1"},
       {"a product of several", kMouse, "M2"},
       {"another vendor's product", OfProduct(0x0781, 0xC31C), ""},
@@ -144,15 +128,16 @@ TEST(UsbTree, QueriesFindPortDevicesInTheOrderOfTheTree) {
 TEST(UsbTree, EachQueryMakesObjectsOfItsOwn) {
   TreeDesk desk(QueriedPc());
   ASSERT_EQ(desk.Rebuild(), S_OK);
-  std::vector<ComPtr<IZKUMUsbTreeNode>> mice;
+  std::vector<ComPtr<IZKUMUsbTreeNode>> objects{desk.Root()};
   for (const Query& query : {kMouse, kMouse, kMice}) {
     Nodes nodes;
     ASSERT_EQ(query(*desk.tree.Get(), nodes.Put()), S_OK);
-    ForEachNode(*nodes.Get(), [&](HRESULT, const ComPtr<IZKUMUsbTreeNode>& node) { mice.push_back(node); });
+    ForEachNode(*nodes.Get(), [&](HRESULT, const ComPtr<IZKUMUsbTreeNode>& node) { objects.push_back(node); });
   }
-  ASSERT_EQ(mice.size(), 4u);
-  EXPECT_EQ(std::set<IUnknown*>({mice[0].Get(), mice[1].Get(), mice[2].Get(), mice[3].Get(), desk.Root().Get()}).size(),
-            5u);
+  EXPECT_EQ(objects.size(), 5u);
+  std::set<IUnknown*> different;
+  for (const auto& object : objects) different.insert(object.Get());
+  EXPECT_EQ(different.size(), 5u);
 }
 
 // Objects that cannot be made are missing from the list of the volume query, and stand in that of an id query as
@@ -163,13 +148,8 @@ TEST(UsbTree, QueriesWithoutAnObjectOrMemory) {
   bool failed = false;
   const auto ask = [&](const Query& query, std::uint64_t object, std::uint64_t allocation) {
     auto* list = Mark<IZKUMUsbTreeNodeEnumerator>();
-    HRESULT result = S_OK;
     platform::native::FailCriticalSection(object, E_ACCESSDENIED);
-    {
-      const FailingAllocation failing(allocation);
-      result = query(*desk.tree.Get(), &list);
-      failed = failing.Failed();
-    }
+    const HRESULT result = WithoutAllocation(allocation, failed, [&] { return query(*desk.tree.Get(), &list); });
     platform::native::FailCriticalSection(0, S_OK);
     const Nodes nodes = Nodes::Attach(list);
     EXPECT_TRUE(result == S_OK || !nodes) << "a list with a failure";
@@ -244,10 +224,8 @@ TEST(UsbTree, ABuildWithoutMemoryLeavesTheTreeAndIsOwed) {
   ASSERT_EQ(desk.Rebuild(), S_OK);
   desk.Do(Mouse(u"M1", 2, kRootHubId, 0xC077));
   for (const std::uint64_t allocation : {1u, 50u, 200u}) {
-    {
-      const FailingAllocation failing(allocation);
-      EXPECT_EQ(desk.build->BuildTree(), E_OUTOFMEMORY);
-    }
+    bool failed = false;
+    EXPECT_EQ(WithoutAllocation(allocation, failed, [&] { return desk.build->BuildTree(); }), E_OUTOFMEMORY);
     EXPECT_EQ(Lists(desk), "S1 | S1 | - | -");
     EXPECT_EQ(Found(desk, kMice), "");
   }
@@ -259,12 +237,7 @@ TEST(UsbTree, ABuildWithoutMemoryLeavesTheTreeAndIsOwed) {
 HRESULT CreateWithout(const platform::System& system, std::uint64_t allocation, bool& failed) {
   platform::SetCurrentSystem(system);
   auto* tree = Mark<ComObject<CZKUMUsbTree>>();
-  HRESULT result = S_OK;
-  {
-    const FailingAllocation failing(allocation);
-    result = ComObject<CZKUMUsbTree>::Create(tree);
-    failed = failing.Failed();
-  }
+  const HRESULT result = WithoutAllocation(allocation, failed, [&] { return ComObject<CZKUMUsbTree>::Create(tree); });
   EXPECT_EQ(tree == nullptr, FAILED(result));
   if (tree) {
     EXPECT_EQ(tree->Release(), 0u);

@@ -26,21 +26,12 @@ using testing_support::CountingSink;
 constexpr HRESULT kNoResources = platform::native::ToHresult(0x800705AA);
 constexpr CLSID kUnknownClass{0x11111111, 1, 1, {1}};
 constexpr CLSID kInterfaceTableClass{0x00000323, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
+constexpr IID kInterfaceTable{0x00000146, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
 
-// A class object and an object in one: creates itself, and offers IClassFactory and one interface more.
-class FakeClass final : public IClassFactory {
- public:
-  explicit FakeClass(const IID& offered) : m_offered(offered) {
-    EXPECT_EQ(CoRegisterClassObject(m_offered == IZKUMUsbTree::kIid ? CLSID_ZKUMUsbTree : kInterfaceTableClass, this,
-                                    CLSCTX_INPROC_SERVER, 0, &m_cookie),
-              S_OK);
-  }
-  ~FakeClass() {
-    EXPECT_EQ(CoRevokeClassObject(m_cookie), S_OK);
-    EXPECT_EQ(references, 1u);
-  }
+// The table of the process and its class object in one.
+struct FakeTable final : IClassFactory {
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
-    const bool known = iid == IUnknown::kIid || iid == IClassFactory::kIid || iid == m_offered;
+    const bool known = iid == IUnknown::kIid || iid == IClassFactory::kIid || iid == kInterfaceTable;
     *out = known ? this : nullptr;
     if (known) AddRef();
     return known ? S_OK : E_NOINTERFACE;
@@ -55,10 +46,6 @@ class FakeClass final : public IClassFactory {
 
   ULONG references = 1;
   int created = 0;
-
- private:
-  const IID m_offered;
-  DWORD m_cookie = 0;
 };
 
 bool HasInstance(const CLSID& clsid) {
@@ -183,20 +170,6 @@ TEST(ClassObjects, LeaveNothingOfAHalfBuiltObject) {
   }
 }
 
-TEST(ClassObjects, TearTheMonitorDownWhenTheTreeCannotBuild) {
-  ModuleProcess process;
-  process.UseTreeClass(nullptr);
-  FakeClass tree(IZKUMUsbTree::kIid);
-  EXPECT_FALSE(process.Make<IUnknown>(CLSID_ZKUMEventNotifier, E_NOINTERFACE));
-  EXPECT_EQ(tree.created, 1);
-  EXPECT_FALSE(HasInstance(CLSID_ZKUMEventNotifier));
-  EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), 1u);
-  EXPECT_EQ(process.desktop.Counts().registrations, 0u);
-  EXPECT_EQ(g_pActiveReceiver, nullptr);
-  EXPECT_EQ(g_pNotifyTarget, nullptr);
-  EXPECT_EQ(ModuleLockCount(), 0);
-}
-
 TEST(ClassObjects, AreCachedAndLockTheModuleWhileAClientHoldsThem) {
   ModuleProcess process;
   process.UseTreeClass(nullptr);
@@ -291,7 +264,9 @@ TEST(Module, KeepsTheOrderOfItsVirtualOperations) {
 }
 
 TEST(Module, KeepsTheInterfaceTableOfTheProcess) {
-  FakeClass table({0x00000146, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}});
+  FakeTable table;
+  DWORD cookie = 0;
+  ASSERT_EQ(CoRegisterClassObject(kInterfaceTableClass, &table, CLSCTX_INPROC_SERVER, 0, &cookie), S_OK);
   CZKUsbMonitorModule module;
   EXPECT_EQ(module.GetGlobalInterfaceTable(nullptr), E_POINTER);
   for (int call = 0; call < 2; ++call) {
@@ -306,6 +281,8 @@ TEST(Module, KeepsTheInterfaceTableOfTheProcess) {
   ComPtr<IUnknown> out;
   EXPECT_EQ(module.GetGlobalInterfaceTable(out.Put()), E_UNEXPECTED);
   EXPECT_FALSE(out);
+  EXPECT_EQ(CoRevokeClassObject(cookie), S_OK);
+  EXPECT_EQ(table.references, 1u);
 }
 
 TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {

@@ -42,6 +42,9 @@ TEST_F(EventNotifier, IsNotCreatedWithoutATree) {
     process.UseTreeClass(test.registered ? static_cast<IClassFactory*>(&tree) : nullptr);
     process.notifier = process.Make<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier, test.result);
     EXPECT_EQ(process.notifier.Get() != nullptr, SUCCEEDED(test.result));
+    EXPECT_EQ((SingletonState<CZKUMEventNotifier, IUnknown>::s_pInstance != nullptr), SUCCEEDED(test.result));
+    EXPECT_EQ(ModuleLockCount(), SUCCEEDED(test.result) ? 1 : 0);
+    EXPECT_EQ(tree.creations, test.registered ? 1 : 0);
     // What was started without a target is torn down again.
     EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), test.threads);
     EXPECT_EQ(process.desktop.Calls(DesktopCall::RegisterDeviceNotificationW), test.threads);

@@ -27,6 +27,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
   std::array<DeviceList, 4> lists;
   std::function<void()> onBuild;
   std::string calls;  // "build list1 reset"
+  int creations = 0;
 
   // A device with this id below a new hub port.
   NodePtr Device(const std::u16string& id) {
@@ -59,6 +60,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
 
   HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown* outer, REFIID iid, void** out) override {
     EXPECT_EQ(outer, nullptr);
+    ++creations;
     if (FAILED(created)) return created;
     return QueryInterface(iid, out);
   }
