@@ -9,8 +9,6 @@
 #include <functional>
 #include <nlohmann/json.hpp>
 #include <sstream>
-#include <string>
-#include <vector>
 
 #include "platform/text.h"
 #include "tests/support/program.h"
@@ -19,20 +17,19 @@
 namespace zkusb {
 
 using Json = nlohmann::ordered_json;
+using Args = std::vector<std::string>;
 
-using Result = ProgramResult;
-
-inline Result RunClient(const std::vector<std::string>& args) { return RunProgram(ZKUSB_PROGRAM, args); }
+inline ProgramResult RunClient(const Args& args) { return RunProgram(ZKUSB_PROGRAM, args); }
 
 // What a run prints that is expected to do what it is asked.
-inline std::string Output(const std::vector<std::string>& args) {
-  const Result result = RunClient(args);
+inline std::string Output(const Args& args) {
+  const ProgramResult result = RunClient(args);
   EXPECT_EQ(result.code, kDone) << result.err;
   EXPECT_EQ(result.err, "");
   return result.out;
 }
 
-inline Json JsonOutput(std::vector<std::string> args) {
+inline Json JsonOutput(Args args) {
   args.push_back("--json");
   const Json json = Json::parse(Output(args), nullptr, false);
   EXPECT_FALSE(json.is_discarded());
@@ -48,6 +45,11 @@ inline std::vector<std::string> Lines(const std::string& text) {
 
 inline std::filesystem::path MachinesFolder() { return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines"; }
 inline std::string MachineFile(const std::string& name) { return (MachinesFolder() / (name + ".json")).string(); }
+inline std::string Golden(const std::string& name) {
+  std::ifstream stream(ZKUSB_SOURCE_DIR "/tests/golden/" + name + ".txt", std::ios::binary);
+  EXPECT_TRUE(stream) << name;
+  return {std::istreambuf_iterator<char>(stream), {}};
+}
 inline Json LoadJson(const std::filesystem::path& path) {
   std::ifstream stream(path);
   return Json::parse(stream);

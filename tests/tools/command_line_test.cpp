@@ -5,14 +5,13 @@ namespace {
 
 using testing::HasSubstr;
 using testing::StartsWith;
-using Args = std::vector<std::string>;
 
 TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
   const TemporaryFile noJson("{ \"devices\": [ }");
   const TemporaryFile unknownMember(R"({"devices": [{"id": "A\\B\\1", "colour": "red"}]})");
   const TemporaryFile noSteps("{}");
   const TemporaryFile badStep(R"({"steps": [{"at": 5, "unplug": "USB\\NO\\1"}]})");
-  const std::string usage;
+  const std::string usage, bogus = unknownMember.Path();
   const struct {
     Args args;
     std::string file, reason;
@@ -35,8 +34,8 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
       {{"watch"}, usage, "watch needs --script FILE"},
       {{"tree", "--machine", "/no/such/file"}, "/no/such/file: ", "cannot be read"},
       {{"tree", "--machine", noJson.Path()}, noJson.Path() + ": ", "line 1, column 16"},
-      {{"watch", "--machine", unknownMember.Path(), "--script", noSteps.Path()},
-       unknownMember.Path() + ": ",
+      {{"watch", "--machine", bogus, "--script", noSteps.Path()},
+       bogus + ": ",
        "devices[0]: unknown member \"colour\""},
       {{"tree", "--script", "/no/such/file"}, "/no/such/file: ", "cannot be read"},
       {{"dump", "--script", noSteps.Path()}, noSteps.Path() + ": ", "steps: is missing"},
@@ -44,7 +43,7 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
   };
   for (const auto& [args, file, reason] : cases) {
     SCOPED_TRACE(testing::PrintToString(args));
-    const Result result = RunClient(args);
+    const ProgramResult result = RunClient(args);
     EXPECT_EQ(result.code, kRefused);
     EXPECT_EQ(result.out, "");
     EXPECT_THAT(result.err, testing::AllOf(StartsWith("zkusb: " + file), HasSubstr(reason),
@@ -73,7 +72,7 @@ TEST(CommandLine, SaysWhatWasNotFound) {
   };
   for (const auto& [args, message, out] : cases) {
     SCOPED_TRACE(testing::PrintToString(args));
-    const Result result = RunClient(args);
+    const ProgramResult result = RunClient(args);
     EXPECT_EQ(result.code, kNothingFound);
     EXPECT_EQ(result.out, out);
     EXPECT_EQ(result.err, message);
@@ -103,7 +102,7 @@ TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
 }
 
 TEST(CommandLine, NoticesThatTheOutputIsLost) {
-  const Result result = RunProgram(ZKUSB_PROGRAM, {"tree"}, "/dev/full");
+  const ProgramResult result = RunProgram(ZKUSB_PROGRAM, {"tree"}, "/dev/full");
   EXPECT_EQ(result.code, kRefused);
   EXPECT_EQ(result.err, "zkusb: the output cannot be written\n");
 }

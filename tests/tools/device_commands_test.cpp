@@ -4,47 +4,26 @@ namespace zkusb {
 namespace {
 
 using testing::HasSubstr;
-using Args = std::vector<std::string>;
 
-TEST(FindCommand, GivesOneLineForEachHit) {
-  const std::string asus = MachineFile("asus-b560"), hp = MachineFile("hp-cardreader");
-  const struct {
+TEST(DeviceCommands, PrintWhatTheTranscriptShows) {
+  const std::vector<std::string> lines = Lines(Golden("client-transcript"));
+  std::size_t cases = 0;
+  for (auto line = lines.begin(); line != lines.end();) {
+    const std::string command = *line++;
+    if (!command.starts_with("$ zkusb ")) continue;
     Args args;
-    std::string out;
-  } cases[] = {
-      {{"find", "--vendor", "781"},
-       "0781:5580  serial AA010603160707470215  controller 1, port 3  SanDisk Corporation, USB "
-       "Mass Storage Device  D:\n"},
-      {{"find", "--vendor", "0x413c", "--product", "0X8197"},
-       "413C:8197  serial 28E347017777  controller 2, port 1, port 4  Dell Wireless 380 Bluetooth "
-       "4.0 Module\n"},
-      // A number that Windows made up is no serial number.
-      {{"find", "--vendor", "3F0", "--machine", hp},
-       "03F0:0024  no serial number  controller 4, port 1  Hewlett Packard, USB Human Interface "
-       "Device\n"
-       "03F0:134A  no serial number  controller 4, port 2  Hewlett Packard, USB Human Interface "
-       "Device\n"},
-      // Hubs are no devices of their own.
-      {{"find", "--vendor", "424", "--machine", asus},
-       "0424:284C  no serial number  controller 1, port 10, port 2, port 7  Standard Microsystems "
-       "Corp., USB Composite Device\n"},
-  };
-  for (const auto& [args, out] : cases) EXPECT_EQ(Output(args), out);
+    std::istringstream words(command.substr(8));
+    for (std::string word; words >> word;)
+      args.push_back(word.starts_with("machines/") ? ZKUSB_SOURCE_DIR "/" + word : word);
+    std::string expected;
+    for (; line != lines.end() && line->find_first_of("$#") != 0; ++line) expected += *line + "\n";
+    EXPECT_EQ(Output(args), expected) << command;
+    ++cases;
+  }
+  EXPECT_EQ(cases, 7u);
 }
 
-TEST(VolumesCommand, ShowsDisksWithAndWithoutVolumes) {
-  EXPECT_EQ(Output({"volumes"}),
-            R"(0781:5580  SanDisk Corporation, USB Mass Storage Device  serial AA010603160707470215
-  Disk SanDisk Extreme USB Device
-    Volume \\?\Volume{3869c27a-31b8-11e8-9b12-ecf4bb487fed}\  D:
-)");
-  EXPECT_EQ(Output({"volumes", "--machine", MachineFile("hp-cardreader")}),
-            R"(0BDA:0151  USB Mass Storage Device  serial 20060413092100000
-  Disk Generic- Compact Flash USB Device  F:  no volume
-  Disk Generic- MS/MS-Pro USB Device  G:  no volume
-  Disk Generic- SD/MMC USB Device  H:  no volume
-  Disk Generic- SM/xD-Picture USB Device  I:  no volume
-)");
+TEST(VolumesCommand, ShowsVolumesThatAreNotMounted) {
   const TemporaryFile unmounted(ChangedMachine([](Json& machine) {
     for (Json& volume : machine["volumes"]) volume["paths"] = Json::array();
   }));

@@ -15,8 +15,7 @@ std::filesystem::path ScriptsFolder() { return MachinesFolder() / "scripts"; }
 std::string MachineOf(const Json& script) {
   std::smatch match;
   const std::string notes = script.at("notes").dump();
-  if (!std::regex_search(notes, match, std::regex("Runs over ([-a-z0-9]+)\\.json"))) return "";
-  return MachineFile(match[1]);
+  return std::regex_search(notes, match, std::regex("Runs over ([-a-z0-9]+)\\.json")) ? MachineFile(match[1]) : "";
 }
 
 std::vector<Json> JsonLines(const std::string& text) {
@@ -65,7 +64,7 @@ TEST(WatchCommand, TellsEveryScriptInOrder) {
     SCOPED_TRACE(entry.path().string());
     ++scripts;
     const Json script = LoadJson(entry.path());
-    std::vector<std::string> args{"watch", "--machine", MachineOf(script), "--script", entry.path().string()};
+    Args args{"watch", "--machine", MachineOf(script), "--script", entry.path().string()};
     std::vector<std::string> told, toldAsJson;
     std::size_t steps = 0;
     for (const std::string& line : Lines(Output(args))) {
