@@ -1,46 +1,41 @@
 // What COM asks of every object: which interfaces it answers for, one identity, exact reference counts, and
 // methods in their published slots.
-#include <fstream>
 #include <functional>
+#include <sstream>
 
 #include "tests/support/com_objects.h"
 #include "tests/support/desk_pc.h"
+#include "tests/support/golden.h"
 #include "tests/support/tree_desk.h"
 
 namespace KelvoUHW {
 namespace {
 
-struct InterfaceRow {
-  std::string name;
-  IID iid;
-};
+using Interfaces = std::vector<std::pair<std::string, IID>>;
 
-// The identifiers as they are published, and not those of the header; the first is that of IUnknown, the last one
-// nobody's.
-const std::vector<InterfaceRow>& Interfaces() {
-  static const std::vector<InterfaceRow> rows = [] {
-    std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/interface-ids.txt");
-    std::vector<InterfaceRow> read;
-    for (std::string iid, name; file >> iid && std::getline(file >> std::ws, name);) {
-      read.push_back({name, platform::ToSystemGuid(ParseGuidText(platform::FromUtf8(iid).c_str()))});
-    }
-    EXPECT_EQ(read.size(), 22u);
-    return read;
-  }();
-  return rows;
+// The identifiers as they are published, and not those of the header: that of IUnknown first, nobody's last.
+Interfaces ReadInterfaces() {
+  std::istringstream file(testing_support::Golden("interface-ids"));
+  Interfaces read;
+  for (std::string iid, name; file >> iid && std::getline(file >> std::ws, name);) {
+    read.emplace_back(name, platform::ToSystemGuid(ParseGuidText(platform::FromUtf8(iid).c_str())));
+  }
+  EXPECT_EQ(read.size(), 22u);
+  return read;
 }
 
 // The names of the interfaces that a pointer answers for; the pointers go to `found`.
 std::string Answers(IUnknown* pointer, IUnknown* identity, std::vector<ComPtr<IUnknown>>* found) {
+  static const Interfaces interfaces = ReadInterfaces();
   std::string names;
-  for (const auto& [name, iid] : Interfaces()) {
+  for (const auto& [name, iid] : interfaces) {
     const ULONG before = References(pointer);
     void* out = Mark<void>();
     const HRESULT result = pointer->QueryInterface(iid, &out);
     EXPECT_EQ(References(pointer), before + (result == S_OK ? 1 : 0)) << name;
     if (result == S_OK) {
       auto answered = ComPtr<IUnknown>::Attach(static_cast<IUnknown*>(out));
-      EXPECT_TRUE(iid != Interfaces()[0].iid || answered.Get() == identity);
+      EXPECT_TRUE(iid != interfaces[0].second || answered.Get() == identity);
       names += (names.empty() ? "" : " ") + name;
       if (found) found->push_back(std::move(answered));
     } else {

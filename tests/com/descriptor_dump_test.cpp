@@ -1,18 +1,19 @@
 #include "com/descriptor_dump.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 
 #include <algorithm>
-#include <fstream>
-#include <iterator>
 #include <set>
 
 #include "platform/text.h"
+#include "tests/support/golden.h"
 
 namespace KelvoUHW {
 namespace {
 
 using Bytes = std::vector<std::uint8_t>;
+using testing::HasSubstr;
+using testing_support::Golden;
 
 constexpr char kUnknown[] = "\r\nUnknown Descriptor:\r\n";
 
@@ -21,9 +22,7 @@ std::string Dump(const Bytes& bytes, const StringDescriptorNode* strings = nullp
   const auto descriptors = SplitConfiguration(bytes);
   std::u16string out;
   DumpConfiguration(descriptors, strings, prefix, out);
-  for (const auto& entry : MakeInterfaceEntries(descriptors, strings)) {
-    DumpInterface(*entry, prefix, out);
-  }
+  for (const auto& entry : MakeInterfaceEntries(descriptors, strings)) DumpInterface(*entry, prefix, out);
   return platform::ToUtf8(out);
 }
 
@@ -58,8 +57,7 @@ TEST(DescriptorDump, WritesEveryLineAndOfACutOneWhatWasReceived) {
   strings.LanguageID = 0x409;
   strings.StringDescriptor = {6, 3, 'U', 0, 'S', 0};
   const std::string full = Dump(whole, &strings, u"|");
-  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/configuration-descriptors.txt", std::ios::binary);
-  EXPECT_EQ(full, std::string(std::istreambuf_iterator<char>(file), {}));
+  EXPECT_EQ(full, Golden("configuration-descriptors"));
   EXPECT_GT(full.size(), 1000u);
   const std::vector<std::string> all = Lines(full);
   const std::set<std::string> known(all.begin(), all.end());
@@ -78,10 +76,7 @@ TEST(DescriptorDump, WritesEveryLineAndOfACutOneWhatWasReceived) {
 }
 
 TEST(DescriptorDump, BitsAndLengthsThatLie) {
-  struct {
-    Bytes Descriptor;
-    const char* Text;
-  } const cases[] = {
+  const std::pair<Bytes, const char*> cases[] = {
       {{9, 2, 9, 0, 1, 1, 0, 0x00, 255}, "0x00 ()\r\nMaxPower:             0xFF (510 Ma)\r\n"},
       {{9, 2, 9, 0, 1, 1, 0, 0xA0, 0}, "0xA0 (Bus Powered Remote Wakeup)\r\n"},
       {{7, 5, 0x80, 0x3C, 8, 0, 1}, "0x80  IN\r\nTransfer Type:        Control\r\n"},
@@ -94,16 +89,14 @@ TEST(DescriptorDump, BitsAndLengthsThatLie) {
       {{1, 5, 7}, "bLength:              0x01\r\n01 \r\nEnd ConfigDesc"},
       {{}, "ConfigDesc :::\r\nEnd ConfigDesc"},
   };
-  for (const auto& c : cases) EXPECT_NE(One(c.Descriptor).find(c.Text), std::string::npos) << c.Text;
+  for (const auto& [descriptor, text] : cases) EXPECT_THAT(One(descriptor), HasSubstr(text));
 
-  struct {
-    std::uint8_t Type;
-    std::set<unsigned> Known;
-  } const types[] = {{1, {}}, {2, {9}}, {4, {9, 11}}, {5, {7, 9}}, {0x21, {9, 10, 11, 12, 255}}};
-  for (const auto& type : types) {
+  const std::pair<std::uint8_t, std::set<unsigned>> types[] = {
+      {1, {}}, {2, {9}}, {4, {9, 11}}, {5, {7, 9}}, {0x21, {9, 10, 11, 12, 255}}};
+  for (const auto& [type, known] : types) {
     for (const unsigned length : {0u, 1u, 2u, 6u, 7u, 8u, 9u, 10u, 11u, 12u, 255u}) {
-      const bool unknown = One({static_cast<std::uint8_t>(length), type.Type}).find(kUnknown) != std::string::npos;
-      EXPECT_EQ(unknown, !type.Known.contains(length)) << unsigned{type.Type} << " " << length;
+      const bool unknown = One({static_cast<std::uint8_t>(length), type}).find(kUnknown) != std::string::npos;
+      EXPECT_EQ(unknown, !known.contains(length)) << unsigned{type} << " " << length;
     }
   }
 }
@@ -114,8 +107,7 @@ TEST(DescriptorDump, UnknownBytesStandSixteenToALine) {
     bytes[0] = 255;
     std::string expected = "bLength:              0xFF\r\nFF ";
     for (std::size_t i = 1; i < received; ++i) expected += i % 16 == 0 ? "\r\nEE " : "EE ";
-    const std::string text = One(bytes);
-    EXPECT_NE(text.find(expected + "\r\nEnd ConfigDesc"), std::string::npos) << text;
+    EXPECT_THAT(One(bytes), HasSubstr(expected + "\r\nEnd ConfigDesc"));
   }
 }
 
@@ -131,17 +123,7 @@ TEST(ConnectionDump, WritesTheDeviceThePortAndTheOpenPipes) {
   record.Info = {1, {18, 1, 0x0200, 9, 1, 2, 64, 0x46D, 0xC018, 0x4301, 1, 2, 3, 4}, 5, 2, 1, 0x107, 1, 1};
   // It says 9 bytes: its last two come from the place behind the descriptor.
   record.PipeList[0] = {{9, 5, 0x81, 3, 8, 10}, 0x0000BBAA};
-  EXPECT_EQ(Connection(record),
-            "-ConnectionInfo :::\r\n-Device Descriptor:\r\n-bcdUSB:                 0x0200\r\n"
-            "-bDeviceClass:           0x09\r\n-bDeviceSubClass:        0x01\r\n"
-            "-bDeviceProtocol:        0x02\r\n-bMaxPacketSize0:        0x40 (64)\r\n"
-            "-bcdDevice:              0x4301\r\n-bNumConfigurations:     0x04\r\n"
-            "-ConnectionStatus: DeviceConnected\r\n-Current Config Value: 0x05\r\n"
-            "-Device Bus Speed:     High\r\n-DeviceIsHub: yes\r\n-Device Address:       0x107\r\n"
-            "-Open Pipes:              1\r\n-\r\n-Endpoint Descriptor:\r\n"
-            "-bEndpointAddress:     0x81  IN\r\n-Transfer Type:        Interrupt\r\n"
-            "-wMaxPacketSize:       0x0008 (8)\r\n-wInterval:          0xAA0A\r\n"
-            "-bSyncAddress:         0xBB\r\n-End ConnectionInfo ---\r\n");
+  EXPECT_EQ(Connection(record), Golden("connection-information"));
 }
 
 TEST(ConnectionDump, TakesNoNumberFromTheRecordAtItsWord) {

@@ -4,8 +4,6 @@
 #include <algorithm>
 #include <fstream>
 #include <regex>
-#include <string>
-#include <vector>
 
 namespace {
 
@@ -42,21 +40,18 @@ void ForEachMatch(const std::string& text, const char* pattern, Visit visit) {
 
 TEST(Idl, SaysWhatTheHeaderSays) {
   Lines header, idl;
-  ForEachMatch(
-      Load("zkusb_monitor.h"),
-      "struct (\\w+) : IUnknown \\{ static constexpr IID kIid\\{([^;]*);|"
-      "virtual HRESULT STDMETHODCALLTYPE (\\w+)\\(([^)]*)\\) = 0;",
-      [&](const std::smatch& m) {
-        header.push_back(m[1].matched ? m.str(1) + " " + Digits(m.str(2)) : m.str(3) + " " + Parameters(m.str(4)));
-      });
-  ForEachMatch(Load("zkusb_monitor.idl"),
-               "uuid\\(([^)]*)\\)[^\\]]*\\] interface (\\w+) : IUnknown|"
-               "\\[([^\\]]*)\\] HRESULT (\\w+)\\(([^;]*)\\);",
-               [&](const std::smatch& m) {
-                 const bool property = m.str(3).find("propget") != std::string::npos;
-                 idl.push_back(m[1].matched ? m.str(2) + " " + Digits(m.str(1))
-                                            : (property ? "get_" : "") + m.str(4) + " " + Parameters(m.str(5)));
-               });
+  const char* const inHeader =
+      R"(struct (\w+) : IUnknown \{ static constexpr IID kIid\{([^;]*);|virtual HRESULT STDMETHODCALLTYPE (\w+)\(([^)]*)\) = 0;)";
+  ForEachMatch(Load("zkusb_monitor.h"), inHeader, [&](const std::smatch& m) {
+    header.push_back(m[1].matched ? m.str(1) + " " + Digits(m.str(2)) : m.str(3) + " " + Parameters(m.str(4)));
+  });
+  const char* const inIdl =
+      R"(uuid\(([^)]*)\)[^\]]*\] interface (\w+) : IUnknown|\[([^\]]*)\] HRESULT (\w+)\(([^;]*)\);)";
+  ForEachMatch(Load("zkusb_monitor.idl"), inIdl, [&](const std::smatch& m) {
+    const bool property = m.str(3).find("propget") != std::string::npos;
+    idl.push_back(m[1].matched ? m.str(2) + " " + Digits(m.str(1))
+                               : (property ? "get_" : "") + m.str(4) + " " + Parameters(m.str(5)));
+  });
   EXPECT_EQ(idl, header);
   EXPECT_EQ(header.size(), 13u + 50u);  // interfaces and methods
 

@@ -11,6 +11,7 @@
 #include <sstream>
 
 #include "platform/text.h"
+#include "tests/support/golden.h"
 #include "tests/support/program.h"
 #include "tools/zkusb/run.h"
 
@@ -18,6 +19,7 @@ namespace zkusb {
 
 using Json = nlohmann::ordered_json;
 using Args = std::vector<std::string>;
+using testing_support::Golden;
 
 inline ProgramResult RunClient(const Args& args) { return RunProgram(ZKUSB_PROGRAM, args); }
 
@@ -45,11 +47,6 @@ inline std::vector<std::string> Lines(const std::string& text) {
 
 inline std::filesystem::path MachinesFolder() { return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines"; }
 inline std::string MachineFile(const std::string& name) { return (MachinesFolder() / (name + ".json")).string(); }
-inline std::string Golden(const std::string& name) {
-  std::ifstream stream(ZKUSB_SOURCE_DIR "/tests/golden/" + name + ".txt", std::ios::binary);
-  EXPECT_TRUE(stream) << name;
-  return {std::istreambuf_iterator<char>(stream), {}};
-}
 inline Json LoadJson(const std::filesystem::path& path) {
   std::ifstream stream(path);
   return Json::parse(stream);
