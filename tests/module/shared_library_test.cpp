@@ -5,26 +5,16 @@
 #include <chrono>
 #include <cstdlib>
 #include <iostream>
-#include <string>
 
-#include "com/com_ptr.h"
 #include "com/private_interfaces.h"
-#include "com/zkusb_monitor.h"
-#include "module/type_library.h"
-#include "platform/server_module.h"
-#include "platform/simulated/module_environment.h"
-#include "platform/simulated/simulated_desktop.h"
-#include "platform/simulated/simulated_pc.h"
-#include "platform/simulated/type_libraries.h"
-#include "platform/system.h"
+#include "tests/support/client_process.h"
 #include "tests/support/counting_sink.h"
-#include "tests/support/plugs.h"
 #include "tests/support/registry_lines.h"
 
 namespace {
 
+using KelvoUHW::ClockMode;
 using KelvoUHW::ComPtr;
-using platform::simulated::ClockMode;
 using platform::simulated::InterfaceBroadcast;
 using platform::simulated::VolumeBroadcast;
 using testing_support::CountingSink;
@@ -40,47 +30,20 @@ bool Mapped() {
   return handle != nullptr;
 }
 
-// A process on a simulated PC with one gadget, with the module registered or not.
-struct Client {
-  explicit Client(bool registered = true, ClockMode mode = ClockMode::Virtual) : desktop(mode) {
-    EXPECT_EQ(pc.Apply({0, u"", KelvoUHW::Gadget(u"1", 1)}), u"");
-    typeLibraries.Add(kModule, KelvoUHW::ModuleTypeLibrary());
-    platform::SetCurrentSystem({&pc, &desktop, &desktop, &registry, &typeLibraries, &environment});
+// With one gadget, and the module registered or not.
+struct Client : KelvoUHW::ClientProcess {
+  explicit Client(bool registered = true, ClockMode mode = ClockMode::Virtual)
+      : ClientProcess({KelvoUHW::Gadget(u"1", 1)}, kModule, mode) {
     if (registered) {
-      EXPECT_EQ(platform::RegisterServerModule(kModule), S_OK);
+      EXPECT_EQ(Register(), S_OK);
     }
   }
-  ~Client() {
-    desktop.EndProcess();
-    platform::SetCurrentSystem({});
-  }
-
-  platform::simulated::SimulatedPc pc{KelvoUHW::BarePc()};
-  platform::simulated::SimulatedDesktop desktop;
-  platform::simulated::SimulatedRegistry registry;
-  platform::simulated::SimulatedTypeLibraries typeLibraries{registry};
-  platform::simulated::SimulatedModuleEnvironment environment{kModule};
 };
-
-template <class Interface>
-ComPtr<Interface> Create(const CLSID& clsid, HRESULT expected = S_OK) {
-  ComPtr<Interface> object;
-  EXPECT_EQ(CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, platform::IidOf<Interface>(), object.PutVoid()),
-            expected);
-  return object;
-}
 
 CLSID ClassOf(const char16_t* progId, HRESULT expected = S_OK) {
   CLSID clsid{1, 0, 0, {}};
   EXPECT_EQ(CLSIDFromProgID(progId, &clsid), expected);
   return clsid;
-}
-
-HRESULT RootOf(const ComPtr<IZKUMUsbTree>& tree) {
-  ComPtr<IZKUMUsbTreeNode> root;
-  const HRESULT result = tree->get_RootNode(root.Put());
-  EXPECT_EQ(static_cast<bool>(root), result == S_OK);
-  return result;
 }
 
 TEST(SharedLibrary, InstallWritesNothing) {
@@ -104,21 +67,21 @@ TEST(SharedLibrary, InstallWritesNothing) {
 }
 
 TEST(SharedLibrary, IsFoundThroughItsRegistrationAlone) {
-  const Client client(false);
+  Client client(false);
   const auto refused = [] {
-    EXPECT_FALSE(Create<IUnknown>(CLSID_ZKUMUsbTree, REGDB_E_CLASSNOTREG));
-    EXPECT_FALSE(Create<IUnknown>(CLSID_ZKUMEventNotifier, REGDB_E_CLASSNOTREG));
+    EXPECT_FALSE(Client::Create<IUnknown>(CLSID_ZKUMUsbTree, REGDB_E_CLASSNOTREG));
+    EXPECT_FALSE(Client::Create<IUnknown>(CLSID_ZKUMEventNotifier, REGDB_E_CLASSNOTREG));
     EXPECT_EQ(ClassOf(u"KelvoUsbMonitor.UsbTree", CO_E_CLASSSTRING), GUID_NULL);
     EXPECT_FALSE(Mapped());
   };
   refused();
-  ASSERT_EQ(platform::RegisterServerModule(kModule), S_OK);
+  ASSERT_EQ(client.Register(), S_OK);
   EXPECT_FALSE(Mapped()) << "loaded for the call only";
   EXPECT_EQ(ClassOf(u"KelvoUsbMonitor.EventNotifier"), CLSID_ZKUMEventNotifier);
   EXPECT_EQ(ClassOf(u"KelvoUsbMonitor.EventNotifier.1"), CLSID_ZKUMEventNotifier);
   for (const CLSID& clsid :
        {CLSID_ZKUMUsbTree, ClassOf(u"KelvoUsbMonitor.UsbTree"), ClassOf(u"KelvoUsbMonitor.UsbTree.1")}) {
-    EXPECT_EQ(RootOf(Create<IZKUMUsbTree>(clsid)), E_POINTER) << "no build, no tree";
+    EXPECT_EQ(Client::RootOf(Client::Create<IZKUMUsbTree>(clsid)), E_POINTER) << "no build, no tree";
   }
   CoFreeUnusedLibraries();
   ASSERT_EQ(platform::UnregisterServerModule(kModule), S_OK);
@@ -131,9 +94,9 @@ TEST(SharedLibrary, IsUnmappedWheneverNothingOfItIsLeft) {
   for (int cycle = 0; cycle < kCycles && !HasFailure(); ++cycle) {
     SCOPED_TRACE(cycle);
     ASSERT_FALSE(Mapped());
-    ComPtr<IZKUMUsbTree> tree = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree);
+    ComPtr<IZKUMUsbTree> tree = Client::Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree);
     ASSERT_TRUE(tree && Mapped());
-    EXPECT_EQ(RootOf(tree), E_POINTER) << "a tree of the cycle before";
+    EXPECT_EQ(Client::RootOf(tree), E_POINTER) << "a tree of the cycle before";
     EXPECT_EQ(tree.As<IBuildUsbTree>()->BuildTree(), S_OK);
     ComPtr<IZKUMUsbTreeNode> root;
     ComPtr<IZKUMUsbTreeNodeEnumerator> nodes;
@@ -170,14 +133,14 @@ struct AdvisedClient : Client {
   }
 
   CountingSink sink;
-  ComPtr<IConnectionPointContainer> notifier = Create<IConnectionPointContainer>(CLSID_ZKUMEventNotifier);
+  ComPtr<IConnectionPointContainer> notifier = Client::Create<IConnectionPointContainer>(CLSID_ZKUMEventNotifier);
   ComPtr<IConnectionPoint> point;
   DWORD cookie = 0;
 };
 
 [[noreturn]] void StaysMapped() {
   AdvisedClient client(ClockMode::Virtual);
-  EXPECT_EQ(RootOf(Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree)), S_OK) << "not the notifier's tree";
+  EXPECT_EQ(Client::RootOf(Client::Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree)), S_OK) << "not the notifier's tree";
   EXPECT_EQ(client.sink.Events(), 1u) << "the gadget that was there";
 
   // More closings than openings: a client can unload it no more than the system.

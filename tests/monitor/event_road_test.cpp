@@ -1,19 +1,7 @@
 // The road of one event, from registration to the last sink, over COM alone: this program knows the component as any
 // client does, and loads it from where it was registered.
-#include <gtest/gtest.h>
-
-#include "com/com_ptr.h"
-#include "com/zkusb_monitor.h"
-#include "module/type_library.h"
-#include "platform/server_module.h"
-#include "platform/simulated/module_environment.h"
 #include "platform/simulated/play_step.h"
-#include "platform/simulated/registry.h"
-#include "platform/simulated/simulated_desktop.h"
-#include "platform/simulated/simulated_pc.h"
-#include "platform/simulated/type_libraries.h"
-#include "platform/system.h"
-#include "tests/support/plugs.h"
+#include "tests/support/client_process.h"
 #include "tests/support/test_sink.h"
 
 namespace KelvoUHW {
@@ -37,36 +25,13 @@ Plug Phone(const Text& serial, std::uint32_t port, const Text& product = u"1291"
   return plug;
 }
 
-// A client's process with a PC of its own, on which the component is registered.
-class Client {
- public:
-  Client() {
-    for (const Change& change : {Change(Stick(u"S1", 1, u'E')), Change(CardReader(u"CR", 2))}) {
-      EXPECT_EQ(m_pc.Apply({0, u"", change}), u"");
-    }
-    m_typeLibraries.Add(m_path, ModuleTypeLibrary());
-    platform::SetCurrentSystem({&m_pc, &desktop, &desktop, &m_registry, &m_typeLibraries, &m_environment});
+struct Client : ClientProcess {
+  Client() : ClientProcess({Stick(u"S1", 1, u'E'), CardReader(u"CR", 2)}) {
     EXPECT_EQ(CoInitializeEx(nullptr, COINIT_MULTITHREADED), S_OK);
   }
   ~Client() {
-    tree.Reset();
-    notifier.Reset();
     point.Reset();
     CoUninitialize();
-    desktop.EndProcess();
-    EXPECT_TRUE(desktop.Misuses().empty());
-    EXPECT_TRUE(m_pc.Misuses().empty());
-    platform::SetCurrentSystem({});
-  }
-
-  HRESULT Register() { return platform::RegisterServerModule(m_path); }
-  template <class Interface>
-  HRESULT Create(const CLSID& clsid, ComPtr<Interface>& out) {
-    return CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, platform::IidOf<Interface>(), out.PutVoid());
-  }
-  HRESULT RootNode() const {
-    ComPtr<IZKUMUsbTreeNode> root;
-    return tree->get_RootNode(root.Put());
   }
   void Advise(IUnknown& sink, DWORD expected) {
     DWORD cookie = 0;
@@ -75,21 +40,10 @@ class Client {
   }
   // The change, what the system tells of it, and what follows within the time.
   void Play(const Change& change, std::uint32_t milliseconds = 0, BroadcastTime told = BroadcastTime::After) {
-    EXPECT_EQ(platform::simulated::PlayStep(m_pc, desktop, {0, u"", change, told}), u"");
+    EXPECT_EQ(platform::simulated::PlayStep(pc, desktop, {0, u"", change, told}), u"");
     desktop.RunFor(milliseconds);
   }
 
- private:
-  const std::u16string m_path = platform::ServerModulePath();
-  platform::simulated::SimulatedPc m_pc{BarePc()};
-  platform::simulated::SimulatedRegistry m_registry;
-  platform::simulated::SimulatedTypeLibraries m_typeLibraries{m_registry};
-  platform::simulated::SimulatedModuleEnvironment m_environment{m_path};
-
- public:
-  platform::simulated::SimulatedDesktop desktop;
-  ComPtr<IZKUMUsbTree> tree;
-  ComPtr<IZKUMEventNotifier> notifier;
   ComPtr<IConnectionPoint> point;
 };
 
@@ -102,16 +56,17 @@ TEST(EventRoad, FromRegistrationToUnadvise) {
   platform::simulated::SimulatedDesktop& desktop = client.desktop;
 
   // Registered, created: there is a window, and no tree yet.
-  EXPECT_EQ(client.Create(CLSID_ZKUMEventNotifier, client.notifier), REGDB_E_CLASSNOTREG);
+  EXPECT_FALSE(client.Create<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier, REGDB_E_CLASSNOTREG));
   ASSERT_EQ(client.Register(), S_OK);
-  ASSERT_EQ(client.Create(CLSID_ZKUMUsbTree, client.tree), S_OK);
+  const auto tree = client.Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree);
   EXPECT_EQ(desktop.Counts().threads, 0u);
-  ASSERT_EQ(client.Create(CLSID_ZKUMEventNotifier, client.notifier), S_OK);
+  const auto notifier = client.Create<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier);
+  ASSERT_TRUE(tree && notifier);
   EXPECT_EQ(desktop.Counts(), (platform::simulated::DesktopCounts{1, 1, 1, 1, 0}));
-  EXPECT_EQ(client.RootNode(), E_POINTER);
+  EXPECT_EQ(client.RootOf(tree), E_POINTER);
 
   // Advised: the tree is there, and what is connected is told inside the call, to that sink only.
-  const auto container = client.notifier.As<IConnectionPointContainer>();
+  const auto container = notifier.As<IConnectionPointContainer>();
   ASSERT_EQ(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, client.point.Put()), S_OK);
   std::uint32_t caller = 0;
   a.onEvent = [&] {
@@ -121,7 +76,7 @@ TEST(EventRoad, FromRegistrationToUnadvise) {
   client.Advise(a, 1);
   EXPECT_EQ(Taken(log), "A 0 S1, A 0 CR");
   EXPECT_EQ(caller, desktop.CurrentThreadId());
-  EXPECT_EQ(client.RootNode(), S_OK);
+  EXPECT_EQ(client.RootOf(tree), S_OK);
   client.Advise(b, 2);
   EXPECT_EQ(Taken(log), "B 0 S1, B 0 CR");
 
