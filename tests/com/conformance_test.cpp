@@ -74,10 +74,7 @@ class Conformance : public ComObjects {
 
 TEST_F(Conformance, EveryObjectAnswersForItsInterfacesFromEachOfThem) {
   const std::string node = "IUnknown IZKUMUsbTreeNode IZKUMUsbDevice";
-  const struct {
-    ComPtr<IUnknown> object;
-    std::string answers;
-  } rows[] = {
+  const std::pair<ComPtr<IUnknown>, std::string> rows[] = {
       {Wrap(sample.root).As<IUnknown>(), node},
       {Wrap(sample.plain).As<IUnknown>(), node},
       {Wrap(sample.controller).As<IUnknown>(), node + " IZKUMHostController"},

@@ -35,15 +35,12 @@ TEST_F(FirstChildOfType, FindsTheFirstInPreOrder) {
                             MakeNode<CZKUMHubDeviceImpl>(u"h2", {MakeNode<CZKUMHostControllerImpl>(u"c1")})}),
                 MakeNode<CZKUMHostControllerImpl>(u"c2")});
   const auto root = Wrap(tree);
-  const struct {
-    TUsbDeviceType kind;
-    const char* expected;
-  } rows[] = {{KUDTRoot, "S_OK same"},
-              {KUDTHub, "S_OK S_OK h1"},
-              {KUDTHubPort, "S_OK S_OK p1"},
-              {KUDTHostController, "S_OK S_OK c1"},
-              {KUDTUnknown, "S_FALSE untouched"}};
-  for (const auto& row : rows) EXPECT_EQ(Search(root.Get(), row.kind), row.expected) << row.kind;
+  const std::pair<TUsbDeviceType, const char*> rows[] = {{KUDTRoot, "S_OK same"},
+                                                         {KUDTHub, "S_OK S_OK h1"},
+                                                         {KUDTHubPort, "S_OK S_OK p1"},
+                                                         {KUDTHostController, "S_OK S_OK c1"},
+                                                         {KUDTUnknown, "S_FALSE untouched"}};
+  for (const auto& [kind, expected] : rows) EXPECT_EQ(Search(root.Get(), kind), expected) << kind;
   EXPECT_EQ(searcher->get_FirstChildOfType(root.Get(), KUDTHub, nullptr), E_POINTER);
   EXPECT_EQ(searcher->get_FirstChildOfType(root.Get(), KUDTInterfaceDevice, nullptr), S_FALSE);
   EXPECT_EQ(searcher->get_FirstChildOfType(nullptr, KUDTHub, nullptr), E_POINTER);

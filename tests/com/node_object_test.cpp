@@ -10,11 +10,8 @@ namespace {
 
 // What a text property answers where it cannot give its text; null: no such case.
 struct TextRules {
-  const char* firstFails;  // the text's first allocation
-  const char* secondFails;
-  const char* nullOutFirstFails;
-  const char* noRecord;
-  const char* noRecordNullOut;
+  const char *firstFails, *secondFails, *nullOutFirstFails;  // the text's first, second allocation
+  const char *noRecord, *noRecordNullOut;
 };
 constexpr char kRaised[] = "raised E_OUTOFMEMORY null", kNoMemory[] = "E_OUTOFMEMORY null";
 // The text is made before the out pointer is looked at, the record is asked for before both.
@@ -143,11 +140,8 @@ TEST_F(NodeObject, NumbersAndWhatIsAnsweredInTheirPlace) {
   const std::string untouched = " 1515870810";
   const struct {
     Number read;
-    const char* kind;
-    const char* value;
-    const char* nullOut;
-    const char* noRecord;  // the code then; null: there is always one
-    const char* noRecordNullOut;
+    const char *kind, *value, *nullOut;
+    const char *noRecord, *noRecordNullOut;  // the codes then; null: there is always one
   } rows[] = {
       {kType, "root", "S_OK 1", "E_POINTER", "E_INVALIDARG", "E_INVALIDARG"},
       {kType, "disk", "S_OK 7", "E_POINTER", nullptr, nullptr},

@@ -2,8 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include <fstream>
-#include <iterator>
+#include <sstream>
 
 #include "module/module.h"
 #include "module/scripts.h"
@@ -12,6 +11,7 @@
 #include "platform/simulated/type_libraries.h"
 #include "platform/wrappers/failing_registry.h"
 #include "tests/support/failing_memory.h"
+#include "tests/support/golden.h"
 #include "tests/support/registry_lines.h"
 
 namespace KelvoUHW {
@@ -19,7 +19,6 @@ namespace {
 
 using platform::simulated::SimulatedModuleEnvironment;
 using platform::simulated::SimulatedRegistry;
-using platform::simulated::SimulatedTypeLibraries;
 using platform::simulated::TypeLibrary;
 using platform::wrappers::FailingRegistry;
 using testing_support::ExpectAllClosed;
@@ -59,7 +58,7 @@ struct Pc {
 
   SimulatedRegistry registry;
   FailingRegistry failing{registry};
-  SimulatedTypeLibraries libraries{failing};
+  platform::simulated::SimulatedTypeLibraries libraries{failing};
   SimulatedModuleEnvironment environment;
 };
 
@@ -67,7 +66,7 @@ struct Pc {
 Lines RegisteredLines(const std::string& module, const std::string& libraryFile, const std::string& helpDirectory) {
   const std::pair<std::string, std::string> places[] = {
       {"<MODULE>", module}, {"<LIBRARY>", libraryFile}, {"<HELP>", helpDirectory}};
-  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/registered-keys.txt");
+  std::istringstream file(testing_support::Golden("registered-keys"));
   Lines lines;
   for (std::string line; std::getline(file, line); lines.push_back(line)) {
     for (const auto& [mark, text] : places) {
@@ -263,6 +262,8 @@ struct Recorder final : platform::Registry, platform::TypeLibraries, platform::M
     return Status::Failure(1);  // nobody's concern
   }
 
+  bool AsBefore() const { return locale == 0x411 && open == 0 && loaded == 0; }
+
   static constexpr platform::TypeLibraryAttributes kAttributes{{1, 2, 3, {4}}, 0x407, 3, 5, 6, 7};
   std::uint32_t locale = 0x411;
   Key open = 0;
@@ -301,9 +302,7 @@ TEST(Registration, GivesTheCodeOfWhateverFails) {
     Recorder system = test.system;
     EXPECT_EQ(RegisterServer(test.server, Common(), {system, system, system}), test.onRegister);
     EXPECT_EQ(UnregisterServer(test.server, Common(), {system, system, system}), test.onUnregister);
-    EXPECT_EQ(system.locale, 0x411u);
-    EXPECT_EQ(system.open, 0);
-    EXPECT_EQ(system.loaded, 0);
+    EXPECT_TRUE(system.AsBefore());
   }
 }
 
@@ -314,14 +313,10 @@ TEST(Registration, RunsOutOfMemoryAnywhere) {
     std::uint64_t allocation = 0;
     for (bool failed = true; failed;) {
       Recorder system;
-      HRESULT result = S_OK;
-      {
-        const FailingAllocation failing(++allocation);
-        result = run(server, common, {system, system, system});
-        failed = failing.Failed();
-      }
+      const auto work = [&] { return run(server, common, {system, system, system}); };
+      const HRESULT result = WithoutAllocation(++allocation, failed, work);
       EXPECT_EQ(result, failed ? E_OUTOFMEMORY : S_OK) << allocation;
-      EXPECT_TRUE(system.locale == 0x411 && system.open == 0 && system.loaded == 0) << allocation;
+      EXPECT_TRUE(system.AsBefore()) << allocation;
       ASSERT_FALSE(HasFailure());
     }
     EXPECT_GT(allocation, 100u);
@@ -331,8 +326,7 @@ TEST(Registration, RunsOutOfMemoryAnywhere) {
 TEST(Registration, ScriptsAreTheFilesTheyWereMadeFrom) {
   const std::pair<int, const char*> kCases[] = {{101, "module"}, {102, "event_notifier"}, {103, "usb_tree"}};
   for (const auto& [number, name] : kCases) {
-    std::ifstream file(std::string(ZKUSB_SOURCE_DIR "/module/scripts/") + name + ".rgs", std::ios::binary);
-    const std::string text((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
+    const std::string text = testing_support::Contents(std::string("module/scripts/") + name + ".rgs");
     EXPECT_EQ(RegistryScript(static_cast<ScriptResource>(number)), text) << name;
     EXPECT_FALSE(text.empty()) << name;
   }

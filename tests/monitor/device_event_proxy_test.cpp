@@ -74,8 +74,7 @@ TEST_F(DeviceEventProxy, AdviseCodes) {
     std::function<void(Scene&)> prepare;
     HRESULT result;
     bool advised;
-    const char* calls;
-    const char* log;
+    const char *calls, *log;
   } kCases[] = {
       {"nothing changed", [](Scene& s) { s.tree.built = S_FALSE; }, S_OK, true, "build list0 reset", "A 0 c"},
       {"reset fails", [](Scene& s) { s.tree.reset = E_FAIL; }, S_OK, true, "build list0 reset", "A 0 c"},
@@ -224,10 +223,7 @@ std::string Play(ComPtr<IEnumConnections> list, const std::string& operations, N
 }
 
 TEST_F(DeviceEventProxy, EnumeratesConnections) {
-  const struct {
-    const char* operations;
-    const char* outcome;
-  } kCases[] = {
+  const std::pair<const char*, const char*> kCases[] = {
       {"n3 n1", "S_FALSE:A1:C3#2 S_FALSE#0"},
       {"n1! n0 n0! n2! n1", "S_OK:A1 S_OK#0 S_OK E_POINTER S_OK:C3#1"},
       {"s1 n1 s1 s0", "S_OK S_OK:C3#1 S_FALSE S_OK"},
@@ -242,10 +238,10 @@ TEST_F(DeviceEventProxy, EnumeratesConnections) {
     const auto sink = ComPtr<IUnknown>::Attach(item.pUnk).As<IUnknown>();
     return (sink.Get() == &scene.a ? ":A" : sink.Get() == &scene.c ? ":C" : ":?") + std::to_string(item.dwCookie);
   };
-  for (const auto& test : kCases) {
+  for (const auto& [operations, outcome] : kCases) {
     ComPtr<IEnumConnections> list;
     ASSERT_EQ(scene.point->EnumConnections(list.Put()), S_OK);
-    EXPECT_EQ(Play(list, test.operations, nameOf), test.outcome) << test.operations;
+    EXPECT_EQ(Play(list, operations, nameOf), outcome) << operations;
   }
   EXPECT_TRUE(scene.a.References() == 2 && scene.c.References() == 2) << "all but those of the slots given back";
   // A list is what was advised when it was made.

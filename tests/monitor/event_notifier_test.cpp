@@ -18,11 +18,10 @@ using EventNotifier = ComObjects;
 constexpr HRESULT kOtherCode = static_cast<HRESULT>(0x80070005);
 constexpr char kCaught[] = "Error caught\t-\tterminating";
 
-TEST_F(EventNotifier, IsNotCreatedWithoutATree) {
+TEST_F(EventNotifier, IsNotCreatedWithoutATreeAndOutlivesItsClients) {
   const struct {
     const char* what;
-    HRESULT created;
-    HRESULT offers;
+    HRESULT created, offers;
     bool registered;
     HRESULT result;
     std::uint64_t threads;  // started and left behind: the window's
@@ -51,20 +50,13 @@ TEST_F(EventNotifier, IsNotCreatedWithoutATree) {
     EXPECT_EQ(process.desktop.Counts().registrations, test.result == S_OK ? 1u : 0u);
     EXPECT_EQ(g_pActiveReceiver != nullptr, test.result == S_OK);
     EXPECT_EQ(g_pNotifyTarget != nullptr, test.result == S_OK);
+    // It builds nothing by itself, and outlives its clients.
+    EXPECT_EQ(tree.calls, "");
+    process.notifier.Reset();
     process.desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
     process.desktop.Settle();
     EXPECT_EQ(tree.calls, test.result == S_OK ? "build list1 list0 list2 list3 reset" : "");
   }
-}
-
-TEST_F(EventNotifier, BuildsNothingByItselfAndOutlivesItsClients) {
-  Scene scene;
-  EXPECT_EQ(scene.tree.calls, "");
-  scene.point.Reset();
-  scene.notifier.Reset();
-  scene.desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
-  scene.desktop.Settle();
-  EXPECT_EQ(scene.tree.calls, "build list1 list0 list2 list3 reset");
 }
 
 TEST_F(EventNotifier, NotifyDeviceChangeCodes) {
@@ -72,11 +64,9 @@ TEST_F(EventNotifier, NotifyDeviceChangeCodes) {
   constexpr const char* kWithLists = "build list1 list0 list2 list3 reset";
   const struct {
     const char* what;
-    HRESULT built;
-    HRESULT reset;
+    HRESULT built, reset;
     BYTE fire;
-    const char* calls;
-    const char* log;
+    const char *calls, *log;
   } kCases[] = {
       {"changed, another flag", S_OK, S_OK, 0x80, kWithLists, "A 0 c"},
       {"changed, no events wanted", S_OK, S_OK, 0, kWithoutLists, ""},

@@ -20,8 +20,7 @@ TEST_F(EventRuns, AdvisingAnotherInsideACall) {
   const struct {
     const char* what;
     std::vector<Change> meanwhile;
-    const char* toB;    // inside its advise
-    const char* after;  // the next run, on a PC that did not change any more
+    const char *toB, *after;  // inside its advise; in the next run, on a PC that did not change any more
   } kCases[] = {
       {"unchanged PC", {}, "B 0 CR, B 0 S2, ", "A 1 CR, A 1 S2, A 0 CR, A 0 S2"},
       {"a stick plugged in, and that of the run pulled",
@@ -68,10 +67,7 @@ TEST_F(EventRuns, TellEachSinkWhatItIsMeantToHear) {
     Act act;
     const char* log;
   };
-  const struct {
-    const char* what;
-    std::vector<Step> steps;
-  } kCases[] = {
+  const std::pair<const char*, std::vector<Step>> kCases[] = {
       {"what an advise finds is settled: others never hear that it came or went, only of what is connected later",
        {{{Unplug{UsbId(u"S1")}, Stick(u"S2", 3, u'F')}, kAdviseB, "B 0 CR, B 0 S2"},
         {{}, kRun, ""},
@@ -91,16 +87,16 @@ TEST_F(EventRuns, TellEachSinkWhatItIsMeantToHear) {
          kRun,
          "A 1 S2, A 0 S1, A 0 CR, A 0 S2, A 3 S1, A 3 CR, A 3 CR"}}},
   };
-  for (const auto& test : kCases) {
+  for (const auto& [what, steps] : kCases) {
     Pc pc;
-    for (const Step& step : test.steps) {
+    for (const Step& step : steps) {
       pc.Do(step.changes);
       DWORD cookie = 0;
       EXPECT_EQ(step.act == kRun       ? pc.Notify()
                 : step.act == kAdviseB ? pc.point->Advise(&pc.b, &cookie)
                                        : pc.point->Unadvise(2),
                 S_OK);
-      EXPECT_EQ(Taken(pc.log), step.log) << test.what;
+      EXPECT_EQ(Taken(pc.log), step.log) << what;
     }
   }
 }

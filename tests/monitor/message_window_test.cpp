@@ -118,27 +118,23 @@ TEST(MessageWindow, AnswersZeroForDeviceMessagesAndForExceptions) {
 
 // A failure to make the window ends the program with the system's code, told in a box.
 TEST(MessageWindow, EndsTheProcessWithoutAWindow) {
-  const struct {
-    const char* what;
-    std::vector<CallOrder> orders;
-    std::optional<std::u16string> text;
-  } kCases[] = {
+  const std::tuple<const char*, std::vector<CallOrder>, std::optional<std::u16string>> kCases[] = {
       {"window", {{DesktopCall::CreateWindowExW, 1, 1400}}, u"Invalid window handle.\r\n"},
       {"class", {{DesktopCall::RegisterClassW, 1, 5}}, u"Access is denied.\r\n"},
       {"unknown code", {{DesktopCall::CreateWindowExW, 1, 0xDEAD}}, std::nullopt},
       {"no text", {{DesktopCall::RegisterClassW, 1, 5}, {DesktopCall::FormatMessageW, 1, 8}}, std::nullopt},
   };
-  for (const auto& test : kCases) {
-    SCOPED_TRACE(test.what);
+  for (const auto& [what, orders, text] : kCases) {
+    SCOPED_TRACE(what);
     MonitorProcess process;
-    for (const CallOrder& order : test.orders) process.desktop.Order(order);
+    for (const CallOrder& order : orders) process.desktop.Order(order);
     const LoopRun run(process);
     const auto exit = process.desktop.Exit();
     ASSERT_TRUE(exit);
-    EXPECT_EQ(exit->code, test.orders[0].error);
+    EXPECT_EQ(exit->code, orders[0].error);
     const auto boxes = process.desktop.Boxes();
     ASSERT_EQ(boxes.size(), 1u);
-    EXPECT_EQ(boxes[0].text, test.text);
+    EXPECT_EQ(boxes[0].text, text);
     EXPECT_EQ(boxes[0].caption, std::nullopt);
     EXPECT_TRUE(boxes[0].owner == 0 && boxes[0].type == 0);
     EXPECT_EQ(run.result, std::nullopt) << "the thread went on";

@@ -6,27 +6,24 @@ namespace KelvoUHW {
 namespace {
 
 TEST(ThreadLock, IsAskedForEvery50Milliseconds) {
-  const struct {
-    std::uint32_t held;
-    std::size_t waiting;
-    std::uint64_t taken;
-  } kCases[] = {{49, 1, 50}, {50, 1, 100}, {120, 3, 150}};
-  for (const auto& test : kCases) {
+  // How long it is held, how many wait, when they have it.
+  const std::tuple<std::uint32_t, std::size_t, std::uint64_t> kCases[] = {{49, 1, 50}, {50, 1, 100}, {120, 3, 150}};
+  for (const auto& [held, waiting, expected] : kCases) {
     MonitorProcess process;
     CThreadLock lock;
     std::vector<std::uint64_t> taken;
     lock.Lock();
-    for (std::size_t i = 0; i < test.waiting; ++i) {
+    for (std::size_t i = 0; i < waiting; ++i) {
       process.Launch([&] {
         const ThreadLockGuard guard(lock);
         taken.push_back(process.desktop.Now());
       });
     }
-    process.desktop.RunFor(test.held);
+    process.desktop.RunFor(held);
     lock.Unlock();
     process.desktop.Settle();
-    EXPECT_EQ(taken, std::vector(test.waiting, test.taken));
-    EXPECT_EQ(process.desktop.Sleeps().size(), test.taken / 50 * test.waiting);
+    EXPECT_EQ(taken, std::vector(waiting, expected));
+    EXPECT_EQ(process.desktop.Sleeps().size(), expected / 50 * waiting);
   }
 }
 

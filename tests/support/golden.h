@@ -9,11 +9,12 @@
 
 namespace testing_support {
 
-// The file, byte for byte.
-inline std::string Golden(const std::string& name) {
-  std::ifstream stream(ZKUSB_SOURCE_DIR "/tests/golden/" + name + ".txt", std::ios::binary);
-  EXPECT_TRUE(stream) << name;
+// A file of the project, byte for byte.
+inline std::string Contents(const std::string& file) {
+  std::ifstream stream(ZKUSB_SOURCE_DIR "/" + file, std::ios::binary);
+  EXPECT_TRUE(stream) << file;
   return {std::istreambuf_iterator<char>(stream), {}};
 }
+inline std::string Golden(const std::string& name) { return Contents("tests/golden/" + name + ".txt"); }
 
 }  // namespace testing_support

@@ -12,10 +12,7 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
   const TemporaryFile noSteps("{}");
   const TemporaryFile badStep(R"({"steps": [{"at": 5, "unplug": "USB\\NO\\1"}]})");
   const std::string usage, bogus = unknownMember.Path();
-  const struct {
-    Args args;
-    std::string file, reason;
-  } cases[] = {
+  const std::tuple<Args, std::string, std::string> cases[] = {
       {{}, usage, "a command is needed"},
       {{"list"}, usage, "not expected: list"},
       {{"tree", "dump"}, usage, "dump"},

@@ -16,10 +16,7 @@ std::string Written(const std::function<void(Writer&)>& write) {
 }
 
 TEST(Writer, EscapesWhatATerminalWouldObey) {
-  const struct {
-    std::u16string text;
-    std::string line;
-  } cases[] = {
+  const std::pair<std::u16string, std::string> cases[] = {
       {u"\\\\?\\Volume{1}\\", "\\\\?\\Volume{1}\\\n"},
       {u"\x1B[2J\r\n\t", "\\x1B[2J\\x0D\\x0A\\x09\n"},
       {std::u16string(u"a\0b", 3), "a\\x00b\n"},
