@@ -4,9 +4,11 @@
 
 #include <algorithm>
 #include <random>
+#include <sstream>
 
 #include "module/scripts.h"
 #include "platform/wrappers/failing_registry.h"
+#include "tests/support/golden.h"
 #include "tests/support/registry_lines.h"
 
 namespace KelvoUHW {
@@ -35,48 +37,26 @@ void FillWithOthers(platform::Registry& registry) {
 const Lines kOthers = {"Old",          "Old  (default) = \"default\"", "Old  Value = \"theirs\"",
                        "Old\\Foreign", "Old\\Foreign\\Deep",           "Old\\Foreign\\Deep  (default) = \"x\""};
 
-Lines Together(const Lines& more, const Lines& others = kOthers) {
-  Lines all = more;
-  const auto behind = [&](const std::string& line) { return others.empty() || line > others.front(); };
-  all.insert(std::ranges::find_if(all, behind), others.begin(), others.end());
-  return all;
+// A script of the list, and what is there after registering and after unregistering then.
+struct ScriptCase {
+  std::u16string script;
+  Lines written, left;
+};
+std::vector<ScriptCase> ScriptCases() {
+  std::vector<ScriptCase> cases;
+  std::istringstream file(testing_support::Golden("registry-scripts"));
+  for (std::string line; std::getline(file, line);) {
+    const std::string text = line.substr(std::min<std::size_t>(2, line.size()));
+    if (line[0] == '>') cases.push_back({platform::FromUtf8(text), {}, {}});
+    if (line[0] == ' ' || line[0] == '-') cases.back().written.push_back(text);
+    if (line[0] == ' ') cases.back().left.push_back(text);
+  }
+  EXPECT_EQ(cases.size(), 14u);
+  return cases;
 }
 
 TEST(Registrar, WritesAndRemovesWhatAScriptSays) {
-  const Lines kDeepOld(kOthers.begin() + 3, kOthers.end());
-  // The script, and what is there after registering and after unregistering then.
-  const std::tuple<std::u16string, Lines, Lines> kCases[] = {
-      {u"", kOthers, kOthers},
-      {u"HKCR { } hkey_classes_root { A }", Together({"A"}), kOthers},
-      {u"HKCR { A = s 'x' B = s y }", Together({"A", "A  (default) = \"x\"", "B", "B  (default) = \"y\""}), kOthers},
-      {u"HKCR { A { B { C } val V = S 'v' } }", Together({"A", "A  V = \"v\"", "A\\B", "A\\B\\C"}), kOthers},
-      // Marks count only where they stand alone; quoted ones and key words in quotes are names.
-      {u"HKCR { A{ = s 'x}' 'NoRemove' { '}' '{' = s '=' } }",
-       Together({"A{", "A{  (default) = \"x}\"", "NoRemove", "NoRemove\\{", "NoRemove\\{  (default) = \"=\"",
-                 "NoRemove\\}"}),
-       kOthers},
-      {u"HKCR { 'A''s key' = s 'it''s ''''''' 'B'= s '' }",
-       Together({"A's key", "A's key  (default) = \"it's '''\"", "B", "B  (default) = \"\""}), kOthers},
-      {u"HKCR { '%NAME% 1' = s '%name%: %QUOTED%' }",
-       Together({"Some Name 1", "Some Name 1  (default) = \"Some Name: it's\""}), kOthers},
-      {u"HKCR { A = s '%%%PERCENT%%%' }", Together({"A", "A  (default) = \"%100%NAME%%\""}), kOthers},
-      {u"HKCR { %WORDS% }", Together({"B", "B\\C", "D"}), kOthers},
-      {u"HKCR { A = d 42 B = d '&HfFFFffff' C = b '00fF' D = b '' }",
-       Together({"A", "A  (default) = dword 0x0000002A", "B", "B  (default) = dword 0xFFFFFFFF", "C",
-                 "C  (default) = type 3: 00 FF", "D", "D  (default) = type 3:"}),
-       kOthers},
-      {u"HKCR { noremove A { B NoRemove C val V = s 'v' NoRemove val W = s 'w' } }",
-       Together({"A", "A  V = \"v\"", "A  W = \"w\"", "A\\B", "A\\C"}), Together({"A", "A  W = \"w\"", "A\\C"})},
-      // Keys of others: what they hold is overwritten where it is named; a key that is kept for their
-      // subkey keeps its default value, named values go.
-      {u"HKCR { Old = s 'new' { val Value = s 'mine' Foreign { Mine } } }",
-       {"Old", "Old  (default) = \"new\"", "Old  Value = \"mine\"", kOthers[3], kOthers[4], kOthers[5],
-        "Old\\Foreign\\Mine"},
-       Together({"Old", "Old  (default) = \"new\""}, kDeepOld)},
-      {u"HKCR { ForceRemove old = s 'new' { A } }", {"old", "old  (default) = \"new\"", "old\\A"}, {}},
-      {u"HKCR { Old { Delete FOREIGN } B { Delete A } }", Together({"B", kOthers[0], kOthers[1], kOthers[2]}, {}), {}},
-  };
-  for (const auto& [script, written, left] : kCases) {
+  for (const auto& [script, written, left] : ScriptCases()) {
     SCOPED_TRACE(platform::ToUtf8(script));
     SimulatedRegistry registry;
     FillWithOthers(registry);

@@ -136,51 +136,52 @@ TEST_F(EventNotifier, FiresInOrderWhatSitsOnHubPorts) {
 // connected. A does it in its first call.
 TEST_F(EventNotifier, SinksActInsideACall) {
   const std::string all = "A 1 d1, B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c";
-  const auto unadvise = [](Scene& s, DWORD cookie) { EXPECT_EQ(s.point->Unadvise(cookie), S_OK); };
   const struct {
     const char* what;
-    std::function<void(Scene&)> act;
+    DWORD unadvised;                // 0: none
+    TestSink SceneParts::*advised;  // afterwards, into these slots
+    std::vector<DWORD> slots;
     std::string log;
+    std::function<void(Scene&)> act = {};
     const char* out = "";
   } kCases[] = {
-      {"throws: the others miss this device", [](Scene&) { throw 3; }, "A 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c", kCaught},
-      {"unadvises itself",
-       [&](Scene& s) {
-         unadvise(s, 1);
-         EXPECT_EQ(s.point->Unadvise(1), CONNECT_E_NOCONNECTION);
-         EXPECT_GE(s.a.References(), 2) << "kept while it is called";
-       },
-       "A 1 d1, B 1 d1, B 1 d2, B 0 c"},
-      {"unadvises the next",
-       [&](Scene& s) {
-         unadvise(s, 2);
-         EXPECT_EQ(s.b.References(), 1);
-       },
-       "A 1 d1, A 1 d2, A 0 c"},
-      {"advises another, into a slot of this round", [](Scene& s) { EXPECT_EQ(s.Advise(s.c), 3u); },
+      {"unadvises itself", 1, nullptr, {}, "A 1 d1, B 1 d1, B 1 d2, B 0 c"},
+      {"unadvises the next", 2, nullptr, {}, "A 1 d1, A 1 d2, A 0 c"},
+      {"advises another, into a slot of this round",
+       0,
+       &Scene::c,
+       {3},
        "A 1 d1, C 0 c, B 1 d1, C 1 d1, A 1 d2, B 1 d2, C 1 d2, A 0 c, B 0 c, C 0 c"},
-      {"advises itself again: told once for each slot", [](Scene& s) { EXPECT_EQ(s.Advise(s.a), 3u); },
+      {"advises itself again: told once for each slot",
+       0,
+       &Scene::a,
+       {3},
        "A 1 d1, A 0 c, A 0 c, B 1 d1, A 1 d1, A 1 d2, B 1 d2, A 1 d2, A 0 c, B 0 c, A 0 c"},
-      {"leaves and comes again",
-       [&](Scene& s) {
-         unadvise(s, 1);
-         EXPECT_EQ(s.Advise(s.a), 1u);
-       },
-       "A 1 d1, A 0 c, B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c"},
+      {"leaves and comes again", 1, &Scene::a, {1}, "A 1 d1, A 0 c, B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c"},
       {"advises another, into a slot that was passed",
-       [&](Scene& s) {
-         unadvise(s, 1);
-         EXPECT_EQ(s.Advise(s.c), 1u);
-       },
+       1,
+       &Scene::c,
+       {1},
        "A 1 d1, C 0 c, B 1 d1, C 1 d2, B 1 d2, C 0 c, B 0 c"},
       {"advises many: the fifth slot is called from the next device on",
-       [](Scene& s) {
-         for (const DWORD slot : {3u, 4u, 5u}) EXPECT_EQ(s.Advise(s.c), slot);
-       },
+       0,
+       &Scene::c,
+       {3, 4, 5},
        "A 1 d1, C 0 c, C 0 c, C 0 c, C 0 c, C 0 c, C 0 c, B 1 d1, C 1 d1, C 1 d1, A 1 d2, B 1 d2, C 1 d2, C 1 d2, "
        "C 1 d2, A 0 c, B 0 c, C 0 c, C 0 c, C 0 c"},
-      {"starts a run of its own", [](Scene& s) { EXPECT_EQ(s.Notify(), S_OK); },
-       "A 1 d1, " + all + ", B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c"},
+      {"starts a run of its own",
+       0,
+       nullptr,
+       {},
+       "A 1 d1, " + all + ", B 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c",
+       [](Scene& s) { EXPECT_EQ(s.Notify(), S_OK); }},
+      {"throws: the others miss this device",
+       0,
+       nullptr,
+       {},
+       "A 1 d1, A 1 d2, B 1 d2, A 0 c, B 0 c",
+       [](Scene&) { throw 3; },
+       kCaught},
   };
   for (const auto& test : kCases) {
     SCOPED_TRACE(test.what);
@@ -189,9 +190,17 @@ TEST_F(EventNotifier, SinksActInsideACall) {
     scene.Advise(scene.a);
     scene.Advise(scene.b);
     scene.log.clear();
-    bool done = false;
-    scene.a.onEvent = [&] {
-      if (!std::exchange(done, true)) test.act(scene);
+    scene.a.onEvent = [&, done = false]() mutable {
+      if (std::exchange(done, true)) return S_OK;
+      if (test.unadvised != 0) {
+        for (const HRESULT result : {S_OK, CONNECT_E_NOCONNECTION}) {
+          EXPECT_EQ(scene.point->Unadvise(test.unadvised), result);
+        }
+        EXPECT_GE(scene.a.References(), 2) << "kept while it is called";
+        EXPECT_EQ(scene.b.References(), test.unadvised == 2 ? 1 : 2);
+      }
+      for (const DWORD slot : test.slots) EXPECT_EQ(scene.Advise(scene.*test.advised), slot);
+      if (test.act) test.act(scene);
       return S_OK;
     };
     testing::internal::CaptureStdout();

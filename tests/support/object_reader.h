@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <type_traits>
 #include <utility>
 #include <vector>
 
@@ -31,20 +32,19 @@ void ForEachNode(IZKUMUsbTreeNodeEnumerator& nodes, Visit visit) {
   }
 }
 
-template <class Interface, class Visit>
-void ReadText(Interface& object, const char* name, HRESULT (STDMETHODCALLTYPE Interface::*get)(BSTR*), Visit& visit) {
-  BSTR text = nullptr;
-  const HRESULT result = (object.*get)(&text);
-  const Variant owner = Variant::OfBstr(text);
-  visit(name, result, platform::BstrText(text));
-}
-
-template <class Interface, class Number, class Visit>
-void ReadNumber(Interface& object, const char* name, HRESULT (STDMETHODCALLTYPE Interface::*get)(Number*),
-                Visit& visit) {
-  Number value{};
+// Calls visit(name, result, value) for the properties of an object: a name, its getter, the next name, its getter, ...
+template <class Visit, class Interface, class Value, class... More>
+void ReadAll(Interface& object, Visit& visit, const char* name, HRESULT (STDMETHODCALLTYPE Interface::*get)(Value*),
+             More... more) {
+  Value value{};
   const HRESULT result = (object.*get)(&value);
-  visit(name, result, static_cast<std::int64_t>(value));
+  if constexpr (std::is_same_v<Value, BSTR>) {
+    const Variant owner = Variant::OfBstr(value);
+    visit(name, result, platform::BstrText(value));
+  } else {
+    visit(name, result, static_cast<std::int64_t>(value));
+  }
+  if constexpr (sizeof...(more) != 0) ReadAll(object, visit, more...);
 }
 
 // Calls visit(element) for each VARIANT of a collection; the result is that of making it.
@@ -59,14 +59,10 @@ HRESULT ForEachElement(Interface& object, HRESULT (STDMETHODCALLTYPE Interface::
 
 template <class Visit>
 void ReadInfo(IZKUMInfoDevice& info, Visit& visit) {
-  ReadText(info, "Service", &IZKUMInfoDevice::get_Service, visit);
-  ReadText(info, "FriendlyName", &IZKUMInfoDevice::get_FriendlyName, visit);
-  ReadText(info, "Location", &IZKUMInfoDevice::get_Location, visit);
-  ReadText(info, "Manufacturer", &IZKUMInfoDevice::get_Manufacturer, visit);
-  ReadText(info, "HardwareId", &IZKUMInfoDevice::get_HardwareId, visit);
-  ReadText(info, "PhysicalName", &IZKUMInfoDevice::get_PhysicalName, visit);
-  ReadText(info, "DevClass", &IZKUMInfoDevice::get_DevClass, visit);
-  ReadText(info, "EnumName", &IZKUMInfoDevice::get_EnumName, visit);
+  ReadAll(info, visit, "Service", &IZKUMInfoDevice::get_Service, "FriendlyName", &IZKUMInfoDevice::get_FriendlyName,
+          "Location", &IZKUMInfoDevice::get_Location, "Manufacturer", &IZKUMInfoDevice::get_Manufacturer, "HardwareId",
+          &IZKUMInfoDevice::get_HardwareId, "PhysicalName", &IZKUMInfoDevice::get_PhysicalName, "DevClass",
+          &IZKUMInfoDevice::get_DevClass, "EnumName", &IZKUMInfoDevice::get_EnumName);
   GUID guid{};
   const HRESULT result = info.get_ClassGuid(&guid);
   visit("ClassGuid", result, std::u16string_view(platform::GuidText(platform::FromSystemGuid(guid))));
@@ -74,28 +70,24 @@ void ReadInfo(IZKUMInfoDevice& info, Visit& visit) {
 
 template <class Visit>
 void ReadPortDevice(IZKUMPortDevice& device, Visit& visit) {
-  ReadText(device, "Product", &IZKUMPortDevice::get_Product, visit);
-  ReadText(device, "Manufacturer1", &IZKUMPortDevice::get_Manufacturer1, visit);
-  ReadNumber(device, "Speed", &IZKUMPortDevice::get_Speed, visit);
-  ReadNumber(device, "NumberInterfaces", &IZKUMPortDevice::get_NumberInterfaces, visit);
+  ReadAll(device, visit, "Product", &IZKUMPortDevice::get_Product, "Manufacturer1", &IZKUMPortDevice::get_Manufacturer1,
+          "Speed", &IZKUMPortDevice::get_Speed, "NumberInterfaces", &IZKUMPortDevice::get_NumberInterfaces);
   const HRESULT result =
       ForEachElement(device, &IZKUMPortDevice::get_InterfaceDescriptors, [&](const Variant& element) {
         const auto descriptor = ComPtr<IUnknown>(element.punkVal).template As<IZKUMInterfaceDescr>();
-        ReadNumber(*descriptor.Get(), "InterfaceClass", &IZKUMInterfaceDescr::get_InterfaceClass, visit);
-        ReadNumber(*descriptor.Get(), "InterfaceSubClass", &IZKUMInterfaceDescr::get_InterfaceSubClass, visit);
-        ReadNumber(*descriptor.Get(), "InterfaceProtocol", &IZKUMInterfaceDescr::get_InterfaceProtocol, visit);
+        ReadAll(*descriptor.Get(), visit, "InterfaceClass", &IZKUMInterfaceDescr::get_InterfaceClass,
+                "InterfaceSubClass", &IZKUMInterfaceDescr::get_InterfaceSubClass, "InterfaceProtocol",
+                &IZKUMInterfaceDescr::get_InterfaceProtocol);
       });
   visit("InterfaceDescriptors", result, std::u16string_view());
 }
 
 template <class Visit>
 void ReadInterfaceDevice(IZKUMInterfaceDevice& device, Visit& visit) {
-  ReadText(device, "VolumeName", &IZKUMInterfaceDevice::get_VolumeName, visit);
-  ReadText(device, "VendorId", &IZKUMInterfaceDevice::get_VendorId, visit);
-  ReadText(device, "ProductId", &IZKUMInterfaceDevice::get_ProductId, visit);
-  ReadText(device, "ProductRev", &IZKUMInterfaceDevice::get_ProductRev, visit);
-  ReadText(device, "DevicePath", &IZKUMInterfaceDevice::get_DevicePath, visit);
-  ReadText(device, "MountPoint", &IZKUMInterfaceDevice::get_MountPoint, visit);
+  ReadAll(device, visit, "VolumeName", &IZKUMInterfaceDevice::get_VolumeName, "VendorId",
+          &IZKUMInterfaceDevice::get_VendorId, "ProductId", &IZKUMInterfaceDevice::get_ProductId, "ProductRev",
+          &IZKUMInterfaceDevice::get_ProductRev, "DevicePath", &IZKUMInterfaceDevice::get_DevicePath, "MountPoint",
+          &IZKUMInterfaceDevice::get_MountPoint);
   const HRESULT result = ForEachElement(device, &IZKUMInterfaceDevice::get_MountPoints, [&](const Variant& element) {
     visit("one of MountPoints", S_OK, platform::BstrText(element.bstrVal));
   });
@@ -106,26 +98,22 @@ void ReadInterfaceDevice(IZKUMInterfaceDevice& device, Visit& visit) {
 // nodes and for ToString. A value is a text or a number.
 template <class Visit>
 void ReadProperties(const ComPtr<IZKUMUsbTreeNode>& node, Visit visit) {
-  ReadText(*node.Get(), "InstanceId", &IZKUMUsbTreeNode::get_InstanceId, visit);
-  ReadNumber(*node.Get(), "Type", &IZKUMUsbTreeNode::get_Type, visit);
+  ReadAll(*node.Get(), visit, "InstanceId", &IZKUMUsbTreeNode::get_InstanceId, "Type", &IZKUMUsbTreeNode::get_Type);
   if (const auto device = node.As<IZKUMUsbDevice>()) {
-    ReadText(*device.Get(), "Description", &IZKUMUsbDevice::get_Description, visit);
-    ReadText(*device.Get(), "SerialNumber", &IZKUMUsbDevice::get_SerialNumber, visit);
-    ReadNumber(*device.Get(), "VendorId", &IZKUMUsbDevice::get_VendorId, visit);
-    ReadNumber(*device.Get(), "ProductId", &IZKUMUsbDevice::get_ProductId, visit);
-    ReadText(*device.Get(), "DriverKeyName", &IZKUMUsbDevice::get_DriverKeyName, visit);
-    ReadText(*device.Get(), "Vendor", &IZKUMUsbDevice::get_Vendor, visit);
-    ReadText(*device.Get(), "Product", &IZKUMUsbDevice::get_Product, visit);
+    ReadAll(*device.Get(), visit, "Description", &IZKUMUsbDevice::get_Description, "SerialNumber",
+            &IZKUMUsbDevice::get_SerialNumber, "VendorId", &IZKUMUsbDevice::get_VendorId, "ProductId",
+            &IZKUMUsbDevice::get_ProductId, "DriverKeyName", &IZKUMUsbDevice::get_DriverKeyName, "Vendor",
+            &IZKUMUsbDevice::get_Vendor, "Product", &IZKUMUsbDevice::get_Product);
   }
   if (const auto controller = node.As<IZKUMHostController>()) {
-    ReadText(*controller.Get(), "LeafName", &IZKUMHostController::get_LeafName, visit);
+    ReadAll(*controller.Get(), visit, "LeafName", &IZKUMHostController::get_LeafName);
   }
   if (const auto hub = node.As<IZKUMHubDevice>()) {
-    ReadText(*hub.Get(), "PathName", &IZKUMHubDevice::get_PathName, visit);
-    ReadText(*hub.Get(), "ConnectionName", &IZKUMHubDevice::get_ConnectionName, visit);
+    ReadAll(*hub.Get(), visit, "PathName", &IZKUMHubDevice::get_PathName, "ConnectionName",
+            &IZKUMHubDevice::get_ConnectionName);
   }
   if (const auto port = node.As<IZKUMHubPort>()) {
-    ReadNumber(*port.Get(), "PortIndex", &IZKUMHubPort::get_PortIndex, visit);
+    ReadAll(*port.Get(), visit, "PortIndex", &IZKUMHubPort::get_PortIndex);
   }
   if (const auto device = node.As<IZKUMPortDevice>()) ReadPortDevice(*device.Get(), visit);
   if (const auto info = node.As<IZKUMInfoDevice>()) ReadInfo(*info.Get(), visit);
@@ -157,7 +145,7 @@ std::size_t WalkChilds(const ComPtr<IZKUMUsbTreeNode>& root, Visit visit) {
 inline std::u16string InstanceIdOf(const ComPtr<IZKUMUsbTreeNode>& node) {
   std::u16string id;
   auto keep = [&](const char*, HRESULT, std::u16string_view text) { id = text; };
-  if (node) ReadText(*node.Get(), "InstanceId", &IZKUMUsbTreeNode::get_InstanceId, keep);
+  if (node) ReadAll(*node.Get(), keep, "InstanceId", &IZKUMUsbTreeNode::get_InstanceId);
   return id;
 }
 
@@ -166,7 +154,7 @@ inline std::u16string DumpOf(const ComPtr<IZKUMUsbTreeNode>& node) {
   std::u16string dump;
   auto keep = [&](const char*, HRESULT, std::u16string_view text) { dump = text; };
   if (const auto device = node.As<IZKUMUsbDevice>()) {
-    ReadText(*device.Get(), "ToString", &IZKUMUsbDevice::get_ToString, keep);
+    ReadAll(*device.Get(), keep, "ToString", &IZKUMUsbDevice::get_ToString);
   }
   return dump;
 }
