@@ -1,5 +1,4 @@
-// The tree of a real PC, read while each allocation in turn fails: texts with the system's allocator, all else
-// with ours.
+// The tree of a real PC, read while each allocation in turn fails: texts are the system's, all else is ours.
 #include <gmock/gmock.h>
 
 #include "platform/simulated/machine_file.h"
@@ -14,20 +13,6 @@ namespace {
 void LetGo(IUnknown* object) { object->Release(); }
 void LetGo(char16_t* text) { SysFreeString(text); }
 
-// What came of a call, without any memory of its own.
-struct Outcome {
-  HRESULT code = S_OK;
-  bool cleared = false;  // the out pointer
-};
-template <class T, class Call>
-Outcome Try(Call call) {
-  T* out = Mark<T>();
-  const HRESULT code = call(&out);
-  const Outcome outcome{code, out == nullptr};
-  if (code == S_OK) LetGo(out);
-  return outcome;
-}
-
 class ComMemory : public ComObjects {
  protected:
   ComMemory() {
@@ -41,21 +26,27 @@ class ComMemory : public ComObjects {
   ~ComMemory() override { EXPECT_EQ(Rings(), m_rings); }
 
   // Fails the 1st, 2nd, ... allocation until there is none left; returns how many there were.
-  template <class Call>
+  template <class T, class Call>
   std::uint64_t FailEach(std::initializer_list<HRESULT> codes, Call call) {
     const std::int32_t objects = ModuleLockCount();
     const std::int64_t texts = platform::native::CountBstrs().alive;
     for (std::uint64_t allocation = 1;; ++allocation) {
-      bool failed = false;
-      const Outcome outcome = WithoutAllocation(allocation, failed, call);
+      T* out = Mark<T>();
+      bool failed = false, cleared = false;
+      const HRESULT code = WithoutAllocation(allocation, failed, [&] {
+        const HRESULT result = call(&out);
+        cleared = out == nullptr;
+        if (result == S_OK) LetGo(out);
+        return result;
+      });
       EXPECT_EQ(ModuleLockCount(), objects) << allocation;
       EXPECT_EQ(platform::native::CountBstrs().alive, texts) << allocation;
       if (!failed) {
-        EXPECT_EQ(outcome.code, S_OK);
+        EXPECT_EQ(code, S_OK);
         return allocation - 1;
       }
-      EXPECT_THAT(codes, testing::Contains(outcome.code)) << allocation;
-      EXPECT_TRUE(outcome.cleared) << allocation;
+      EXPECT_THAT(codes, testing::Contains(code)) << allocation;
+      EXPECT_TRUE(cleared) << allocation;
       if (HasFailure()) return 0;
     }
   }
@@ -83,21 +74,18 @@ TEST_F(ComMemory, ListsAndCollectionsOfEveryNode) {
 
   // The collection of a new object, with which it goes.
   const auto failCollection = [&](const NodePtr& node, auto getter) {
-    return FailEach({E_OUTOFMEMORY}, [&] {
-      return Try<IEnumVARIANT>([&](auto out) {
-        *out = nullptr;
-        ComPtr<IZKUMUsbTreeNode> object;
-        const HRESULT result = CreateNodeObject(node, object.Put());
-        return FAILED(result) ? result : getter(object.Get(), out);
-      });
+    return FailEach<IEnumVARIANT>({E_OUTOFMEMORY}, [&](auto out) {
+      *out = nullptr;
+      ComPtr<IZKUMUsbTreeNode> object;
+      const HRESULT result = CreateNodeObject(node, object.Put());
+      return FAILED(result) ? result : getter(object.Get(), out);
     });
   };
   std::uint64_t failures = 0;
   for (const NodePtr& node : all) {
     const auto object = Wrap(node);
-    failures += FailEach({E_POINTER, E_OUTOFMEMORY}, [&] {
-      return Try<IZKUMUsbTreeNodeEnumerator>([&](auto out) { return object->get_Childs(out); });
-    });
+    failures += FailEach<IZKUMUsbTreeNodeEnumerator>({E_POINTER, E_OUTOFMEMORY},
+                                                     [&](auto out) { return object->get_Childs(out); });
     failures +=
         node->m_nType == KUDTPortDevice        ? failCollection(node, &Read<&IZKUMPortDevice::get_InterfaceDescriptors>)
         : node->m_nType == KUDTInterfaceDevice ? failCollection(node, &Read<&IZKUMInterfaceDevice::get_MountPoints>)
@@ -109,14 +97,12 @@ TEST_F(ComMemory, ListsAndCollectionsOfEveryNode) {
 TEST_F(ComMemory, SubtreesAndDumpOfTheWholeTree) {
   const auto root = Wrap(builder.Root());
   for (std::int32_t kind = KUDTUnknown; kind <= KUDTInterfaceDevice; ++kind) {
-    FailEach({E_POINTER, E_OUTOFMEMORY}, [&] {
-      return Try<IZKUMUsbTreeNodeEnumerator>(
-          [&](auto out) { return root->get_InSubtreeDevicesOfType(static_cast<TUsbDeviceType>(kind), out); });
+    FailEach<IZKUMUsbTreeNodeEnumerator>({E_POINTER, E_OUTOFMEMORY}, [&](auto out) {
+      return root->get_InSubtreeDevicesOfType(static_cast<TUsbDeviceType>(kind), out);
     });
   }
-  const std::uint64_t failures = FailEach({E_OUTOFMEMORY}, [&] {
-    return Try<char16_t>([&](auto out) { return Read<&IZKUMUsbDevice::get_ToString>(root.Get(), out); });
-  });
+  const std::uint64_t failures = FailEach<char16_t>(
+      {E_OUTOFMEMORY}, [&](auto out) { return Read<&IZKUMUsbDevice::get_ToString>(root.Get(), out); });
   EXPECT_GT(failures, nodes.size());
 }
 

@@ -1,5 +1,4 @@
-// What COM asks of every object: which interfaces it answers for, one identity, exact reference counts, and
-// methods in their published slots.
+// What COM asks of every object: interfaces, one identity, exact reference counts, methods in their published slots.
 #include <functional>
 #include <sstream>
 

@@ -1,12 +1,6 @@
 // What clients see of whole PCs: every property of every node, the queries, trees that were replaced.
-#include <gtest/gtest.h>
-
 #include <filesystem>
-#include <iterator>
 #include <set>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "devinfo/info_device.h"
 #include "devinfo/interface_device.h"

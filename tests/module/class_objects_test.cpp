@@ -2,12 +2,10 @@
 #include <gmock/gmock.h>
 
 #include <array>
-#include <atomic>
 #include <barrier>
 #include <bit>
 #include <chrono>
 #include <thread>
-#include <vector>
 
 #include "com/usb_tree.h"
 #include "module/singleton.h"
@@ -15,6 +13,7 @@
 #include "tests/support/counting_sink.h"
 #include "tests/support/failing_memory.h"
 #include "tests/support/module_process.h"
+#include "tests/support/scripted_tree.h"
 
 namespace KelvoUHW {
 namespace {
@@ -26,27 +25,6 @@ using testing_support::CountingSink;
 constexpr HRESULT kNoResources = platform::native::ToHresult(0x800705AA);
 constexpr CLSID kUnknownClass{0x11111111, 1, 1, {1}};
 constexpr CLSID kInterfaceTableClass{0x00000323, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
-constexpr IID kInterfaceTable{0x00000146, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
-
-// The table of the process and its class object in one.
-struct FakeTable final : IClassFactory {
-  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
-    const bool known = iid == IUnknown::kIid || iid == IClassFactory::kIid || iid == kInterfaceTable;
-    *out = known ? this : nullptr;
-    if (known) AddRef();
-    return known ? S_OK : E_NOINTERFACE;
-  }
-  ULONG STDMETHODCALLTYPE AddRef() override { return ++references; }
-  ULONG STDMETHODCALLTYPE Release() override { return --references; }
-  HRESULT STDMETHODCALLTYPE CreateInstance(IUnknown*, REFIID iid, void** out) override {
-    ++created;
-    return QueryInterface(iid, out);
-  }
-  HRESULT STDMETHODCALLTYPE LockServer(BOOL) override { return E_NOTIMPL; }
-
-  ULONG references = 1;
-  int created = 0;
-};
 
 bool HasInstance(const CLSID& clsid) {
   return clsid == CLSID_ZKUMUsbTree ? SingletonState<CZKUMUsbTree, IUnknown>::s_pInstance != nullptr
@@ -264,25 +242,27 @@ TEST(Module, KeepsTheOrderOfItsVirtualOperations) {
 }
 
 TEST(Module, KeepsTheInterfaceTableOfTheProcess) {
-  FakeTable table;
+  // Any object will do.
+  ScriptedTree table;
+  table.alias = {0x00000146, 0, 0, {0xC0, 0, 0, 0, 0, 0, 0, 0x46}};
+  IClassFactory* const classObject = &table;
   DWORD cookie = 0;
-  ASSERT_EQ(CoRegisterClassObject(kInterfaceTableClass, &table, CLSCTX_INPROC_SERVER, 0, &cookie), S_OK);
+  ASSERT_EQ(CoRegisterClassObject(kInterfaceTableClass, classObject, CLSCTX_INPROC_SERVER, 0, &cookie), S_OK);
   CZKUsbMonitorModule module;
   EXPECT_EQ(module.GetGlobalInterfaceTable(nullptr), E_POINTER);
   for (int call = 0; call < 2; ++call) {
     ComPtr<IUnknown> out;
     EXPECT_EQ(module.GetGlobalInterfaceTable(out.Put()), S_OK);
-    EXPECT_EQ(out.Get(), &table);
-    EXPECT_EQ(table.created, 1);
-    EXPECT_EQ(table.references, 4u) << "the process, the module and the caller besides its own";
+    EXPECT_EQ(out.Get(), static_cast<IZKUMUsbTree*>(&table));
+    EXPECT_EQ(table.creations, 1);
+    EXPECT_EQ(References(classObject), 4u) << "the process, the module and the caller besides its own";
   }
   module.Unload();
-  EXPECT_EQ(table.references, 2u);
+  EXPECT_EQ(References(classObject), 2u);
   ComPtr<IUnknown> out;
   EXPECT_EQ(module.GetGlobalInterfaceTable(out.Put()), E_UNEXPECTED);
   EXPECT_FALSE(out);
   EXPECT_EQ(CoRevokeClassObject(cookie), S_OK);
-  EXPECT_EQ(table.references, 1u);
 }
 
 TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {

@@ -210,8 +210,7 @@ TEST_F(EventNotifier, SinksActInsideACall) {
   }
 }
 
-// A run that finds no memory ends without events, or loses those of one device; the lock is free and nothing is busy
-// afterwards.
+// A run that finds no memory ends without events, or loses those of one device; the lock is free again, nothing busy.
 TEST_F(EventNotifier, NotifiesWithoutMemory) {
   Scene scene;
   scene.Advise(scene.a);
@@ -269,8 +268,7 @@ TEST_F(EventNotifier, OtherThreadsWaitToAdviseAndNotToUnadvise) {
   const std::uint64_t start = desktop.Now();
   desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0));
   desktop.Settle();
-  // A and B left while A was called, and are not called any more; C is in a slot of this round already, and is told
-  // what is connected after the run.
+  // A and B left while A was called; C is in a slot of this round already, and told what is connected after the run.
   EXPECT_EQ(Taken(scene.log), "A 1 d, C 1 d, C 1 e");
   EXPECT_EQ(unadvised - start, 0u);
   EXPECT_EQ(advised - start, 150u);

@@ -1,11 +1,8 @@
 // Clients that come and go while broadcasts arrive, on the real clock. Made for the thread sanitizer.
-#include <gtest/gtest.h>
-
 #include <array>
 #include <atomic>
 #include <chrono>
 #include <thread>
-#include <vector>
 
 #include "monitor/usb_event_receiver.h"
 #include "tests/support/counting_sink.h"
@@ -28,8 +25,7 @@ struct Seen {
   std::atomic<int> inside = 0;  // threads that call sinks just now
 };
 
-// Calls of sinks on this thread: the notifier calls them on one thread at a time, which may call one from inside
-// another.
+// Calls of sinks on this thread, one from inside another: the notifier calls them on one thread at a time.
 thread_local int t_depth = 0;
 
 class BusySink final : public testing_support::Callable {
@@ -52,15 +48,8 @@ class BusySink final : public testing_support::Callable {
     return true;
   }
 
-  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
-    const bool known = iid == platform::IidOf<IUnknown>() || iid == DIID_IZKDeviceEventCallBack;
-    *out = known ? this : nullptr;
-    if (known) AddRef();
-    return known ? S_OK : E_NOINTERFACE;
-  }
-  ULONG STDMETHODCALLTYPE AddRef() override { return ++m_references; }
   ULONG STDMETHODCALLTYPE Release() override {
-    const ULONG left = --m_references;
+    const ULONG left = Callable::Release();
     if (left == 0) delete this;
     return left;
   }
@@ -89,7 +78,6 @@ class BusySink final : public testing_support::Callable {
 
   Seen& m_seen;
   IConnectionPoint& m_point;
-  std::atomic<ULONG> m_references = 1;
   std::atomic<DWORD> m_cookie = 0;  // 0 before the advise has returned, and after it was given back
 };
 

@@ -1,5 +1,4 @@
-// Objects of the component for tests: a tree with a node of each kind, calls whose outcome is a text, and a
-// fixture that counts what a test leaves behind.
+// Objects of the component: a tree with a node of each kind, calls whose outcome is a text, what a test leaves behind.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -89,8 +88,7 @@ HRESULT Read(IUnknown* object, Value* out) {
   return asked ? (asked.Get()->*Getter)(out) : E_NOINTERFACE;
 }
 
-// "CODE text", "CODE null" or "CODE untouched"; the code alone where no out pointer is given. `getter` takes
-// the out pointer.
+// "CODE text", "CODE null" or "CODE untouched"; the code alone where no out pointer is given to `getter`.
 template <class Getter>
 std::string TextOf(Getter getter, bool giveOut = true) {
   BSTR text = Mark<char16_t>();

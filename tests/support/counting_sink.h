@@ -11,23 +11,9 @@
 
 namespace testing_support {
 
-// Whoever fires an event knows the member and calls nothing but Invoke.
-struct Callable : IDispatch {
-  HRESULT STDMETHODCALLTYPE GetTypeInfoCount(UINT*) override { return Unexpected(); }
-  HRESULT STDMETHODCALLTYPE GetTypeInfo(UINT, LCID, ITypeInfo**) override { return Unexpected(); }
-  HRESULT STDMETHODCALLTYPE GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override { return Unexpected(); }
-
- private:
-  static HRESULT Unexpected() {
-    ADD_FAILURE() << "asked for types or names";
-    return E_NOTIMPL;
-  }
-};
-
-// Stands on the stack of a test, which has to give every reference back or end the process.
-class CountingSink final : public Callable {
+// Whoever fires an event knows the member and calls nothing but Invoke. Counts references, and deletes nothing.
+class Callable : public IDispatch {
  public:
-  std::size_t Events() const { return m_events; }
   LONG References() const { return m_references; }
 
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
@@ -39,6 +25,24 @@ class CountingSink final : public Callable {
   }
   ULONG STDMETHODCALLTYPE AddRef() override { return static_cast<ULONG>(++m_references); }
   ULONG STDMETHODCALLTYPE Release() override { return static_cast<ULONG>(--m_references); }
+  HRESULT STDMETHODCALLTYPE GetTypeInfoCount(UINT*) override { return Unexpected(); }
+  HRESULT STDMETHODCALLTYPE GetTypeInfo(UINT, LCID, ITypeInfo**) override { return Unexpected(); }
+  HRESULT STDMETHODCALLTYPE GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override { return Unexpected(); }
+
+ private:
+  static HRESULT Unexpected() {
+    ADD_FAILURE() << "asked for types or names";
+    return E_NOTIMPL;
+  }
+
+  std::atomic<LONG> m_references = 1;
+};
+
+// Stands on the stack of a test, which has to give every reference back or end the process.
+class CountingSink final : public Callable {
+ public:
+  std::size_t Events() const { return m_events; }
+
   HRESULT STDMETHODCALLTYPE Invoke(DISPID, REFIID, LCID, WORD, DISPPARAMS*, VARIANT*, EXCEPINFO*, UINT*) override {
     ++m_events;
     return S_OK;
@@ -46,7 +50,6 @@ class CountingSink final : public Callable {
 
  private:
   std::atomic<std::size_t> m_events = 0;
-  std::atomic<LONG> m_references = 1;
 };
 
 }  // namespace testing_support

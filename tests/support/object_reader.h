@@ -20,8 +20,7 @@ namespace testing_support {
 using KelvoUHW::ComPtr;
 using KelvoUHW::Variant;
 
-// Calls visit(result of GetCurrent, node) for each element of a list, in order; the node is empty where the call
-// failed.
+// Calls visit(result of GetCurrent, node) for each element of a list; the node is empty where the call failed.
 template <class Visit>
 void ForEachNode(IZKUMUsbTreeNodeEnumerator& nodes, Visit visit) {
   VARIANT_BOOL more = VARIANT_FALSE;
@@ -94,8 +93,7 @@ void ReadInterfaceDevice(IZKUMInterfaceDevice& device, Visit& visit) {
   visit("MountPoints", result, std::u16string_view());
 }
 
-// Calls visit(name, result, value) for each property of each interface the node has, but for those that lead to other
-// nodes and for ToString. A value is a text or a number.
+// The same for each interface of the node, but for what leads to other nodes and ToString. A value is text or number.
 template <class Visit>
 void ReadProperties(const ComPtr<IZKUMUsbTreeNode>& node, Visit visit) {
   ReadAll(*node.Get(), visit, "InstanceId", &IZKUMUsbTreeNode::get_InstanceId, "Type", &IZKUMUsbTreeNode::get_Type);
@@ -120,8 +118,7 @@ void ReadProperties(const ComPtr<IZKUMUsbTreeNode>& node, Visit visit) {
   if (const auto device = node.As<IZKUMInterfaceDevice>()) ReadInterfaceDevice(*device.Get(), visit);
 }
 
-// Calls visit(node) for every node of a subtree, parents before their children, and returns how many there were. A list
-// that cannot be had ends the branch.
+// Calls visit(node) for a subtree, parents first; returns the number of nodes. A list that cannot be had ends a branch.
 template <class Visit>
 std::size_t WalkChilds(const ComPtr<IZKUMUsbTreeNode>& root, Visit visit) {
   std::vector<ComPtr<IZKUMUsbTreeNode>> waiting{root};

@@ -28,6 +28,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
   std::function<void()> onBuild;
   std::string calls;  // "build list1 reset"
   int creations = 0;
+  IID alias{};  // answered for, too
 
   // A device with this id below a new hub port.
   NodePtr Device(const std::u16string& id) {
@@ -47,7 +48,7 @@ class ScriptedTree final : public IZKUMUsbTree, public IBuildUsbTree, public ICl
       *out = static_cast<IBuildUsbTree*>(this);
     } else if (iid == platform::IidOf<IClassFactory>()) {
       *out = static_cast<IClassFactory*>(this);
-    } else if (iid == platform::IidOf<IUnknown>() || iid == platform::IidOf<IZKUMUsbTree>()) {
+    } else if (iid == platform::IidOf<IUnknown>() || iid == platform::IidOf<IZKUMUsbTree>() || iid == alias) {
       *out = static_cast<IZKUMUsbTree*>(this);
     } else {
       return E_NOINTERFACE;

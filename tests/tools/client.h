@@ -1,5 +1,4 @@
-// Runs the client as a program of its own, since the component stays in a process that has used it,
-// over machine files as they are or changed by the test.
+// Runs the client as a program of its own, since the component stays in a process that has used it.
 #pragma once
 
 #include <gmock/gmock.h>

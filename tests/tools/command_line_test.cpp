@@ -83,7 +83,6 @@ TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
   EXPECT_EQ(Output({"--json", "tree", "--machine=" + file}), expected);
   EXPECT_NE(Output({"tree", "--machine", file}), expected);
 
-  // Help and version are no failures.
   EXPECT_THAT(Output({"--version"}), testing::MatchesRegex("zkusb .+\\..+\n"));
   const std::string help = Output({"--help"});
   for (const std::string line : {"tree", "dump", "find", "volumes", "watch", "register", "unregister", "--json"}) {

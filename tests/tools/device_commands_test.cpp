@@ -20,7 +20,7 @@ TEST(DeviceCommands, PrintWhatTheTranscriptShows) {
     EXPECT_EQ(Output(args), expected) << command;
     ++cases;
   }
-  EXPECT_EQ(cases, 7u);
+  EXPECT_EQ(cases, 8u);
 }
 
 TEST(VolumesCommand, ShowsVolumesThatAreNotMounted) {
