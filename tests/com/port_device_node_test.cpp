@@ -7,8 +7,8 @@
 namespace KelvoUHW {
 namespace {
 
-// Three interfaces, one of them in the longer form, with endpoints and a HID descriptor between them; a second
-// configuration descriptor and an interface that is cut off at the end do not count.
+// Three interfaces, one of them in the longer form; a second configuration and an interface that is cut off do not
+// count.
 std::unique_ptr<DescriptorRequest> Configuration() {
   auto request = std::make_unique<DescriptorRequest>();
   request->Data = {

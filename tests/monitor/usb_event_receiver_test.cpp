@@ -24,16 +24,15 @@ std::u16string Path(const std::u16string& id, const std::u16string& prefix = u"\
 }
 
 // A process whose receiver has started with a target.
-struct Monitor {
-  Monitor() : target(process.desktop) { started = receiver.Start(&target); }
+struct Monitor : MonitorProcess {
   // What the broadcast set off: the delays of the calls, each at its moment.
   std::vector<std::uint64_t> Send(std::uint32_t event, const DeviceBroadcast& broadcast) {
-    const std::uint64_t start = process.desktop.Now();
+    const std::uint64_t start = desktop.Now();
     const auto& calls = target.Calls();
     const std::size_t before = calls.size();
-    const platform::WindowHandle window = process.desktop.Windows().at(0).handle;
-    EXPECT_EQ(process.desktop.SendToWindow(window, kWM_DEVICECHANGE, event, RecordOf(broadcast)), 0);
-    process.desktop.Settle();
+    const platform::WindowHandle window = desktop.Windows().at(0).handle;
+    EXPECT_EQ(desktop.SendToWindow(window, kWM_DEVICECHANGE, event, RecordOf(broadcast)), 0);
+    desktop.Settle();
     std::vector<std::uint64_t> delays;
     for (std::size_t i = before; i < calls.size(); ++i) {
       EXPECT_EQ(calls[i], (RecordingTarget::Call{start + calls[i].delay, calls[i].delay, TRUE, true}));
@@ -42,10 +41,9 @@ struct Monitor {
     return delays;
   }
 
-  MonitorProcess process;
-  RecordingTarget target;
+  RecordingTarget target{desktop};
   CZKUMUsbEventReceiver receiver;
-  bool started = false;
+  const bool started = receiver.Start(&target);
 };
 
 TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
@@ -94,14 +92,14 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
       {"beyond 16 bits", 0x18000, VolumeBroadcast(0, u'E', 0), {}},
   };
   Monitor monitor;
-  std::uint64_t threads = monitor.process.desktop.Calls(DesktopCall::StartThread);
+  std::uint64_t threads = monitor.desktop.Calls(DesktopCall::StartThread);
   for (const auto& test : kCases) {
     EXPECT_EQ(monitor.Send(test.event, test.broadcast), test.delays) << test.what;
     threads += test.delays.size();
-    EXPECT_EQ(monitor.process.desktop.Calls(DesktopCall::StartThread), threads) << test.what;
+    EXPECT_EQ(monitor.desktop.Calls(DesktopCall::StartThread), threads) << test.what;
     // The answer to the window procedure says only whether a thread could be had.
     EXPECT_EQ(monitor.receiver.OnDeviceChange(test.event, RecordOf(test.broadcast)), TRUE) << test.what;
-    monitor.process.desktop.Settle();
+    monitor.desktop.Settle();
     threads += test.delays.size();
   }
   EXPECT_FALSE(CZKUMUsbEventReceiver::IsWatchedDevice(nullptr));
@@ -109,7 +107,7 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
 
 TEST(UsbEventReceiver, RegistersForEveryInterfaceOnceTheWindowIsThere) {
   Monitor monitor;
-  SimulatedDesktop& desktop = monitor.process.desktop;
+  SimulatedDesktop& desktop = monitor.desktop;
   EXPECT_TRUE(monitor.started);
   EXPECT_EQ(desktop.Now(), 10u);
   EXPECT_EQ(monitor.target.References(), 2);
@@ -165,8 +163,7 @@ TEST(UsbEventReceiver, StartFailsWithoutItsWindow) {
     EXPECT_EQ(process.desktop.Now(), 10u);
     process.desktop.RunFor(200);
   }
-  // The object is late, too: looked for every ten milliseconds. And a module that cannot be pinned
-  // is locked for good.
+  // The object is late, too: looked for every ten milliseconds. A module that cannot be pinned is locked for good.
   const std::int32_t locks = ModuleLockCount();
   {
     MonitorProcess process;
@@ -182,7 +179,7 @@ TEST(UsbEventReceiver, StartFailsWithoutItsWindow) {
 
 TEST(UsbEventReceiver, LosesABroadcastWithoutAThreadOrAnApartment) {
   Monitor monitor;
-  SimulatedDesktop& desktop = monitor.process.desktop;
+  SimulatedDesktop& desktop = monitor.desktop;
   const std::int32_t locks = ModuleLockCount();
   const DeviceBroadcast volume = VolumeBroadcast(kArrival, u'E', 0);
 
@@ -199,7 +196,7 @@ TEST(UsbEventReceiver, LosesABroadcastWithoutAThreadOrAnApartment) {
   HRESULT own = E_FAIL;
   ++g_nEventThreads;
   LockModule();
-  monitor.process.Launch([&] {
+  monitor.Launch([&] {
     EXPECT_EQ(CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED), S_OK);
     CZKUMUsbEventReceiver::NotifyThreadProc(nullptr);
     own = CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED);
@@ -219,7 +216,7 @@ TEST(UsbEventReceiver, LosesABroadcastWithoutAThreadOrAnApartment) {
 
 TEST(UsbEventReceiver, RunsEventThreadsOneAtATimeAndNotInTheirOrder) {
   Monitor monitor;
-  SimulatedDesktop& desktop = monitor.process.desktop;
+  SimulatedDesktop& desktop = monitor.desktop;
   monitor.target.onCall = [&] {
     const ThreadLockGuard again(g_notifyLock);  // the notifier takes it once more
     EXPECT_GE(ModuleLockCount(), 1);

@@ -3,10 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
-#include <utility>
-#include <vector>
-
 #include "com/com_ptr.h"
 #include "com/zkusb_monitor.h"
 #include "module/type_library.h"

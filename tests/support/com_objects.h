@@ -6,6 +6,7 @@
 #include <concepts>
 #include <cstdint>
 #include <cstring>
+#include <sstream>
 #include <string>
 #include <utility>
 #include <vector>
@@ -135,6 +136,30 @@ inline std::string WalkIds(IZKUMUsbTreeNodeEnumerator* list) {
     if (node) ids += (ids.empty() ? "" : " ") + InstanceId(node.Get()).substr(sizeof "S_OK");
   });
   return ids;
+}
+
+// What steps on a COM enumerator bring, "CODE..., CODE...": n2 asks next(enumerator, 2, true), n2! with false; s2 skips
+// two, r starts again, c goes on with a clone, which does not notice what the first one does.
+template <class Enumerator, class Next>
+std::string Play(ComPtr<Enumerator>& list, const std::string& steps, Next next) {
+  std::string outcome;
+  std::istringstream words(steps);
+  for (std::string step; words >> step;) {
+    const auto count = static_cast<ULONG>(step.size() > 1 ? std::stoul(step.substr(1)) : 0);
+    outcome += outcome.empty() ? "" : ", ";
+    if (step[0] == 'n') outcome += next(list.Get(), count, step.back() != '!');
+    if (step[0] == 's') outcome += CodeName(list->Skip(count));
+    if (step[0] == 'r') outcome += CodeName(list->Reset());
+    if (step[0] == 'c') {
+      ComPtr<Enumerator> clone;
+      outcome += CodeName(list->Clone(clone.Put()));
+      list->Skip(9);
+      list = clone;
+    }
+  }
+  EXPECT_EQ(list->Clone(nullptr), E_POINTER);
+  EXPECT_EQ(list->Next(1, nullptr, nullptr), E_POINTER);
+  return outcome;
 }
 
 // A record with an id and children.

@@ -4,11 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <optional>
-#include <utility>
-#include <vector>
 
-#include "com/com_ptr.h"
-#include "com/zkusb_monitor.h"
 #include "module/module.h"
 #include "platform/simulated/simulated_pc.h"
 #include "tests/support/com_objects.h"

@@ -1,13 +1,9 @@
 // A simulated process for tests of the monitor, and a target that event threads can call.
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <atomic>
 #include <cstring>
 #include <functional>
-#include <string>
-#include <utility>
 #include <vector>
 
 #include "com/module_lock.h"

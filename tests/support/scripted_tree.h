@@ -1,15 +1,10 @@
 // A tree object whose builds, codes and lists a test sets; it is its own class object.
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <array>
 #include <functional>
-#include <string>
-#include <vector>
 
 #include "com/private_interfaces.h"
-#include "com/zkusb_monitor.h"
 #include "tests/support/com_objects.h"
 
 namespace KelvoUHW {

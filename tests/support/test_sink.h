@@ -1,8 +1,6 @@
 // A client's sink that writes down what it is called with, and holds each call to its exact form.
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <array>
 #include <functional>
 #include <string>
@@ -10,7 +8,6 @@
 #include <vector>
 
 #include "com/com_ptr.h"
-#include "com/zkusb_monitor.h"
 #include "platform/text.h"
 #include "tests/support/counting_sink.h"
 

@@ -3,11 +3,8 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
 #include <utility>
-#include <vector>
 
-#include "com/com_ptr.h"
 #include "com/module_lock.h"
 #include "com/usb_tree.h"
 #include "platform/simulated/simulated_pc.h"

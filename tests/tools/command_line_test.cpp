@@ -55,17 +55,14 @@ TEST(CommandLine, SaysWhatWasNotFound) {
   const TemporaryFile noStick(
       R"({"steps": [{"wait": true}, {"unplug": "USB\\VID_0781&PID_5580\\AA010603160707470215"}]})");
   const std::string noController = "zkusb: no USB host controller found\n";
-  const struct {
-    Args args;
-    std::string message, out = "";
-  } cases[] = {
-      {{"dump", "--machine", storageOnly.Path()}, noController},
-      {{"tree", "--machine", storageOnly.Path()}, noController},
-      {{"volumes", "--machine", storageOnly.Path(), "--json"}, noController},
-      {{"find", "--vendor", "781", "--machine", controllersOnly.Path()}, noController},
-      {{"find", "--vendor", "0781", "--product", "5581"}, "zkusb: no device 0781:5581\n"},
+  const std::tuple<Args, std::string, std::string> cases[] = {
+      {{"dump", "--machine", storageOnly.Path()}, noController, ""},
+      {{"tree", "--machine", storageOnly.Path()}, noController, ""},
+      {{"volumes", "--machine", storageOnly.Path(), "--json"}, noController, ""},
+      {{"find", "--vendor", "781", "--machine", controllersOnly.Path()}, noController, ""},
+      {{"find", "--vendor", "0781", "--product", "5581"}, "zkusb: no device 0781:5581\n", ""},
       {{"find", "--vendor", "1", "--json"}, "zkusb: no device of vendor 0001\n", "[]\n"},
-      {{"volumes", "--script", noStick.Path()}, "zkusb: no device carries a volume or a drive letter\n"},
+      {{"volumes", "--script", noStick.Path()}, "zkusb: no device carries a volume or a drive letter\n", ""},
   };
   for (const auto& [args, message, out] : cases) {
     SCOPED_TRACE(testing::PrintToString(args));

@@ -102,8 +102,7 @@ TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
   }));
   const std::string text = Output({"tree", "--machine", file.Path()});
   // The name is shortened, not the mount points.
-  EXPECT_THAT(text, HasSubstr("├─ Port 3: full speed  0781:5580 SanDisk Corpora…  "
-                              "[D:, C:\\All sticks\\One]\n"));
+  EXPECT_THAT(text, HasSubstr("├─ Port 3: full speed  0781:5580 SanDisk Corpora…  [D:, C:\\All sticks\\One]\n"));
   EXPECT_THAT(text, HasSubstr("├─ Port 5: low speed  0000:0000 unknown device\n"));
   EXPECT_THAT(text, HasSubstr("└─ Ports 1-2, 4, 6-8: empty\n"));
   EXPECT_LE(WidestLine(text), 80);

@@ -39,10 +39,7 @@ TEST(Writer, FitsALineIntoItsColumns) {
   const auto times = [](std::size_t count, char16_t unit) { return std::u16string(count, unit); };
   std::u16string disks;
   while (disks.size() < 160) disks += u"\U0001F5B4";
-  const struct {
-    std::u16string head, middle, tail;
-    std::string line;
-  } cases[] = {
+  const std::tuple<std::u16string, std::u16string, std::u16string, std::string> cases[] = {
       {times(30, u'h'), u"middle", times(44, u't'), std::string(30, 'h') + "middle" + std::string(44, 't') + "\n"},
       {times(30, u'h'), u"middle", times(45, u't'), std::string(30, 'h') + "midd…" + std::string(45, 't') + "\n"},
       // No blank is left in front of the ellipsis.
