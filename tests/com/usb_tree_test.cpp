@@ -194,13 +194,8 @@ TEST(UsbTree, DeviceLists) {
 
 TEST(UsbTree, BuildsTellWhetherSomethingChanged) {
   TreeDesk desk(BarePc());
-  const struct {
-    const char* what;
-    Change change;
-    bool reset;  // the cache, behind the build before
-    HRESULT result;
-    const char* lists;
-  } steps[] = {
+  // The cache is reset, or not, behind the build before.
+  const std::tuple<const char*, Change, bool, HRESULT, const char*> steps[] = {
       {"nothing to report", {}, false, S_FALSE, "- | - | - | -"},
       {"a stick", Stick(u"S1", 1, u'E'), false, S_OK, "S1 | S1 | - | -"},
       {"no commit, so it comes once more", {}, false, S_OK, "S1 | S1 S1 | - | -"},

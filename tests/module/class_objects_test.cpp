@@ -36,21 +36,17 @@ TEST(ClassObjects, RefuseWhatTheyCannotMake) {
     ModuleProcess process;
     const ComPtr<IClassFactory> factory = process.Class(clsid);
     const LONG locks = ModuleLockCount();
-    const struct {
-      IUnknown* outer;
-      IID iid;
-      bool giveOut;
-      HRESULT result;
-    } kCases[] = {{nullptr, IUnknown::kIid, false, E_POINTER},
-                  {factory.Get(), IUnknown::kIid, false, E_POINTER},
-                  {factory.Get(), IUnknown::kIid, true, CLASS_E_NOAGGREGATION},
-                  {nullptr, IClassFactory::kIid, true, E_NOINTERFACE}};
-    for (const auto& test : kCases) {
+    const std::tuple<IUnknown*, IID, bool, HRESULT> kCases[] = {
+        {nullptr, IUnknown::kIid, false, E_POINTER},
+        {factory.Get(), IUnknown::kIid, false, E_POINTER},
+        {factory.Get(), IUnknown::kIid, true, CLASS_E_NOAGGREGATION},
+        {nullptr, IClassFactory::kIid, true, E_NOINTERFACE}};
+    for (const auto& [outer, iid, giveOut, result] : kCases) {
       void* object = Mark<void>();
-      EXPECT_EQ(factory->CreateInstance(test.outer, test.iid, test.giveOut ? &object : nullptr), test.result);
-      EXPECT_EQ(object, test.giveOut ? nullptr : Mark<void>());
+      EXPECT_EQ(factory->CreateInstance(outer, iid, giveOut ? &object : nullptr), result);
+      EXPECT_EQ(object, giveOut ? nullptr : Mark<void>());
       // A notifier that was made for nothing is there all the same, and the tree that it holds.
-      const bool made = test.result == E_NOINTERFACE && clsid == CLSID_ZKUMEventNotifier;
+      const bool made = result == E_NOINTERFACE && clsid == CLSID_ZKUMEventNotifier;
       EXPECT_EQ(HasInstance(clsid), made);
       EXPECT_EQ(ModuleLockCount(), locks + (made ? 2 : 0));
     }

@@ -50,12 +50,7 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
   const std::u16string watched = kWatchedPath;
   const auto bytesUpTo = [](const std::u16string& text) { return 28 + 2 * text.size(); };
   const std::u16string upToCut = watched.substr(0, watched.rfind(u'#') + 1);
-  const struct {
-    const char* what;
-    std::uint32_t event;
-    DeviceBroadcast broadcast;
-    std::vector<std::uint64_t> delays;
-  } kCases[] = {
+  const std::tuple<const char*, std::uint32_t, DeviceBroadcast, std::vector<std::uint64_t>> kCases[] = {
       {"volume came", kArrival, VolumeBroadcast(0, u'E', 0), {0}},
       {"volume went", kRemoval, VolumeBroadcast(0, u'E', 0), {0}},
       {"volume, its name not read", kArrival, NamedBroadcast(0, kVolume, u"x"), {0}},
@@ -93,14 +88,14 @@ TEST(UsbEventReceiver, StartsAnEventThreadForWhatMatters) {
   };
   Monitor monitor;
   std::uint64_t threads = monitor.desktop.Calls(DesktopCall::StartThread);
-  for (const auto& test : kCases) {
-    EXPECT_EQ(monitor.Send(test.event, test.broadcast), test.delays) << test.what;
-    threads += test.delays.size();
-    EXPECT_EQ(monitor.desktop.Calls(DesktopCall::StartThread), threads) << test.what;
+  for (const auto& [what, event, broadcast, delays] : kCases) {
+    EXPECT_EQ(monitor.Send(event, broadcast), delays) << what;
+    threads += delays.size();
+    EXPECT_EQ(monitor.desktop.Calls(DesktopCall::StartThread), threads) << what;
     // The answer to the window procedure says only whether a thread could be had.
-    EXPECT_EQ(monitor.receiver.OnDeviceChange(test.event, RecordOf(test.broadcast)), TRUE) << test.what;
+    EXPECT_EQ(monitor.receiver.OnDeviceChange(event, RecordOf(broadcast)), TRUE) << what;
     monitor.desktop.Settle();
-    threads += test.delays.size();
+    threads += delays.size();
   }
   EXPECT_FALSE(CZKUMUsbEventReceiver::IsWatchedDevice(nullptr));
 }
