@@ -9,7 +9,7 @@
 
 #include "platform/com.h"
 #include "tests/windows/module_files.h"
-#include "tests/windows/type_library_dump.h"
+#include "tools/type_library/type_library_dump.h"
 
 namespace {
 

@@ -1,9 +1,11 @@
-#include "tests/windows/type_library_dump.h"
+#include "tools/type_library/type_library_dump.h"
 
 #include <algorithm>
 #include <cstdio>
+#include <initializer_list>
 #include <iterator>
 #include <stdexcept>
+#include <string_view>
 #include <vector>
 
 #include "com/com_ptr.h"
@@ -32,6 +34,12 @@ std::string Number(unsigned long value, const char* format = "%lu") {
   return text;
 }
 
+std::string Join(std::initializer_list<std::string_view> parts) {
+  std::string text;
+  for (const std::string_view part : parts) text.append(part);
+  return text;
+}
+
 struct Flag {
   unsigned value;
   const char* name;
@@ -47,7 +55,7 @@ std::string Flags(unsigned flags, const Flag (&names)[Count]) {
     flags &= ~flag.value;
   }
   if (flags != 0) add(Number(flags, "0x%lX"));
-  return text.empty() ? "" : "[" + text + "]";
+  return text.empty() ? "" : Join({"[", text, "]"});
 }
 
 constexpr Flag kTypeFlags[] = {{TYPEFLAG_FCANCREATE, "can create"},
@@ -55,8 +63,10 @@ constexpr Flag kTypeFlags[] = {{TYPEFLAG_FCANCREATE, "can create"},
                                {TYPEFLAG_FDUAL, "dual"},
                                {TYPEFLAG_FNONEXTENSIBLE, "nonextensible"},
                                {TYPEFLAG_FOLEAUTOMATION, "oleautomation"}};
-constexpr Flag kParameterFlags[] = {{PARAMFLAG_FIN, "in"}, {PARAMFLAG_FOUT, "out"}, {PARAMFLAG_FRETVAL, "retval"}};
-constexpr Flag kImplementedFlags[] = {{IMPLTYPEFLAG_FDEFAULT, "default"}, {IMPLTYPEFLAG_FSOURCE, "source"}};
+constexpr Flag kParameterFlags[] = {
+    {PARAMFLAG_FIN, "in"}, {PARAMFLAG_FOUT, "out"}, {PARAMFLAG_FRETVAL, "retval"}};
+constexpr Flag kImplementedFlags[] = {{IMPLTYPEFLAG_FDEFAULT, "default"},
+                                      {IMPLTYPEFLAG_FSOURCE, "source"}};
 
 std::string Name(ITypeInfo& type, MEMBERID member = MEMBERID_NIL) {
   BSTR name = nullptr;
@@ -71,9 +81,9 @@ std::string Help(ITypeInfo& type, MEMBERID member = MEMBERID_NIL) {
   DWORD context = 0;
   Check(type.GetDocumentation(member, nullptr, &help, &context, &file), "GetDocumentation");
   std::string text = Take(help);
-  if (!text.empty()) text = " \"" + text + "\"";
+  if (!text.empty()) text = Join({" \"", text, "\""});
   const std::string helpFile = Take(file);
-  if (!helpFile.empty() || context != 0) text += " help " + helpFile + " " + Number(context);
+  if (!helpFile.empty() || context != 0) text += Join({" help ", helpFile, " ", Number(context)});
   return text;
 }
 
@@ -90,8 +100,9 @@ std::string NameOf(unsigned value, const Flag (&names)[Count], const char* other
   return found == std::end(names) ? other + Number(value) : found->name;
 }
 
-constexpr Flag kTypes[] = {{VT_BSTR, "BSTR"},         {VT_BOOL, "VARIANT_BOOL"}, {VT_I4, "long"},
-                           {VT_UI4, "unsigned long"}, {VT_UI1, "unsigned char"}, {VT_UNKNOWN, "IUnknown*"},
+constexpr Flag kTypes[] = {{VT_BSTR, "BSTR"},         {VT_BOOL, "VARIANT_BOOL"},
+                           {VT_I4, "long"},           {VT_UI4, "unsigned long"},
+                           {VT_UI1, "unsigned char"}, {VT_UNKNOWN, "IUnknown*"},
                            {VT_HRESULT, "HRESULT"},   {VT_VOID, "void"}};
 constexpr Flag kInvocations[] = {{INVOKE_FUNC, "method"}, {INVOKE_PROPERTYGET, "propget"}};
 constexpr Flag kTypeKinds[] = {{TKIND_INTERFACE, "interface"},
@@ -106,11 +117,11 @@ std::string TypeText(ITypeInfo& type, const TYPEDESC& description) {
   return NameOf(description.vt, kTypes, "vt");
 }
 
-// `slots` are those of IUnknown before the interface's own.
 std::string FunctionText(ITypeInfo& type, const FUNCDESC& function, FUNCKIND expectedKind) {
   std::vector<BSTR> names(static_cast<std::size_t>(function.cParams) + 1);
   UINT count = 0;
-  Check(type.GetNames(function.memid, names.data(), static_cast<UINT>(names.size()), &count), "GetNames");
+  Check(type.GetNames(function.memid, names.data(), static_cast<UINT>(names.size()), &count),
+        "GetNames");
   const std::string name = Take(names[0]);
   std::string parameters;
   for (SHORT i = 0; i < function.cParams; ++i) {
@@ -118,17 +129,21 @@ std::string FunctionText(ITypeInfo& type, const FUNCDESC& function, FUNCKIND exp
     std::string text = Flags(parameter.paramdesc.wParamFlags, kParameterFlags);
     if (!text.empty()) text += " ";
     const auto position = static_cast<std::size_t>(i) + 1;
-    text += TypeText(type, parameter.tdesc) + " " + (position < count ? Take(names[position]) : "?");
+    text += Join(
+        {TypeText(type, parameter.tdesc), " ", position < count ? Take(names[position]) : "?"});
     parameters += (parameters.empty() ? "" : ", ") + text;
   }
-  std::string text = Number(static_cast<unsigned long>(function.memid), "0x%lx") + " " +
-                     NameOf(function.invkind, kInvocations, "kind") + " " +
-                     TypeText(type, function.elemdescFunc.tdesc) + " " + name + "(" + parameters + ")" +
-                     Help(type, function.memid);
-  if (function.callconv != CC_STDCALL) text += " call" + Number(static_cast<unsigned long>(function.callconv));
-  if (function.funckind != expectedKind) text += " function" + Number(static_cast<unsigned long>(function.funckind));
-  if (function.wFuncFlags != 0) text += " flags " + Number(function.wFuncFlags);
-  if (function.cParamsOpt != 0) text += " optional " + Number(static_cast<unsigned long>(function.cParamsOpt));
+  std::string text = Join({Number(static_cast<unsigned long>(function.memid), "0x%lx"), " ",
+                           NameOf(function.invkind, kInvocations, "kind"), " ",
+                           TypeText(type, function.elemdescFunc.tdesc), " ", name, "(", parameters,
+                           ")", Help(type, function.memid)});
+  if (function.callconv != CC_STDCALL)
+    text += Join({" call", Number(static_cast<unsigned long>(function.callconv))});
+  if (function.funckind != expectedKind)
+    text += Join({" function", Number(static_cast<unsigned long>(function.funckind))});
+  if (function.wFuncFlags != 0) text += Join({" flags ", Number(function.wFuncFlags)});
+  if (function.cParamsOpt != 0)
+    text += Join({" optional ", Number(static_cast<unsigned long>(function.cParamsOpt))});
   return text;
 }
 
@@ -144,8 +159,9 @@ std::string Functions(ITypeInfo& type, const TYPEATTR& attributes) {
     if (!inherited) {
       constexpr int kIUnknownSlots = 3;
       const int place = function->oVft / static_cast<int>(sizeof(void*)) - kIUnknownSlots + 1;
-      text += "  " + Number(static_cast<unsigned long>(dispatch ? ++slot : place)) + " " +
-              FunctionText(type, *function, dispatch ? FUNC_DISPATCH : FUNC_PUREVIRTUAL) + "\n";
+      text +=
+          Join({"  ", Number(static_cast<unsigned long>(dispatch ? ++slot : place)), " ",
+                FunctionText(type, *function, dispatch ? FUNC_DISPATCH : FUNC_PUREVIRTUAL), "\n"});
     }
     type.ReleaseFuncDesc(function);
   }
@@ -158,9 +174,9 @@ std::string Values(ITypeInfo& type, const TYPEATTR& attributes) {
     VARDESC* variable = nullptr;
     Check(type.GetVarDesc(i, &variable), "GetVarDesc");
     const bool number = variable->varkind == VAR_CONST && variable->lpvarValue->vt == VT_I4;
-    text += "  " + Name(type, variable->memid) + " = " +
-            (number ? std::to_string(variable->lpvarValue->lVal) : std::string("no number")) +
-            Help(type, variable->memid) + "\n";
+    text += Join({"  ", Name(type, variable->memid), " = ",
+                  number ? std::to_string(variable->lpvarValue->lVal) : std::string("no number"),
+                  Help(type, variable->memid), "\n"});
     type.ReleaseVarDesc(variable);
   }
   return text;
@@ -173,24 +189,27 @@ std::string Implemented(ITypeInfo& type, const TYPEATTR& attributes) {
     HREFTYPE reference = 0;
     Check(type.GetImplTypeFlags(i, &flags), "GetImplTypeFlags");
     Check(type.GetRefTypeOfImplType(i, &reference), "GetRefTypeOfImplType");
-    text += "  " + Flags(static_cast<unsigned>(flags), kImplementedFlags) + " " + Referred(type, reference) + "\n";
+    text += Join({"  ", Flags(static_cast<unsigned>(flags), kImplementedFlags), " ",
+                  Referred(type, reference), "\n"});
   }
   return text;
 }
 
 std::string DumpType(ITypeInfo& type, const TYPEATTR& attributes) {
-  std::string text = NameOf(attributes.typekind, kTypeKinds, "kind") + " " + Name(type);
-  if (attributes.typekind == TKIND_ALIAS) text += " of " + TypeText(type, attributes.tdescAlias);
+  std::string text = Join({NameOf(attributes.typekind, kTypeKinds, "kind"), " ", Name(type)});
+  if (attributes.typekind == TKIND_ALIAS)
+    text += Join({" of ", TypeText(type, attributes.tdescAlias)});
   if (attributes.typekind == TKIND_INTERFACE) {
     HREFTYPE base = 0;
     Check(type.GetRefTypeOfImplType(0, &base), "GetRefTypeOfImplType");
-    text += " : " + Referred(type, base);
+    text += Join({" : ", Referred(type, base)});
   }
   const platform::Guid guid = platform::FromSystemGuid(attributes.guid);
-  text += " " + (guid == platform::Guid{} ? "no GUID" : platform::ToUtf8(platform::GuidText(guid)));
-  text += " " + Number(attributes.wMajorVerNum) + "." + Number(attributes.wMinorVerNum);
+  text += Join(
+      {" ", guid == platform::Guid{} ? "no GUID" : platform::ToUtf8(platform::GuidText(guid))});
+  text += Join({" ", Number(attributes.wMajorVerNum), ".", Number(attributes.wMinorVerNum)});
   const std::string flags = Flags(attributes.wTypeFlags, kTypeFlags);
-  text += (flags.empty() ? "" : " " + flags) + Help(type) + "\n";
+  text += Join({flags.empty() ? "" : " ", flags, Help(type), "\n"});
   text += Functions(type, attributes) + Values(type, attributes);
   return attributes.typekind == TKIND_COCLASS ? text + Implemented(type, attributes) : text;
 }
@@ -199,17 +218,19 @@ std::string DumpType(ITypeInfo& type, const TYPEATTR& attributes) {
 
 std::string DumpTypeLibrary(const std::u16string& path) {
   ComPtr<ITypeLib> library;
-  Check(LoadTypeLibEx(platform::ToSystemText(path.c_str()), REGKIND_NONE, library.Put()), "LoadTypeLibEx");
+  Check(LoadTypeLibEx(platform::ToSystemText(path.c_str()), REGKIND_NONE, library.Put()),
+        "LoadTypeLibEx");
   TLIBATTR* own = nullptr;
   Check(library->GetLibAttr(&own), "GetLibAttr");
   BSTR name = nullptr;
   BSTR help = nullptr;
   Check(library->GetDocumentation(-1, &name, &help, nullptr, nullptr), "GetDocumentation");
-  std::string text = "library " + Take(name) + " " +
-                     platform::ToUtf8(platform::GuidText(platform::FromSystemGuid(own->guid))) + " " +
-                     Number(own->wMajorVerNum) + "." + Number(own->wMinorVerNum) +
-                     (own->syskind == SYS_WIN32 ? " SYS_WIN32" : " another system") + " \"" + Take(help) + "\"";
-  if (own->lcid != 0) text += " locale " + Number(own->lcid);
+  std::string text =
+      Join({"library ", Take(name), " ",
+            platform::ToUtf8(platform::GuidText(platform::FromSystemGuid(own->guid))), " ",
+            Number(own->wMajorVerNum), ".", Number(own->wMinorVerNum),
+            own->syskind == SYS_WIN32 ? " SYS_WIN32" : " another system", " \"", Take(help), "\""});
+  if (own->lcid != 0) text += Join({" locale ", Number(own->lcid)});
   text += "\n";
   library->ReleaseTLibAttr(own);
   for (UINT i = 0; i < library->GetTypeInfoCount(); ++i) {
@@ -217,7 +238,7 @@ std::string DumpTypeLibrary(const std::u16string& path) {
     Check(library->GetTypeInfo(i, type.Put()), "GetTypeInfo");
     TYPEATTR* attributes = nullptr;
     Check(type->GetTypeAttr(&attributes), "GetTypeAttr");
-    text += Number(i) + " " + DumpType(*type.Get(), *attributes);
+    text += Join({Number(i), " ", DumpType(*type.Get(), *attributes)});
     type->ReleaseTypeAttr(attributes);
   }
   return text;

@@ -1,0 +1,9 @@
+// What a type library says, as text.
+#pragma once
+
+#include <string>
+
+// The library of a file (its own or that of a module), a line for itself and for each type,
+// function, value and interface in it, in UTF-8. Throws std::runtime_error where there is none or
+// it does not answer.
+std::string DumpTypeLibrary(const std::u16string& path);
