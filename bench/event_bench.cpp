@@ -153,8 +153,8 @@ class Process {
     CreateInstance(CLSID_ZKUMUsbTree, tree);
     m_tree.emplace(std::move(tree));
     m_treeClass.emplace(*m_tree);
-    Check(CoRegisterClassObject(CLSID_ZKUMUsbTree, &*m_treeClass, CLSCTX_INPROC_SERVER, 0,
-                                &m_registration));
+    Check(CoRegisterClassObject(CLSID_ZKUMUsbTree, &*m_treeClass, CLSCTX_INPROC_SERVER,
+                                REGCLS_MULTIPLEUSE, &m_registration));
     CreateInstance(CLSID_ZKUMEventNotifier, m_notifier);
     Check(m_notifier.As<IConnectionPointContainer>()->FindConnectionPoint(
         DIID_IZKDeviceEventCallBack, m_point.Put()));

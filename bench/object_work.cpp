@@ -5,6 +5,7 @@
 
 #include "bench/allocation_count.h"
 #include "com/usb_tree.h"
+#include "platform/com_controls.h"
 #include "platform/system.h"
 #include "tests/support/object_reader.h"
 
@@ -48,12 +49,12 @@ ObjectWorkload::~ObjectWorkload() {
 
 ObjectCost ObjectWorkload::CostOf(ObjectWork work) const {
   const std::uint64_t allocations = AllocationCount();
-  const std::int64_t texts = platform::native::CountBstrs().allocated;
+  const std::int64_t texts = platform::controls::CountBstrs().allocated;
   const std::size_t brought = Run(work);
   return {.nodes = static_cast<double>(m_nodes),
           .brought = static_cast<double>(brought),
           .allocations = static_cast<double>(AllocationCount() - allocations),
-          .texts = static_cast<double>(platform::native::CountBstrs().allocated - texts)};
+          .texts = static_cast<double>(platform::controls::CountBstrs().allocated - texts)};
 }
 
 ComPtr<IZKUMUsbTreeNode> ObjectWorkload::Root() const {

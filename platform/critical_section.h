@@ -43,11 +43,4 @@ class CriticalSection {
 #endif
 };
 
-#ifndef _WIN32
-namespace native {
-// The code of this thread's n-th Initialize from now on (1: the next); the others succeed.
-void FailCriticalSection(std::uint64_t call, HRESULT result) noexcept;
-}  // namespace native
-#endif
-
 }  // namespace platform

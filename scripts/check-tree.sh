@@ -30,7 +30,7 @@ done < <(files '*.h' '*.cpp' | grep -vE '^(platform/windows/|platform/com\.h|tes
 while read -r file; do
   breach "$file asks for _WIN32"
 done < <(files '*.h' '*.cpp' | grep -vE '^(platform/|module/|tools/zkusb/main\.cpp|tests/)' |
-  xargs -r grep -lE '_WIN(32|64)' || true)
+  xargs -r grep -lE '\b_WIN(32|64)' || true)
 
 # The component depends on the standard library alone.
 while read -r file; do

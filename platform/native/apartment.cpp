@@ -1,6 +1,7 @@
 #include <optional>
 #include <utility>
 
+#include "platform/com_controls.h"
 #include "platform/native/com_functions.h"
 
 namespace {
@@ -30,9 +31,9 @@ void CoUninitialize() noexcept {
   if (t_apartment.depth > 0) --t_apartment.depth;
 }
 
-namespace platform::native {
+namespace platform::controls {
 
 void FailNextCoInitialize(HRESULT result) noexcept { t_failure = result; }
 std::uint32_t ApartmentDepth() noexcept { return t_apartment.depth; }
 
-}  // namespace platform::native
+}  // namespace platform::controls

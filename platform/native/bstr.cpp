@@ -4,11 +4,12 @@
 #include <limits>
 #include <string_view>
 
+#include "platform/com_controls.h"
 #include "platform/native/com_functions.h"
 
 namespace {
 
-using platform::native::BstrCounts;
+using platform::controls::BstrCounts;
 
 std::atomic<std::int64_t> g_alive = 0;
 std::atomic<std::int64_t> g_allocated = 0;
@@ -64,7 +65,7 @@ UINT SysStringLen(BSTR text) noexcept {
   return SysStringByteLen(text) / static_cast<UINT>(sizeof(char16_t));
 }
 
-namespace platform::native {
+namespace platform::controls {
 
 BstrCounts CountBstrs() noexcept { return {g_alive, g_allocated}; }
 
@@ -72,4 +73,4 @@ FailingBstr::FailingBstr(std::uint64_t allocation) noexcept { t_fault = {allocat
 FailingBstr::~FailingBstr() { t_fault = {}; }
 bool FailingBstr::Failed() const noexcept { return t_fault.seen >= t_fault.at; }
 
-}  // namespace platform::native
+}  // namespace platform::controls

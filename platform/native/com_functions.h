@@ -4,9 +4,6 @@
 // Public source: the published headers oleauto.h and combaseapi.h.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
-
 #include "platform/native/com_interfaces.h"
 
 // A null result means that memory ran out, or that `text` is null (SysAllocString).
@@ -46,30 +43,3 @@ void CoFreeUnusedLibraries() noexcept;
 // The class of a program identifier such as "KelvoUsbMonitor.UsbTree", from the registry of the
 // current system. CO_E_CLASSSTRING when there is none.
 HRESULT CLSIDFromProgID(const char16_t* progId, CLSID* clsid) noexcept;
-
-namespace platform::native {
-
-// Texts alive now, and those ever allocated, by SysAllocString and VariantCopy.
-struct BstrCounts {
-  std::int64_t alive = 0;
-  std::int64_t allocated = 0;
-};
-BstrCounts CountBstrs() noexcept;
-
-// From construction to destruction the n-th text this thread allocates, counted from 1, fails, and
-// all behind it succeed. One at a time.
-class FailingBstr {
- public:
-  explicit FailingBstr(std::uint64_t allocation) noexcept;
-  ~FailingBstr();
-  FailingBstr(const FailingBstr&) = delete;
-  FailingBstr& operator=(const FailingBstr&) = delete;
-  bool Failed() const noexcept;  // whether it came to the failure
-};
-
-// The result of this thread's next CoInitializeEx in place of what it would be.
-void FailNextCoInitialize(HRESULT result) noexcept;
-// How often the calling thread has entered an apartment that it has not left.
-std::uint32_t ApartmentDepth() noexcept;
-
-}  // namespace platform::native

@@ -91,6 +91,7 @@ inline constexpr VARIANT_BOOL VARIANT_FALSE = 0;
 inline constexpr DWORD COINIT_MULTITHREADED = 0;
 inline constexpr DWORD COINIT_APARTMENTTHREADED = 2;
 inline constexpr DWORD CLSCTX_INPROC_SERVER = 1;
+inline constexpr DWORD REGCLS_MULTIPLEUSE = 1;
 inline constexpr WORD DISPATCH_METHOD = 1;
 inline constexpr LCID LOCALE_USER_DEFAULT = 0x400;
 inline constexpr LCID LOCALE_SYSTEM_DEFAULT = 0x800;

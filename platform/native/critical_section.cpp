@@ -1,5 +1,7 @@
 #include "platform/critical_section.h"
 
+#include "platform/com_controls.h"
+
 namespace platform {
 
 namespace {
@@ -17,8 +19,8 @@ HRESULT CriticalSection::Initialize() noexcept {
   return S_OK;
 }
 
-namespace native {
+namespace controls {
 void FailCriticalSection(std::uint64_t call, HRESULT result) noexcept { t_fault = {call, result}; }
-}  // namespace native
+}  // namespace controls
 
 }  // namespace platform

@@ -11,7 +11,7 @@ namespace KelvoUHW {
 namespace {
 
 void LetGo(IUnknown* object) { object->Release(); }
-void LetGo(char16_t* text) { SysFreeString(text); }
+void LetGo(BSTR text) { SysFreeString(text); }
 
 class ComMemory : public ComObjects {
  protected:
@@ -29,7 +29,7 @@ class ComMemory : public ComObjects {
   template <class T, class Call>
   std::uint64_t FailEach(std::initializer_list<HRESULT> codes, Call call) {
     const std::int32_t objects = ModuleLockCount();
-    const std::int64_t texts = platform::native::CountBstrs().alive;
+    const std::int64_t texts = platform::controls::CountBstrs().alive;
     for (std::uint64_t allocation = 1;; ++allocation) {
       T* out = Mark<T>();
       bool failed = false, cleared = false;
@@ -40,7 +40,7 @@ class ComMemory : public ComObjects {
         return result;
       });
       EXPECT_EQ(ModuleLockCount(), objects) << allocation;
-      EXPECT_EQ(platform::native::CountBstrs().alive, texts) << allocation;
+      EXPECT_EQ(platform::controls::CountBstrs().alive, texts) << allocation;
       if (!failed) {
         EXPECT_EQ(code, S_OK);
         return allocation - 1;
@@ -101,7 +101,7 @@ TEST_F(ComMemory, SubtreesAndDumpOfTheWholeTree) {
       return root->get_InSubtreeDevicesOfType(static_cast<TUsbDeviceType>(kind), out);
     });
   }
-  const std::uint64_t failures = FailEach<char16_t>(
+  const std::uint64_t failures = FailEach<OLECHAR>(
       {E_OUTOFMEMORY}, [&](auto out) { return Read<&IZKUMUsbDevice::get_ToString>(root.Get(), out); });
   EXPECT_GT(failures, nodes.size());
 }
@@ -132,7 +132,7 @@ TEST_F(ComObjects, MountPointsThatCannotBeCopied) {
   const auto disk = Wrap(sample.disk).As<IZKUMInterfaceDevice>();
   for (std::uint64_t allocation = 1; allocation <= sample.disk->MountPoints.size(); ++allocation) {
     for (const bool giveOut : {true, false}) {
-      const platform::native::FailingBstr failing(allocation);
+      const platform::controls::FailingBstr failing(allocation);
       auto* list = Mark<IEnumVARIANT>();
       EXPECT_EQ(CodeOf([&] { return disk->get_MountPoints(giveOut ? &list : nullptr); }), "raised E_OUTOFMEMORY");
       EXPECT_EQ(list, giveOut ? nullptr : Mark<IEnumVARIANT>());

@@ -4,15 +4,15 @@
 
 #include "com/node_enumerator.h"
 #include "com/variant_enumerator.h"
-#include "platform/critical_section.h"
+#include "platform/com_controls.h"
 #include "tests/support/client_node.h"
 #include "tests/support/com_objects.h"
 
 namespace KelvoUHW {
 namespace {
 
-using platform::native::FailCriticalSection;
-using platform::native::FailingBstr;
+using platform::controls::FailCriticalSection;
+using platform::controls::FailingBstr;
 
 using NodeEnumerator = ComObjects;
 
@@ -85,9 +85,9 @@ TEST_F(NodeEnumerator, WalksOnceAndGoesOnBehindTheEnd) {
 // An object that is taken apart still counts: nothing may unload the module before it is done.
 TEST_F(NodeEnumerator, LetsTheModuleGoLast) {
   struct Witness final : IUnknown {
-    HRESULT QueryInterface(REFIID, void**) override { return E_NOINTERFACE; }
-    ULONG AddRef() override { return 2; }
-    ULONG Release() override {
+    HRESULT STDMETHODCALLTYPE QueryInterface(REFIID, void**) override { return E_NOINTERFACE; }
+    ULONG STDMETHODCALLTYPE AddRef() override { return 2; }
+    ULONG STDMETHODCALLTYPE Release() override {
       objectsAtRelease = ModuleLockCount();
       return 1;
     }

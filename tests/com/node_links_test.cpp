@@ -1,13 +1,13 @@
 // The way from node to node: Parent, Childs, InSubtreeDevicesOfType.
 #include <algorithm>
 
-#include "platform/critical_section.h"
+#include "platform/com_controls.h"
 #include "tests/support/com_objects.h"
 
 namespace KelvoUHW {
 namespace {
 
-using platform::native::FailCriticalSection;
+using platform::controls::FailCriticalSection;
 
 struct NodeLinks : ComObjects {
   SampleTree sample;

@@ -36,7 +36,7 @@ template <auto Getter, std::size_t Slot>
 HRESULT ReadSlot(IUnknown* object, BSTR* out) {
   const auto asked = ComPtr<IUnknown>(object).As<typename GetterTraits<decltype(Getter)>::Interface>();
   const auto* table = *reinterpret_cast<void* const* const*>(asked.Get());
-  return reinterpret_cast<HRESULT (*)(IUnknown*, BSTR*)>(table[Slot])(asked.Get(), out);
+  return reinterpret_cast<HRESULT(STDMETHODCALLTYPE*)(IUnknown*, BSTR*)>(table[Slot])(asked.Get(), out);
 }
 template <auto Getter, std::size_t Slot>
 TextRow Row(const char* name, const std::vector<const char*>& kinds, const TextRules& rules,
@@ -87,7 +87,7 @@ void CheckText(TextProperty property, IUnknown* object, const TextRules& rules, 
     const char* expected;
   } faults[] = {{1, true, rules.firstFails}, {2, true, rules.secondFails}, {1, false, rules.nullOutFirstFails}};
   for (const auto& fault : faults) {
-    const platform::native::FailingBstr failing(fault.allocation);
+    const platform::controls::FailingBstr failing(fault.allocation);
     EXPECT_EQ(TextOf(property, object, fault.giveOut), fault.expected ? fault.expected : success);
   }
   EXPECT_EQ(References(object), references);

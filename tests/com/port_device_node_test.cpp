@@ -114,7 +114,7 @@ TEST_F(PortDeviceNode, EnumeratorKeepsTheRecordAndADescriptorItsBytes) {
 TEST_F(PortDeviceNode, CollectionWithoutItsObjects) {
   const auto older = Descriptors();
   for (std::uint64_t call = 1; call <= 5; ++call) {
-    platform::native::FailCriticalSection(call, E_ACCESSDENIED);
+    platform::controls::FailCriticalSection(call, E_ACCESSDENIED);
     auto* list = Mark<IEnumVARIANT>();
     EXPECT_EQ(device->get_InterfaceDescriptors(&list), E_ACCESSDENIED) << call;
     EXPECT_EQ(list, nullptr);

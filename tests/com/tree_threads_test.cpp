@@ -1,9 +1,10 @@
 // Clients on threads of their own read and release while builds replace the tree. Made for the thread sanitizer.
 #include <array>
-#include <atomic>
+#include <cstddef>
 #include <thread>
 
 #include "tests/support/desk_pc.h"
+#include "tests/support/rendezvous.h"
 #include "tests/support/tree_desk.h"
 
 namespace KelvoUHW {
@@ -28,8 +29,8 @@ class Reader {
   explicit Reader(IZKUMUsbTree& tree) : m_tree(tree) {}
 
   // A walk whenever it is told of a publication: while the next builds run.
-  void Run(const std::atomic<int>& publications) {
-    for (int seen = publications; seen != kEnd; publications.wait(seen), seen = publications) Walk();
+  void Run(const testing_support::Announcement& publications) {
+    for (int seen = publications.Get(); seen != kEnd; seen = publications.WaitForAnother(seen)) Walk();
     for (Node& node : m_kept) node.Reset();
   }
   const Seen& Result() const { return m_seen; }
@@ -69,7 +70,7 @@ TEST(TreeThreads, ClientsReadAndReleaseWhileBuildsReplaceTheTree) {
   ASSERT_EQ(desk.Rebuild(), S_OK);
 
   std::vector<Reader> readers(kReaders, Reader(*desk.tree.Get()));
-  std::atomic<int> publications = 0;
+  testing_support::Announcement publications;
   int published = 0;
   {
     std::vector<std::jthread> threads;
@@ -90,11 +91,9 @@ TEST(TreeThreads, ClientsReadAndReleaseWhileBuildsReplaceTheTree) {
       desk.Do(build % 2 == 0 ? Change(comes) : Change(Unplug{goes}));
       published += desk.Rebuild() == S_OK;
       if (build % 3 != 0) continue;
-      publications = published;
-      publications.notify_all();
+      publications.Tell(published);
     }
-    publications = kEnd;
-    publications.notify_all();
+    publications.Tell(kEnd);
   }
   EXPECT_EQ(published, kBuilds);
   for (const Reader& reader : readers) {

@@ -4,6 +4,7 @@
 #include <limits>
 #include <set>
 
+#include "platform/simulated/simulated_desktop.h"
 #include "tests/support/com_objects.h"
 #include "tests/support/desk_pc.h"
 #include "tests/support/tree_desk.h"
@@ -11,6 +12,7 @@
 namespace KelvoUHW {
 namespace {
 
+using platform::simulated::SimulatedDesktop;
 using testing_support::ForEachNode;
 using testing_support::InstanceIdOf;
 using Nodes = ComPtr<IZKUMUsbTreeNodeEnumerator>;
@@ -148,9 +150,9 @@ TEST(UsbTree, QueriesWithoutAnObjectOrMemory) {
   bool failed = false;
   const auto ask = [&](const Query& query, std::uint64_t object, std::uint64_t allocation) {
     auto* list = Mark<IZKUMUsbTreeNodeEnumerator>();
-    platform::native::FailCriticalSection(object, E_ACCESSDENIED);
+    platform::controls::FailCriticalSection(object, E_ACCESSDENIED);
     const HRESULT result = WithoutAllocation(allocation, failed, [&] { return query(*desk.tree.Get(), &list); });
-    platform::native::FailCriticalSection(0, S_OK);
+    platform::controls::FailCriticalSection(0, S_OK);
     const Nodes nodes = Nodes::Attach(list);
     EXPECT_TRUE(result == S_OK || !nodes) << "a list with a failure";
     return result == S_OK ? Names(nodes) : CodeName(result);
@@ -183,7 +185,8 @@ TEST(UsbTree, DeviceLists) {
   TreeDesk desk(QueriedPc());
   ASSERT_EQ(desk.build->BuildTree(), S_OK);
   std::set<const DeviceList*> lists;
-  for (const LONG number : {-1, 0, 1, 2, 3, 4, std::numeric_limits<LONG>::min(), std::numeric_limits<LONG>::max()}) {
+  for (const LONG number : std::initializer_list<LONG>{-1, 0, 1, 2, 3, 4, std::numeric_limits<LONG>::min(),
+                                                       std::numeric_limits<LONG>::max()}) {
     const auto* list = Mark<const DeviceList>();
     EXPECT_EQ(desk.build->GetDeviceList(number, &list), S_OK);
     EXPECT_EQ(list != nullptr, number >= 0 && number <= 3) << number;
@@ -246,7 +249,8 @@ TEST(UsbTree, CreationThatFails) {
   SimulatedPc pc(BarePc());
   WellFedHost host(pc);
   bool failed = false;
-  EXPECT_EQ(CreateWithout({}, 0, failed), E_FAIL) << "no system";
+  SimulatedDesktop desktop;
+  EXPECT_EQ(CreateWithout({.threads = &desktop}, 0, failed), E_FAIL) << "no PC";
   EXPECT_EQ(CreateWithout({.host = &host}, 1, failed), E_OUTOFMEMORY) << "the object itself";
   std::set<HRESULT> results;  // without what it is made of
   for (std::uint64_t allocation = 2; failed; ++allocation) {

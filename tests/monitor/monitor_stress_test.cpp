@@ -1,10 +1,10 @@
 // Threads side by side on the real clock; what they do is small, so that they meet often.
-#include <barrier>
 #include <chrono>
 #include <thread>
 
 #include "monitor/usb_event_receiver.h"
 #include "tests/support/monitor_process.h"
+#include "tests/support/rendezvous.h"
 
 namespace KelvoUHW {
 namespace {
@@ -19,11 +19,11 @@ TEST(MonitorStress, FourThreadsShareTheLock) {
   MonitorProcess process(ClockMode::Real);
   CThreadLock lock;
   int inside = 0;  // guarded by the lock and nothing else
-  std::barrier begin(kThreads);
+  testing_support::Rendezvous begin(kThreads);
   std::vector<std::thread> threads;
   for (std::size_t i = 0; i < kThreads; ++i) {
     threads.emplace_back([&] {
-      begin.arrive_and_wait();
+      begin.ArriveAndWait();
       for (std::uint64_t round = 0; round < kRounds; ++round) {
         const ThreadLockGuard guard(lock);
         EXPECT_EQ(++inside, 1) << "two threads inside";

@@ -1,4 +1,5 @@
-// The system's COM functions of builds without the system.
+// The system's COM functions, as builds without the system have them and as the component relies on them; and what
+// counts and fails them.
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -6,16 +7,17 @@
 #include <thread>
 
 #include "platform/com.h"
+#include "platform/com_controls.h"
 
 namespace {
 
-using platform::native::CountBstrs;
+using platform::controls::CountBstrs;
 using namespace std::string_view_literals;
 
 TEST(ComFunctions, TextsCarryTheirLengthInBytesBeforeThem) {
   const std::int64_t alive = CountBstrs().alive, allocated = CountBstrs().allocated;
   for (const std::u16string_view text : {u""sv, u"a"sv, u"a\0b"sv}) {
-    const BSTR made = SysAllocStringLen(text.data(), static_cast<UINT>(text.size()));
+    const BSTR made = SysAllocStringLen(platform::ToSystemText(text.data()), static_cast<UINT>(text.size()));
     ASSERT_NE(made, nullptr);
     std::uint32_t prefix = 0;
     std::memcpy(&prefix, reinterpret_cast<const char*>(made) - 4, sizeof prefix);
@@ -23,11 +25,11 @@ TEST(ComFunctions, TextsCarryTheirLengthInBytesBeforeThem) {
     EXPECT_EQ(SysStringByteLen(made), prefix);
     EXPECT_EQ(SysStringLen(made), text.size());
     EXPECT_EQ(platform::BstrText(made), text);
-    EXPECT_EQ(made[text.size()], u'\0');
+    EXPECT_EQ(made[text.size()], OLECHAR{});
     EXPECT_EQ(CountBstrs().alive, alive + 1);
     SysFreeString(made);
   }
-  const BSTR cut = SysAllocString(u"a\0b");
+  const BSTR cut = SysAllocString(platform::ToSystemText(u"a\0b"));
   EXPECT_EQ(SysStringLen(cut), 1u);
   SysFreeString(cut);
   EXPECT_EQ(SysAllocString(nullptr), nullptr);
@@ -39,9 +41,9 @@ TEST(ComFunctions, TextsCarryTheirLengthInBytesBeforeThem) {
 }
 
 struct CountedUnknown final : IUnknown {
-  HRESULT QueryInterface(REFIID, void**) override { return E_NOINTERFACE; }
-  ULONG AddRef() override { return ++references; }
-  ULONG Release() override { return --references; }
+  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID, void**) override { return E_NOINTERFACE; }
+  ULONG STDMETHODCALLTYPE AddRef() override { return ++references; }
+  ULONG STDMETHODCALLTYPE Release() override { return --references; }
   ULONG references = 1;
 };
 
@@ -54,15 +56,18 @@ TEST(ComFunctions, VariantsOwnWhatTheyHold) {
       VARIANT source{}, target{};
       source.vt = type;
       source.lVal = 77;
-      if (type == VT_BSTR) source.bstrVal = null ? nullptr : SysAllocString(u"text");
+      if (type == VT_BSTR) source.bstrVal = null ? nullptr : platform::MakeBstr(u"text");
       if (isObject) source.punkVal = null ? nullptr : &object;
       target.vt = VT_BSTR;
-      target.bstrVal = SysAllocString(u"what the target held");
+      target.bstrVal = platform::MakeBstr(u"what the target held");
       EXPECT_EQ(VariantCopy(&target, &source), S_OK) << type;
       EXPECT_EQ(target.vt, type);
       const bool isText = type == VT_BSTR && !null;
       EXPECT_EQ(isText ? platform::BstrText(target.bstrVal) : u"", isText ? u"text" : u"");
-      EXPECT_EQ(target.byref == source.byref, !isText);
+      // Some systems make an empty text of none.
+      if (isText || type != VT_BSTR) {
+        EXPECT_EQ(target.byref == source.byref, !isText);
+      }
       EXPECT_EQ(object.references, isObject && !null ? 2u : 1u);
       if (isObject && !null) ++object.references;  // the source's own
       EXPECT_EQ(VariantCopy(&target, &target), S_OK);
@@ -76,6 +81,9 @@ TEST(ComFunctions, VariantsOwnWhatTheyHold) {
 }
 
 TEST(ComFunctions, VariantsOfOtherTypesAreRefusedAndKept) {
+#ifdef _WIN32
+  GTEST_SKIP() << "the system knows them";
+#endif
   VARIANT odd{}, other{};
   odd.lVal = 77;
   for (const int type : {7, 0x4003}) {
@@ -99,14 +107,14 @@ TEST(ComFunctions, ApartmentsNestPerThread) {
               {S_OK, COINIT_MULTITHREADED, RPC_E_CHANGED_MODE, 1},
               {S_OK, COINIT_APARTMENTTHREADED, S_FALSE, 2}};
   for (const auto& row : rows) {
-    if (FAILED(row.ordered)) platform::native::FailNextCoInitialize(row.ordered);
+    if (FAILED(row.ordered)) platform::controls::FailNextCoInitialize(row.ordered);
     EXPECT_EQ(CoInitializeEx(nullptr, row.model), row.result);
-    EXPECT_EQ(platform::native::ApartmentDepth(), row.depth);
+    EXPECT_EQ(platform::controls::ApartmentDepth(), row.depth);
   }
-  std::thread([] { EXPECT_EQ(platform::native::ApartmentDepth(), 0u); }).join();
+  std::thread([] { EXPECT_EQ(platform::controls::ApartmentDepth(), 0u); }).join();
   for (const std::uint32_t depth : {1u, 0u, 0u}) {
     CoUninitialize();
-    EXPECT_EQ(platform::native::ApartmentDepth(), depth);
+    EXPECT_EQ(platform::controls::ApartmentDepth(), depth);
   }
   EXPECT_EQ(CoInitializeEx(nullptr, COINIT_MULTITHREADED), S_OK);
   CoUninitialize();

@@ -23,38 +23,40 @@ class ClientNode final : public IZKUMUsbTreeNode, public IZKUMUsbTreeNodeEnumera
   std::function<HRESULT(Method)> before = [](Method) { return S_OK; };
   ULONG references = 1;
 
-  HRESULT QueryInterface(REFIID iid, void** out) override {
+  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
     const bool node = iid == platform::IidOf<IZKUMUsbTreeNode>();
     *out = node ? static_cast<IZKUMUsbTreeNode*>(this) : nullptr;
     references += node ? 1 : 0;
     return node ? S_OK : E_NOINTERFACE;
   }
-  ULONG AddRef() override { return ++references; }
-  ULONG Release() override { return --references; }
+  ULONG STDMETHODCALLTYPE AddRef() override { return ++references; }
+  ULONG STDMETHODCALLTYPE Release() override { return --references; }
 
-  HRESULT get_Type(TUsbDeviceType* type) override {
+  HRESULT STDMETHODCALLTYPE get_Type(TUsbDeviceType* type) override {
     return Answer(kType, [&] { *type = m_type; });
   }
-  HRESULT get_Childs(IZKUMUsbTreeNodeEnumerator** out) override {
+  HRESULT STDMETHODCALLTYPE get_Childs(IZKUMUsbTreeNodeEnumerator** out) override {
     return Answer(kChilds, [&] {
       m_current = 0;
       ++references;
       *out = this;
     });
   }
-  HRESULT MoveNext(VARIANT_BOOL* more) override {
+  HRESULT STDMETHODCALLTYPE MoveNext(VARIANT_BOOL* more) override {
     return Answer(kMoveNext, [&] { *more = ++m_current <= m_childs.size() ? VARIANT_TRUE : VARIANT_FALSE; });
   }
-  HRESULT GetCurrent(IZKUMUsbTreeNode** out) override {
+  HRESULT STDMETHODCALLTYPE GetCurrent(IZKUMUsbTreeNode** out) override {
     return Answer(kGetCurrent, [&] {
       *out = m_childs[m_current - 1];
       (*out)->AddRef();
     });
   }
 
-  HRESULT get_InstanceId(BSTR*) override { return E_NOTIMPL; }
-  HRESULT get_Parent(IZKUMUsbTreeNode**) override { return E_NOTIMPL; }
-  HRESULT get_InSubtreeDevicesOfType(TUsbDeviceType, IZKUMUsbTreeNodeEnumerator**) override { return E_NOTIMPL; }
+  HRESULT STDMETHODCALLTYPE get_InstanceId(BSTR*) override { return E_NOTIMPL; }
+  HRESULT STDMETHODCALLTYPE get_Parent(IZKUMUsbTreeNode**) override { return E_NOTIMPL; }
+  HRESULT STDMETHODCALLTYPE get_InSubtreeDevicesOfType(TUsbDeviceType, IZKUMUsbTreeNodeEnumerator**) override {
+    return E_NOTIMPL;
+  }
 
  private:
   template <class Act>

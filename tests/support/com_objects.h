@@ -18,6 +18,7 @@
 #include "com/zkusb_monitor.h"
 #include "devinfo/info_device.h"
 #include "devinfo/interface_device.h"
+#include "platform/com_controls.h"
 #include "platform/text.h"
 #include "tests/support/object_reader.h"
 #include "tree/port_device.h"
@@ -30,12 +31,12 @@ class ComObjects : public testing::Test {
  protected:
   ~ComObjects() override {
     EXPECT_EQ(ModuleLockCount(), m_objects) << "objects";
-    EXPECT_EQ(platform::native::CountBstrs().alive, m_texts) << "texts";
+    EXPECT_EQ(platform::controls::CountBstrs().alive, m_texts) << "texts";
   }
 
  private:
   const std::int32_t m_objects = ModuleLockCount();
-  const std::int64_t m_texts = platform::native::CountBstrs().alive;
+  const std::int64_t m_texts = platform::controls::CountBstrs().alive;
 };
 
 // What out pointers hold before a call.
@@ -77,7 +78,7 @@ std::string CodeOf(Call call) {
 template <class Getter>
 struct GetterTraits;
 template <class I, class V>
-struct GetterTraits<HRESULT (I::*)(V*)> {
+struct GetterTraits<HRESULT (STDMETHODCALLTYPE I::*)(V*)> {
   using Interface = I;
   using Value = V;
 };
@@ -92,10 +93,10 @@ HRESULT Read(IUnknown* object, Value* out) {
 // "CODE text", "CODE null" or "CODE untouched"; the code alone where no out pointer is given to `getter`.
 template <class Getter>
 std::string TextOf(Getter getter, bool giveOut = true) {
-  BSTR text = Mark<char16_t>();
+  BSTR text = Mark<OLECHAR>();
   const std::string code = CodeOf([&] { return getter(giveOut ? &text : nullptr); });
   if (!giveOut) return code;
-  if (text == Mark<char16_t>()) return code + " untouched";
+  if (text == Mark<OLECHAR>()) return code + " untouched";
   const std::string outcome = text ? platform::ToUtf8(platform::BstrText(text)) : "null";
   SysFreeString(text);
   return code + " " + outcome;

@@ -18,7 +18,7 @@ class Callable : public IDispatch {
 
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
     const bool known =
-        iid == IUnknown::kIid || iid == IDispatch::kIid || iid == platform::FromSystemGuid(DIID_IZKDeviceEventCallBack);
+        iid == platform::IidOf<IUnknown>() || iid == platform::IidOf<IDispatch>() || iid == DIID_IZKDeviceEventCallBack;
     *out = known ? this : nullptr;
     if (known) AddRef();
     return known ? S_OK : E_NOINTERFACE;

@@ -33,8 +33,8 @@ class ModuleProcess : public MonitorProcess {
     module->Unload();
     EXPECT_EQ(g_pNotifyTarget, nullptr);
     EXPECT_EQ(desktop.Counts().registrations, 0u) << "the notifier lives on";
-    CoUninitialize();
     module.reset();
+    CoUninitialize();
     EXPECT_EQ(CurrentModule(), nullptr);
     EXPECT_EQ(ModuleLockCount(), 0);
     // Each tree leaves a set of volume interfaces open, which is meant.
@@ -47,7 +47,9 @@ class ModuleProcess : public MonitorProcess {
     const DWORD before = std::exchange(m_treeClass, 0);
     EXPECT_TRUE(before == 0 || CoRevokeClassObject(before) == S_OK);
     if (classObject == nullptr) return;
-    EXPECT_EQ(CoRegisterClassObject(CLSID_ZKUMUsbTree, classObject, CLSCTX_INPROC_SERVER, 0, &m_treeClass), S_OK);
+    EXPECT_EQ(
+        CoRegisterClassObject(CLSID_ZKUMUsbTree, classObject, CLSCTX_INPROC_SERVER, REGCLS_MULTIPLEUSE, &m_treeClass),
+        S_OK);
   }
   ComPtr<IClassFactory> Class(const CLSID& clsid) {
     ComPtr<IClassFactory> factory;

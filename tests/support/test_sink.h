@@ -89,7 +89,7 @@ class TestSink final : public IUnknown {
     if (keeps) keeps->push_back(ComPtr<IUnknown>(device.punkVal));
     // The caller has to clear it.
     result->vt = VT_BSTR;
-    result->bstrVal = SysAllocString(u"result");
+    result->bstrVal = platform::MakeBstr(u"result");
     return onEvent ? onEvent() : S_OK;
   }
   static std::string NameOf(const ComPtr<IZKUMUsbTreeNode>& node) {

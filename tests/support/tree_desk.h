@@ -7,6 +7,7 @@
 
 #include "com/module_lock.h"
 #include "com/usb_tree.h"
+#include "platform/com_controls.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/system.h"
 #include "tests/support/failing_memory.h"
@@ -29,7 +30,7 @@ class TreeDesk {
     build.Reset();
     platform::SetCurrentSystem({});
     EXPECT_EQ(ModuleLockCount(), 0);
-    EXPECT_EQ(platform::native::CountBstrs().alive, m_texts);
+    EXPECT_EQ(platform::controls::CountBstrs().alive, m_texts);
     EXPECT_TRUE(pc.Misuses().empty());
   }
   TreeDesk(const TreeDesk&) = delete;
@@ -54,7 +55,7 @@ class TreeDesk {
 
  private:
   WellFedHost m_host{pc};
-  const std::int64_t m_texts = platform::native::CountBstrs().alive;
+  const std::int64_t m_texts = platform::controls::CountBstrs().alive;
 };
 
 }  // namespace KelvoUHW

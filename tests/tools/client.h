@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <functional>
@@ -22,9 +23,22 @@ using testing_support::Golden;
 
 inline ProgramResult RunClient(const Args& args) { return RunProgram(ZKUSB_PROGRAM, args); }
 
+inline std::filesystem::path MachinesFolder() { return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines"; }
+inline std::string MachineFile(const std::string& name) { return (MachinesFolder() / (name + ".json")).string(); }
+
+// The same over the machine that is built in where the arguments name none: on Windows the client then looks at the PC
+// that it runs on.
+inline ProgramResult RunOverSimulatedPc(Args args) {
+#ifdef _WIN32
+  const auto names = [](const std::string& arg) { return arg.starts_with("--machine") || arg == "--script"; };
+  if (std::ranges::none_of(args, names)) args.insert(args.end(), {"--machine", MachineFile("dell-precision")});
+#endif
+  return RunClient(args);
+}
+
 // What a run prints that is expected to do what it is asked.
 inline std::string Output(const Args& args) {
-  const ProgramResult result = RunClient(args);
+  const ProgramResult result = RunOverSimulatedPc(args);
   EXPECT_EQ(result.code, kDone) << result.err;
   EXPECT_EQ(result.err, "");
   return result.out;
@@ -44,8 +58,6 @@ inline std::vector<std::string> Lines(const std::string& text) {
   return lines;
 }
 
-inline std::filesystem::path MachinesFolder() { return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines"; }
-inline std::string MachineFile(const std::string& name) { return (MachinesFolder() / (name + ".json")).string(); }
 inline Json LoadJson(const std::filesystem::path& path) {
   std::ifstream stream(path);
   return Json::parse(stream);
@@ -58,7 +70,7 @@ class TemporaryFile {
     static int count = 0;
     const auto* test = testing::UnitTest::GetInstance()->current_test_info();
     m_path = testing::TempDir() + "zkusb-" + test->test_suite_name() + test->name() + std::to_string(++count);
-    std::ofstream(m_path) << text;
+    std::ofstream(m_path, std::ios::binary) << text;
   }
   ~TemporaryFile() { std::filesystem::remove(m_path); }
   TemporaryFile(const TemporaryFile&) = delete;

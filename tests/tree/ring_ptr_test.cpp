@@ -5,11 +5,12 @@
 #include <algorithm>
 #include <array>
 #include <atomic>
-#include <latch>
 #include <random>
 #include <set>
 #include <thread>
 #include <vector>
+
+#include "tests/support/rendezvous.h"
 
 namespace KelvoUHW {
 namespace {
@@ -80,14 +81,14 @@ TEST(Ring, ListsOfMembersMayGrowAndOneMayListItself) {
 
 TEST(Ring, ThreadsCopyWhileOneAssigns) {
   Ptr shared = MakeRecord<Derived>();
-  std::latch start(3);  // a thread that ran alone would show nothing
+  testing_support::Rendezvous start(3);  // a thread that ran alone would show nothing
   const auto copyAndRelease = [&] {
-    start.arrive_and_wait();
+    start.ArriveAndWait();
     for (int i = 0; i < 100'000; ++i) Ptr(shared).Reset();
   };
   std::atomic<bool> done = false;
   std::thread other(copyAndRelease), assigning([&] {
-    start.arrive_and_wait();
+    start.ArriveAndWait();
     while (!done) shared = MakeRecord<Derived>();
   });
   copyAndRelease();

@@ -1,6 +1,5 @@
 // zkusb_typelib FILE: the type library that a module carries, as text. Exits with 0 when it was
 // printed, 1 where there is none that can be read, 2 on wrong usage; the reason on standard error.
-// error.
 #include <iostream>
 #include <stdexcept>
 
