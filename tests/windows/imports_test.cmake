@@ -1,11 +1,16 @@
 # Every program and DLL runs on a PC that has nothing but the system's own DLLs.
 #
-#   cmake -DOBJDUMP=objdump -DFILES=a.exe;b.dll -P imports_test.cmake
+#   cmake -DOBJDUMP=objdump -DFOLDER=build/windows-x86 -P imports_test.cmake
 cmake_minimum_required(VERSION 3.25)
 
 set(system_dlls advapi32 cfgmgr32 kernel32 msvcrt ole32 oleaut32 setupapi shell32 shlwapi user32 gdi32)
 
-foreach(file IN LISTS FILES)
+file(GLOB files ${FOLDER}/*.dll ${FOLDER}/*.exe ${FOLDER}/bin/*.exe)
+list(LENGTH files count)
+if(NOT "${FOLDER}/ZKUsbMonitor.dll" IN_LIST files OR count LESS 10)
+  message(SEND_ERROR "${FOLDER}: is not where the programs are")
+endif()
+foreach(file IN LISTS files)
   execute_process(COMMAND ${OBJDUMP} -p ${file} OUTPUT_VARIABLE dump COMMAND_ERROR_IS_FATAL ANY)
   string(REGEX MATCHALL "DLL Name: [^\n]+" imports "${dump}")
   if(NOT imports)
