@@ -16,6 +16,7 @@
 #include <thread>
 
 #include "com/com_ptr.h"
+#include "com/private_interfaces.h"
 #include "com/zkusb_monitor.h"
 #include "platform/device_broadcast.h"
 #include "platform/registry_key.h"
@@ -100,6 +101,20 @@ TEST(WindowsModule, IsRegisteredByTheSystemsOwnProgram) {
   EXPECT_EQ(Read(kTreeProgId, u""), "no key");
 }
 
+TEST(WindowsModule, InstallWritesNothing) {
+  const HMODULE module = LoadLibraryW(platform::ToSystemText(Module().c_str()));
+  ASSERT_NE(module, nullptr);
+  const auto install = reinterpret_cast<HRESULT(STDAPICALLTYPE*)(BOOL, LPCWSTR)>(
+      reinterpret_cast<void*>(GetProcAddress(module, "DllInstall")));
+  ASSERT_NE(install, nullptr);
+  for (const wchar_t* line : {static_cast<const wchar_t*>(nullptr), L"user"}) {
+    for (const BOOL flag : {TRUE, FALSE}) EXPECT_EQ(install(flag, line), S_OK);
+  }
+  for (const Entry& entry : Entries(Module())) EXPECT_EQ(Read(entry.key, entry.name), "no key");
+  EXPECT_TRUE(FreeLibrary(module));
+  EXPECT_EQ(GetModuleHandleW(L"ZKUsbMonitor.dll"), nullptr);
+}
+
 // What the tests below use: the simulated module, registered for all programs, over a PC into which a stick is plugged
 // without a message.
 class Client : public testing::Test {
@@ -154,19 +169,27 @@ ComPtr<Interface> Create(const CLSID& clsid, const char16_t* progId = nullptr) {
 bool IsLoaded() { return GetModuleHandleW(L"ZKUsbMonitorSimulated.dll") != nullptr; }
 
 TEST_F(Client, ThatOnlyMadeATreeCanUnloadTheModule) {
+  constexpr int kCycles = 20;
   InApartment(COINIT_MULTITHREADED, [] {
-    {
-      const auto tree = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree, kTreeProgId);
+    for (int cycle = 0; cycle < kCycles && !HasFailure(); ++cycle) {
+      EXPECT_FALSE(IsLoaded()) << cycle;
+      auto tree = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree, kTreeProgId);
       ASSERT_TRUE(tree);
-      const auto same = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree);
+      auto same = Create<IZKUMUsbTree>(CLSID_ZKUMUsbTree);
       EXPECT_EQ(same.Get(), tree.Get());
       ComPtr<IZKUMUsbTreeNode> root;
-      EXPECT_EQ(tree->get_RootNode(root.Put()), E_POINTER);
+      EXPECT_EQ(tree->get_RootNode(root.Put()), E_POINTER) << "a tree of the cycle before";
+      EXPECT_EQ(tree.As<IBuildUsbTree>()->BuildTree(), S_OK);
+      EXPECT_EQ(tree->get_RootNode(root.Put()), S_OK);
+      // A node alone keeps it.
+      tree.Reset();
+      same.Reset();
       CoFreeUnusedLibrariesEx(0, 0);
       EXPECT_TRUE(IsLoaded());
+      root.Reset();
+      CoFreeUnusedLibrariesEx(0, 0);
+      CoFreeUnusedLibrariesEx(0, 0);
     }
-    CoFreeUnusedLibrariesEx(0, 0);
-    CoFreeUnusedLibrariesEx(0, 0);
     EXPECT_FALSE(IsLoaded());
   });
 }
