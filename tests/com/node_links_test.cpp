@@ -74,7 +74,7 @@ TEST_F(NodeLinks, ListsWithoutTheirObjects) {
   const auto root = Wrap(sample.root);
   const std::size_t ring = sample.controller.RingSize();
   const HRESULT expected[] = {E_POINTER, E_POINTER, E_ACCESSDENIED, S_OK};
-  for (std::uint64_t call = 1; call <= std::size(expected); ++call) {
+  for (std::size_t call = 1; call <= std::size(expected); ++call) {
     for (const bool subtree : {false, true}) {
       FailCriticalSection(call, E_ACCESSDENIED);
       ComPtr<IZKUMUsbTreeNodeEnumerator> list;
