@@ -8,6 +8,8 @@
 #include <sstream>
 
 #include "platform/com.h"
+#include "platform/text.h"
+#include "tests/support/program.h"
 #include "tests/windows/module_files.h"
 #include "tools/type_library/type_library_dump.h"
 
@@ -29,6 +31,27 @@ TEST(TypeLibrary, SaysWhatWasPublished) {
       EXPECT_EQ(line, want);
     }
     EXPECT_FALSE(std::getline(dump, line)) << "too much: " << line;
+  }
+}
+
+TEST(TypeLibrary, IsPrintedByAProgram) {
+  const std::string program = platform::ToUtf8(ModuleFile(u"zkusb_typelib.exe"));
+  const std::string module = platform::ToUtf8(Module());
+  const struct {
+    std::vector<std::string> args;
+    int code;
+    std::string out, reason;
+  } cases[] = {{{module}, 0, DumpTypeLibrary(Module()), ""},
+               {{program}, 1, "", program + ": no type library"},
+               {{module + "?"}, 1, "", "no type library"},
+               {{}, 2, "", "usage"},
+               {{module, module}, 2, "", "usage"}};
+  for (const auto& [args, code, out, reason] : cases) {
+    const ProgramResult result = RunProgram(program, args);
+    EXPECT_EQ(result.code, code);
+    EXPECT_EQ(result.out, out);
+    EXPECT_EQ(result.err.empty(), reason.empty());
+    EXPECT_NE(result.err.find(reason), std::string::npos) << result.err;
   }
 }
 
