@@ -15,8 +15,7 @@ using Link = std::optional<DevInst>;
 using Text = std::optional<std::u16string>;
 
 // A device manager that answers what it is told, sense or not. Unset links and texts fail.
-class ScriptedManager final : public platform::DeviceManager {
- public:
+struct ScriptedManager final : platform::DeviceManager {
   struct Node {
     Link parent{}, child{}, sibling{};
     Text id{}, driver{}, description{};
@@ -39,8 +38,6 @@ class ScriptedManager final : public platform::DeviceManager {
     const bool driver = property == platform::kCM_DRP_DRIVER;
     return GiveText(nodes[n], driver ? nodes[n].driver : nodes[n].description, buffer, bytes);
   }
-
- private:
   Status Give(Link link, DevInst& out) {
     ++calls;
     if (!link) return Status::Failure(platform::kCR_NO_SUCH_DEVNODE);
@@ -74,10 +71,10 @@ TEST(DevNode, TextsAreReadWithinTheirBuffers) {
                         {{.description = u"ABC", .claimedBytes = 0}, u"", u""},
                         {{.description = u"ABC", .claimedBytes = 100000}, u"ABC", u""}};
   ScriptedManager manager;
-  for (const Case& c : cases) {
-    manager.nodes[5] = c.node;
-    EXPECT_EQ(GetDeviceDescription(manager, 5), c.description);
-    EXPECT_EQ(GetDeviceId(manager, 5), c.id);
+  for (const auto& [node, description, id] : cases) {
+    manager.nodes[5] = node;
+    EXPECT_EQ(GetDeviceDescription(manager, 5), description);
+    EXPECT_EQ(GetDeviceId(manager, 5), id);
   }
   // No node: the system is not even asked for a handle of 0, and ids of unknown handles are empty.
   manager.nodes[0] = manager.nodes[kUnknownDevInst] = {.id = u"A", .description = u"A"};
@@ -97,15 +94,15 @@ TEST(DevNode, ParentIsResolved) {
                         {u"V\\_??_A#{x}", u"root\\volmgr\\0000", u"root\\volmgr\\0000"},
                         {u"V\\_??_A#{x}", u"ROOT\\VOLMGR", u"ROOT\\VOLMGR"},
                         {u"V\\_??_A#{x}", u"X\\ROOT\\VOLMGR\\", u"X\\ROOT\\VOLMGR\\"}};
-  for (const Case& c : cases) {
+  for (const auto& [id, parentId, resolved] : cases) {
     ScriptedManager manager;
-    manager.nodes = {{2, {.parent = 3}}, {3, {.id = c.parentId}}};
+    manager.nodes = {{2, {.parent = 3}}, {3, {.id = parentId}}};
     NodeIdentity node;
-    node.m_strDevInstId = c.id;
+    node.m_strDevInstId = id;
     node.m_devInstHandle = 2;
     ResolveParentInstanceId(manager, node);
     EXPECT_EQ(node.m_devInstHandleParent, 3u);
-    EXPECT_EQ(node.m_strDevInstIdParent, c.resolved);
+    EXPECT_EQ(node.m_strDevInstIdParent, resolved);
     // A call that fails leaves the handle, and the id is read all the same.
     manager.nodes = {{3, {.id = u"OTHER"}}};
     ResolveParentInstanceId(manager, node);
@@ -151,26 +148,23 @@ TEST(DriverKey, FindsTheFirstNodeIgnoringCase) {
 
 // The last node is not reached.
 TEST(DriverKey, WalksEndOnEverySystem) {
-  struct Case {
-    const char* what;
-    std::map<DevInst, ScriptedManager::Node> changed;
-    Link root = 1;
-  };
-  const Case cases[] = {{"no root", {}, {}},
-                        {"a root of 0", {}, 0},
-                        {"a node that is its own child", {{4, {.parent = 2, .child = 4, .sibling = 5}}}},
-                        {"siblings in a circle", {{5, {.parent = 2, .sibling = 4}}}},
-                        {"a child that is its ancestor", {{5, {.parent = 2, .child = 1}}}},
-                        {"parents in a circle", {{5, {.parent = 6}}, {6, {.parent = 5, .driver = u""}}}},
-                        {"a node that is its own parent", {{5, {.parent = 5}}}},
-                        {"a node without parent", {{5, {}}}}};
-  for (const Case& c : cases) {
+  using Nodes = std::map<DevInst, ScriptedManager::Node>;
+  const std::tuple<const char*, Link, Nodes> cases[] = {
+      {"no root", {}, {}},
+      {"a root of 0", 0, {}},
+      {"a node that is its own child", 1, {{4, {.parent = 2, .child = 4, .sibling = 5}}}},
+      {"siblings in a circle", 1, {{5, {.parent = 2, .sibling = 4}}}},
+      {"a child that is its ancestor", 1, {{5, {.parent = 2, .child = 1}}}},
+      {"parents in a circle", 1, {{5, {.parent = 6}}, {6, {.parent = 5, .driver = u""}}}},
+      {"a node that is its own parent", 1, {{5, {.parent = 5}}}},
+      {"a node without parent", 1, {{5, {}}}}};
+  for (const auto& [what, root, changed] : cases) {
     ScriptedManager manager;
-    manager.nodes = c.changed;
+    manager.nodes = changed;
     manager.nodes.insert(kSmallTree.begin(), kSmallTree.end());
-    manager.root = c.root;
-    EXPECT_EQ(FindDevNodeByDriverKey(manager, u""), 0u) << c.what;
-    EXPECT_EQ(DriverKeyIndex(manager).Find(u""), 0u) << c.what;
+    manager.root = root;
+    EXPECT_EQ(FindDevNodeByDriverKey(manager, u""), 0u) << what;
+    EXPECT_EQ(DriverKeyIndex(manager).Find(u""), 0u) << what;
   }
 }
 

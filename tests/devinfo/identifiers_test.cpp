@@ -41,40 +41,34 @@ TEST(HexField, ScansWithinTheCount) {
 }
 
 TEST(InstanceId, IsTakenApart) {
-  struct Case {
-    const char16_t* id;
-    std::uint32_t vendorId, productId;
-    const char16_t *vendor, *product, *serial;
-  };
   // The record held 7, 8, "V", "P", "S" before; a value that shows them was not touched.
   constexpr std::uint32_t kNone = kUnknownId;
-  const Case cases[] = {
-      {u"USB\\VID_046D&PID_C52B&MI_00\\6&1A&0&0000", 0x046D, 0xC52B, u"V", u"P", u"6&1A&0&0000"},
-      {u"USBSTOR\\DISK&VEN_X&PROD_Y&REV_1.00\\4C53&0", kNone, 8, u"X", u"Y&REV_1.00", u"4C53&0"},
-      {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04\\3&11583659&0&A0", kNone, 8, u"8086", u"", u"S"},
-      {u"", kNone, 8, u"", u"P", u"S"},
-      {u"USB\\VID_046D\\1", kNone, 8, u"", u"P", u"S"},
-      {u"USB\\VID_046D\\VEN_A&PROD_B\\1", 0x046D, kNone, u"V", u"P", u"S"},
-      {u"VID_&PID_\\X", kNone, kNone, u"V", u"P", u"X"},
-      {u"USB\\VID_1&PID_2\\", 1, 2, u"V", u"P", u"S"},
-      {u"USB\\VID_1&PID_2", 1, kNone, u"V", u"P", u"S"},
-      {u"PID_2\\VID_1&X", 1, kNone, u"V", u"P", u"S"},
-      {u"A\\VEN_X&PROD_Y", kNone, 8, u"X", u"", u"S"},
-      {u"A\\VEN_X&PROD_Y\\", kNone, 8, u"X", u"Y", u"S"},
-      {u"VEN_&PROD_\\X", kNone, 8, u"", u"", u"X"}};
-  for (const Case& c : cases) {
+  const std::tuple<const char16_t*, std::uint32_t, std::uint32_t, const char16_t*, const char16_t*, const char16_t*>
+      cases[] = {{u"USB\\VID_046D&PID_C52B&MI_00\\6&1A&0&0000", 0x046D, 0xC52B, u"V", u"P", u"6&1A&0&0000"},
+                 {u"USBSTOR\\DISK&VEN_X&PROD_Y&REV_1.00\\4C53&0", kNone, 8, u"X", u"Y&REV_1.00", u"4C53&0"},
+                 {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04\\3&11583659&0&A0", kNone, 8, u"8086", u"", u"S"},
+                 {u"", kNone, 8, u"", u"P", u"S"},
+                 {u"USB\\VID_046D\\1", kNone, 8, u"", u"P", u"S"},
+                 {u"USB\\VID_046D\\VEN_A&PROD_B\\1", 0x046D, kNone, u"V", u"P", u"S"},
+                 {u"VID_&PID_\\X", kNone, kNone, u"V", u"P", u"X"},
+                 {u"USB\\VID_1&PID_2\\", 1, 2, u"V", u"P", u"S"},
+                 {u"USB\\VID_1&PID_2", 1, kNone, u"V", u"P", u"S"},
+                 {u"PID_2\\VID_1&X", 1, kNone, u"V", u"P", u"S"},
+                 {u"A\\VEN_X&PROD_Y", kNone, 8, u"X", u"", u"S"},
+                 {u"A\\VEN_X&PROD_Y\\", kNone, 8, u"X", u"Y", u"S"},
+                 {u"VEN_&PROD_\\X", kNone, 8, u"", u"", u"X"}};
+  for (const auto& [id, vendorId, productId, vendor, product, serial] : cases) {
     NodeIdentity node;
     node.m_nVendorId = 7;
     node.m_nProductId = 8;
     node.m_strVendor = u"V";
     node.m_strProduct = u"P";
     node.m_strSerialNumber = u"S";
-    node.SetInstanceId(c.id);
+    node.SetInstanceId(id);
     node.SetSerialNumber(u"");
-    EXPECT_THAT((std::array{node.m_nVendorId, node.m_nProductId}), ElementsAre(c.vendorId, c.productId))
-        << ToUtf8(c.id);
+    EXPECT_THAT((std::array{node.m_nVendorId, node.m_nProductId}), ElementsAre(vendorId, productId)) << ToUtf8(id);
     EXPECT_THAT((std::array{node.m_strDevInstId, node.m_strVendor, node.m_strProduct, node.m_strSerialNumber}),
-                ElementsAre(c.id, c.vendor, c.product, c.serial));
+                ElementsAre(id, vendor, product, serial));
   }
 }
 
@@ -96,28 +90,23 @@ TEST(GuidText, KeepsWhatStandsBeforeABreak) {
 }
 
 TEST(GuidText, FollowsTheRulesOfAScan) {
-  struct Case {
-    const char16_t* text;
-    std::uint32_t data1;
-    std::uint16_t data2, data3;
-    bool whole;
-  };
   // Blanks do not count against a width, but against the place where a group must end.
-  const Case cases[] = {{u"x12345678-9ABC-DEF0-1234-56789ABCDEF0 more", 0x12345678, 0x9ABC, 0xDEF0, true},
-                        {u"{ 2345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x2345678, 0x9ABC, 0xDEF0, true},
-                        {u"{ 12345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
-                        {u"{12345678 -9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0, 0, false},
-                        {u"{-2345678--ABC-DEF0-1234-56789ABCDEF0}", 0xFDCBA988, 0xF544, 0xDEF0, true},
-                        {u"{0x345678-0XBC-DEF0-1234-56789ABCDEF0}", 0x345678, 0xBC, 0xDEF0, true},
-                        {u"{12345678-0x-DEF0-1234-56789ABCDEF0}", 0x12345678, 0, 0, false},
-                        {u"{12345678-9ABC-DEF0-0x12-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
-                        {u"{1234567-9ABC-DEF0-1234-56789ABCDEF0}", 0x1234567, 0x9ABC, 0xDEF0, false},
-                        {u"{12345678-9ABCD-EF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0, false},
-                        {u"12345678-1234-5678-9ABC-DEF012345678", 0x2345678, 0x1234, 0x5678, false},
-                        {nullptr, 0, 0, 0, false}};
-  for (const Case& c : cases) {
-    EXPECT_EQ(ParseGuidText(c.text), (Guid{c.data1, c.data2, c.data3, c.whole ? kGoodBytes : kNoBytes}))
-        << (c.text ? ToUtf8(c.text) : "null");
+  const std::tuple<const char16_t*, std::uint32_t, std::uint16_t, std::uint16_t, bool> cases[] = {
+      {u"x12345678-9ABC-DEF0-1234-56789ABCDEF0 more", 0x12345678, 0x9ABC, 0xDEF0, true},
+      {u"{ 2345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x2345678, 0x9ABC, 0xDEF0, true},
+      {u"{ 12345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
+      {u"{12345678 -9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0, 0, false},
+      {u"{-2345678--ABC-DEF0-1234-56789ABCDEF0}", 0xFDCBA988, 0xF544, 0xDEF0, true},
+      {u"{0x345678-0XBC-DEF0-1234-56789ABCDEF0}", 0x345678, 0xBC, 0xDEF0, true},
+      {u"{12345678-0x-DEF0-1234-56789ABCDEF0}", 0x12345678, 0, 0, false},
+      {u"{12345678-9ABC-DEF0-0x12-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
+      {u"{1234567-9ABC-DEF0-1234-56789ABCDEF0}", 0x1234567, 0x9ABC, 0xDEF0, false},
+      {u"{12345678-9ABCD-EF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0, false},
+      {u"12345678-1234-5678-9ABC-DEF012345678", 0x2345678, 0x1234, 0x5678, false},
+      {nullptr, 0, 0, 0, false}};
+  for (const auto& [text, data1, data2, data3, whole] : cases) {
+    EXPECT_EQ(ParseGuidText(text), (Guid{data1, data2, data3, whole ? kGoodBytes : kNoBytes}))
+        << (text ? ToUtf8(text) : "null");
   }
   // A signed byte is the low byte of its number.
   EXPECT_THAT(ParseGuidText(u"{00000000-0000-0000--1+2-000000000000}").Data4, ElementsAre(0xFF, 2, 0, 0, 0, 0, 0, 0));
@@ -146,22 +135,18 @@ TEST(DerivedIds, ComeFromPathsAndVolumes) {
 }
 
 TEST(PciHardwareId, NeedsAllFourNumbers) {
-  struct Case {
-    const char16_t* text;
-    bool complete;
-    std::uint32_t vendor, device, subSys, revision;
-  };
-  const Case cases[] = {{u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04", true, 0x8086, 0x1E31, 0x1E318086, 4},
-                        {u"PCI\\VEN_ 8086&DEV_+1&SUBSYS_-1&REV_0x4Z", true, 0x8086, 1, 0xFFFFFFFF, 4},
-                        {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1&REV_", false, 0x8086, 0x1E31, 1, 0},
-                        {u"PCI\\VEN_8086 &DEV_1E31", false, 0x8086, 0, 0, 0},
-                        {u"pci\\VEN_8086&DEV_1E31&SUBSYS_1&REV_1", false, 0, 0, 0, 0},
-                        {nullptr, false, 0, 0, 0, 0}};
-  for (const Case& c : cases) {
-    const PciHardwareId id = ParsePciHardwareId(c.text);
+  const std::tuple<const char16_t*, bool, std::uint32_t, std::uint32_t, std::uint32_t, std::uint32_t> cases[] = {
+      {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04", true, 0x8086, 0x1E31, 0x1E318086, 4},
+      {u"PCI\\VEN_ 8086&DEV_+1&SUBSYS_-1&REV_0x4Z", true, 0x8086, 1, 0xFFFFFFFF, 4},
+      {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1&REV_", false, 0x8086, 0x1E31, 1, 0},
+      {u"PCI\\VEN_8086 &DEV_1E31", false, 0x8086, 0, 0, 0},
+      {u"pci\\VEN_8086&DEV_1E31&SUBSYS_1&REV_1", false, 0, 0, 0, 0},
+      {nullptr, false, 0, 0, 0, 0}};
+  for (const auto& [text, complete, vendor, device, subSys, revision] : cases) {
+    const PciHardwareId id = ParsePciHardwareId(text);
     EXPECT_THAT((std::array{id.Complete ? 1u : 0u, id.VendorId, id.DeviceId, id.SubSysId, id.Revision}),
-                ElementsAre(c.complete, c.vendor, c.device, c.subSys, c.revision))
-        << (c.text ? ToUtf8(c.text) : "null");
+                ElementsAre(complete, vendor, device, subSys, revision))
+        << (text ? ToUtf8(text) : "null");
   }
 }
 

@@ -191,23 +191,18 @@ TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
   const Device root = Node(u"USB\\DISK"), other = Node(u"USB\\OTHER");
   const Device a = Node(u"A", root.id), ofOther = Node(u"B", other.id);
   const DeviceNodeRecord disk = drive(u"USB\\DISK", u"P");
-  struct Case {
-    std::vector<Device> devices;
-    std::vector<DeviceNodeRecord> drives;
-    std::string current;
-  };
   // A record made for a drive counts for the drives behind it.
-  const Case cases[] = {
+  const std::tuple<std::vector<Device>, std::vector<DeviceNodeRecord>, std::string> cases[] = {
       {{root}, {disk}, "USB\\DISK"},  // no record at all
       {{root, a}, {drive(u"usb\\Disk", u"P")}, "A usb\\Disk"},
       {{root, other, a, ofOther}, {disk}, "A B"},
       {{root, a, Node(u"C", root.id)}, {drive(u"USB\\X", u"P"), disk}, "A C USB\\DISK"},
       {{}, {drive(u"D1", u"D2"), drive(u"D2", u"d2"), drive(u"D2", u"D3"), drive(u"D2", u"")}, "D1 D2 D2"}};
-  for (const Case& c : cases) {
-    Start(c.devices);
-    cache->SetDiskDrives(c.drives);
+  for (const auto& [devices, drives, current] : cases) {
+    Start(devices);
+    cache->SetDiskDrives(drives);
     EXPECT_EQ(cache->EnumerateDeviceNodes({}), 0u);
-    EXPECT_EQ(Ids(cache->Current()), c.current);
+    EXPECT_EQ(Ids(cache->Current()), current);
   }
   Start({});
   DeviceNodeRecord full = drive(u"SCSI\\DISK&VEN_V&PROD_P\\S", u"PCI\\P");

@@ -73,13 +73,7 @@ class StorageQuery : public testing::Test {
 TEST_F(StorageQuery, TextsOfTheDescriptor) {
   using namespace std::string_view_literals;
   const auto answer = DescriptorAnswer;
-  struct Case {
-    const char* name;
-    AnsweringHost::Answer answer;
-    std::uint8_t type;
-    std::u16string texts;
-  };
-  const Case cases[] = {
+  const std::tuple<const char*, AnsweringHost::Answer, std::uint8_t, std::u16string> cases[] = {
       {"a stick", answer(0, {36, 45, 49, 52}, "SanDisk \0Cru\0.1\0S1\0"sv, 55), 0, u"SanDisk |Cru|.1|S1"},
       {"no text", answer(3, {}, ""sv, 36), 3, u"|||old"},
       {"empty texts", answer(0, {36, 36, 36, 36}, "\0"sv, 37), 0, u"|||old"},
@@ -90,18 +84,18 @@ TEST_F(StorageQuery, TextsOfTheDescriptor) {
       {"an offset into the head", answer(65, {8}, ""sv, 36), 15, u"A|||old"},
       {"offsets not received", answer(4, {12, 36, 36, 36}, "abc\0"sv, 16), 4, u"\x0C|||old"},
       {"nothing received", answer(5, {36, 0, 0, 36}, "abc\0"sv, 0), 0, u"|||old"}};
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.name);
+  for (const auto& [name, answer, type, texts] : cases) {
+    SCOPED_TRACE(name);
     CZKUMInterfaceDeviceImpl fresh;
     fresh.m_strSerialNumber = u"old";
     diagnostics.clear();
-    host.descriptor = c.answer;
+    host.descriptor = answer;
     EXPECT_EQ(QueryStorageProperties(host, host, fresh, diagnostics), KStorageAccepted);
     EXPECT_EQ(fresh.StorageVendorId + u"|" + fresh.StorageProductId + u"|" + fresh.ProductRev + u"|" +
                   fresh.m_strSerialNumber,
-              c.texts);
-    EXPECT_EQ(fresh.m_strDeviceDescr, StorageDeviceTypeName(c.type));
-    EXPECT_EQ(fresh.DescriptorLength, std::min(c.answer.returned, 512u));
+              texts);
+    EXPECT_EQ(fresh.m_strDeviceDescr, StorageDeviceTypeName(type));
+    EXPECT_EQ(fresh.DescriptorLength, std::min(answer.returned, 512u));
     EXPECT_EQ(diagnostics, kErrorLine + kNotSupported);
   }
 }
@@ -126,24 +120,21 @@ TEST_F(StorageQuery, TextsAreAppendedAndCdDrivesAndFailedQueriesRejected) {
 TEST_F(StorageQuery, SerialNumbers) {
   std::vector<std::uint8_t> text(20), full(800, 'm');
   text[16] = 'M';
-  struct Case {
-    AnsweringHost::Answer answer;
-    std::u16string text, line;
-  };
   const std::u16string found = u"IOCTL_STORAGE_GET_MEDIA_SERIAL_NUMBER found\r\n";
   const std::u16string notValid = u"\r\n              The request is not valid for this device.\r\n";
-  const Case cases[] = {// Four bytes carry no text: so it is with every driver that keeps to the buffer's size.
-                        {{Status::Success(), {6, 0, 0, 0}, 4}, u"", found},
-                        {{Status::Success(), text, 20}, u"M", found},
-                        {{Status::Success(), full, 800}, std::u16string(392, u'\u6D6D'), found},
-                        {{Status::Failure(1), text, 20}, u"", kErrorLine + notValid},
-                        {{Status::Failure(50), text, 20}, u"", kErrorLine + kNotSupported},
-                        {{Status::Failure(21), {}, 0}, u"", kErrorLine + u"21\r\n"}};
-  for (const Case& c : cases) {
-    host.mediaSerial = c.answer;
+  const std::tuple<AnsweringHost::Answer, std::u16string, std::u16string> cases[] = {
+      // Four bytes carry no text: so it is with every driver that keeps to the buffer's size.
+      {{Status::Success(), {6, 0, 0, 0}, 4}, u"", found},
+      {{Status::Success(), text, 20}, u"M", found},
+      {{Status::Success(), full, 800}, std::u16string(392, u'\u6D6D'), found},
+      {{Status::Failure(1), text, 20}, u"", kErrorLine + notValid},
+      {{Status::Failure(50), text, 20}, u"", kErrorLine + kNotSupported},
+      {{Status::Failure(21), {}, 0}, u"", kErrorLine + u"21\r\n"}};
+  for (const auto& [answer, text, line] : cases) {
+    host.mediaSerial = answer;
     diagnostics = u"|";
-    EXPECT_EQ(QueryMediaSerialNumber(host, 77, diagnostics), c.text);
-    EXPECT_EQ(diagnostics, u"|" + c.line);
+    EXPECT_EQ(QueryMediaSerialNumber(host, 77, diagnostics), text);
+    EXPECT_EQ(diagnostics, u"|" + line);
     EXPECT_EQ(host.handles.back(), 77);
   }
   // For the volume's the system wants a backslash at the end, and a device path has none.

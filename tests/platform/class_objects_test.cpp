@@ -82,26 +82,21 @@ TEST(ClassObjects, OfTheRegistryAreLookedUpStepByStep) {
   // A library that is no server: the platform layer itself.
   const std::u16string noServer = platform::FromUtf8(ZKUSB_PLATFORM_LIBRARY);
   const std::u16string server = key + u"\\InprocServer32";
-  const struct {
-    const char* what;
-    std::u16string key;
-    const char16_t* name;
-    std::u16string text;
-    HRESULT result;
-  } kCases[] = {{"no key", u"CLSID", nullptr, u"", REGDB_E_CLASSNOTREG},
-                {"no server", key, u"", noServer, REGDB_E_CLASSNOTREG},
-                {"no path", server, nullptr, u"", REGDB_E_CLASSNOTREG},
-                {"an empty path", server, u"", u"", REGDB_E_CLASSNOTREG},
-                {"no library", server, u"", u"/dev/null", CO_E_DLLNOTFOUND},
-                {"a library that is no server", server, u"", noServer, CO_E_ERRORINDLL}};
+  const std::tuple<const char*, std::u16string, const char16_t*, std::u16string, HRESULT> kCases[] = {
+      {"no key", u"CLSID", nullptr, u"", REGDB_E_CLASSNOTREG},
+      {"no server", key, u"", noServer, REGDB_E_CLASSNOTREG},
+      {"no path", server, nullptr, u"", REGDB_E_CLASSNOTREG},
+      {"an empty path", server, u"", u"", REGDB_E_CLASSNOTREG},
+      {"no library", server, u"", u"/dev/null", CO_E_DLLNOTFOUND},
+      {"a library that is no server", server, u"", noServer, CO_E_ERRORINDLL}};
   platform::SetCurrentSystem({});
   EXPECT_EQ(Ask(kClass, IUnknown::kIid), REGDB_E_CLASSNOTREG) << "no registry";
-  for (const auto& test : kCases) {
-    SCOPED_TRACE(test.what);
+  for (const auto& [what, key, name, text, result] : kCases) {
+    SCOPED_TRACE(what);
     platform::simulated::SimulatedRegistry registry;
     platform::SetCurrentSystem({.registry = &registry});
-    Put(registry, test.key, test.name, test.text);
-    EXPECT_EQ(Ask(kClass, IUnknown::kIid), test.result);
+    Put(registry, key, name, text);
+    EXPECT_EQ(Ask(kClass, IUnknown::kIid), result);
     CoFreeUnusedLibraries();
     testing_support::ExpectAllClosed(registry);
   }
@@ -110,32 +105,29 @@ TEST(ClassObjects, OfTheRegistryAreLookedUpStepByStep) {
 
 TEST(ClassObjects, AreNamedByProgramIdentifiers) {
   const std::u16string& text = kClassText;
-  const struct {
-    const char16_t* progId;
-    std::u16string text;  // that the registry has for Server.1
-    HRESULT result;
-  } kCases[] = {{u"Server.1", text, S_OK},
-                {u"SERVER.1", u"{12345678-9abc-def0-0102-0304050607ff}", S_OK},
-                {u"Server", text, CO_E_CLASSSTRING},
-                {u"", text, CO_E_CLASSSTRING},
-                {u"Server.1", u"", CO_E_CLASSSTRING},
-                {u"Server.1", text.substr(1, 36), CO_E_CLASSSTRING},
-                {u"Server.1", u"(" + text.substr(1), CO_E_CLASSSTRING},
-                {u"Server.1", text + u" ", CO_E_CLASSSTRING},
-                {u"Server.1", u"{1234567G-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
-                {u"Server.1", u"{+2345678-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
-                {u"Server.1", u"{12345678-9ABC-DEF0-01020-304050607FF}", CO_E_CLASSSTRING}};
+  const std::tuple<const char16_t*, std::u16string, HRESULT> kCases[] = {
+      {u"Server.1", text, S_OK},
+      {u"SERVER.1", u"{12345678-9abc-def0-0102-0304050607ff}", S_OK},
+      {u"Server", text, CO_E_CLASSSTRING},
+      {u"", text, CO_E_CLASSSTRING},
+      {u"Server.1", u"", CO_E_CLASSSTRING},
+      {u"Server.1", text.substr(1, 36), CO_E_CLASSSTRING},
+      {u"Server.1", u"(" + text.substr(1), CO_E_CLASSSTRING},
+      {u"Server.1", text + u" ", CO_E_CLASSSTRING},
+      {u"Server.1", u"{1234567G-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
+      {u"Server.1", u"{+2345678-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
+      {u"Server.1", u"{12345678-9ABC-DEF0-01020-304050607FF}", CO_E_CLASSSTRING}};
   CLSID clsid{};
-  for (const auto& test : kCases) {
-    SCOPED_TRACE(platform::ToUtf8(test.progId + (u" " + test.text)));
+  for (const auto& [progId, text, result] : kCases) {
+    SCOPED_TRACE(platform::ToUtf8(progId + (u" " + text)));
     platform::simulated::SimulatedRegistry registry;
     platform::SetCurrentSystem({.registry = &registry});
-    Put(registry, u"Server.1\\CLSID", u"", test.text);
+    Put(registry, u"Server.1\\CLSID", u"", text);
     clsid = {1, 2, 3, {}};
-    EXPECT_EQ(CLSIDFromProgID(test.progId, &clsid), test.result);
-    EXPECT_EQ(clsid, test.result == S_OK ? kClass : GUID_NULL);
-    const auto parsed = platform::ParseGuid(test.text);
-    EXPECT_EQ(parsed.has_value(), platform::EqualIgnoringCase(test.text, kClassText));
+    EXPECT_EQ(CLSIDFromProgID(progId, &clsid), result);
+    EXPECT_EQ(clsid, result == S_OK ? kClass : GUID_NULL);
+    const auto parsed = platform::ParseGuid(text);
+    EXPECT_EQ(parsed.has_value(), platform::EqualIgnoringCase(text, kClassText));
     EXPECT_EQ(parsed.value_or(kClass), kClass);
   }
   platform::SetCurrentSystem({});

@@ -97,19 +97,15 @@ TEST(ComFunctions, VariantsOfOtherTypesAreRefusedAndKept) {
 }
 
 TEST(ComFunctions, ApartmentsNestPerThread) {
-  const struct {
-    HRESULT ordered;  // S_OK: none
-    DWORD model;
-    HRESULT result;
-    std::uint32_t depth;
-  } rows[] = {{E_OUTOFMEMORY, COINIT_MULTITHREADED, E_OUTOFMEMORY, 0},
-              {S_OK, COINIT_APARTMENTTHREADED, S_OK, 1},
-              {S_OK, COINIT_MULTITHREADED, RPC_E_CHANGED_MODE, 1},
-              {S_OK, COINIT_APARTMENTTHREADED, S_FALSE, 2}};
-  for (const auto& row : rows) {
-    if (FAILED(row.ordered)) platform::controls::FailNextCoInitialize(row.ordered);
-    EXPECT_EQ(CoInitializeEx(nullptr, row.model), row.result);
-    EXPECT_EQ(platform::controls::ApartmentDepth(), row.depth);
+  const std::tuple<HRESULT, DWORD, HRESULT, std::uint32_t> rows[] = {
+      {E_OUTOFMEMORY, COINIT_MULTITHREADED, E_OUTOFMEMORY, 0},
+      {S_OK, COINIT_APARTMENTTHREADED, S_OK, 1},
+      {S_OK, COINIT_MULTITHREADED, RPC_E_CHANGED_MODE, 1},
+      {S_OK, COINIT_APARTMENTTHREADED, S_FALSE, 2}};
+  for (const auto& [ordered, model, result, depth] : rows) {
+    if (FAILED(ordered)) platform::controls::FailNextCoInitialize(ordered);
+    EXPECT_EQ(CoInitializeEx(nullptr, model), result);
+    EXPECT_EQ(platform::controls::ApartmentDepth(), depth);
   }
   std::thread([] { EXPECT_EQ(platform::controls::ApartmentDepth(), 0u); }).join();
   for (const std::uint32_t depth : {1u, 0u, 0u}) {

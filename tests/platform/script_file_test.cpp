@@ -59,10 +59,7 @@ TEST(ScriptFile, ReadsEveryKindOfStep) {
 
 TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
   const std::string wait = R"({"at": 9, "wait": true}, )";
-  const struct {
-    std::string steps;
-    std::string error;
-  } kCases[] = {
+  const std::string kCases[][2] = {
       {R"({"at": 1})", R"(steps[0]: needs one of "plug", "unplug", "mount", "dismount", "wait")"},
       {R"({"wait": true, "unplug": "A"})", R"(steps[0]: has both "unplug" and "wait")"},
       {R"({"wait": false})", "steps[0].wait: must be true"},
@@ -78,8 +75,8 @@ TEST(ScriptFile, RefusesEachMistakeWithItsPlace) {
        R"(steps[0].plug.devices[0].id: a second device with the id "usb\a\1" )"
        "(the first is there already)"},
   };
-  for (const auto& test : kCases) {
-    EXPECT_EQ(ScriptError(test.steps), "s.json: " + test.error) << test.steps;
+  for (const auto& [steps, error] : kCases) {
+    EXPECT_EQ(ScriptError(steps), "s.json: " + error) << steps;
   }
   // What a step needs of the PC is refused with the PC's own reason.
   for (const std::string step :

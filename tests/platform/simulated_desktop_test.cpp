@@ -198,13 +198,11 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
     Pump();
   });
   desktop.RunFor(0);
-  const struct {
-    DeviceBroadcast broadcast;
-    std::vector<WindowHandle> recipients;
-  } kCases[] = {{VolumeBroadcast(kDBT_DEVICEARRIVAL, u'e', 0), {all, some}},
-                {{kDBT_DEVNODES_CHANGED, {}}, {all, some}},
-                {InterfaceBroadcast(kDBT_DEVICEARRIVAL, disks, u"x"), {all, some, child}},
-                {InterfaceBroadcast(kDBT_DEVICEARRIVAL, GUID_DEVINTERFACE_VOLUME, u"x"), {all}}};
+  const std::pair<DeviceBroadcast, std::vector<WindowHandle>> kCases[] = {
+      {VolumeBroadcast(kDBT_DEVICEARRIVAL, u'e', 0), {all, some}},
+      {{kDBT_DEVNODES_CHANGED, {}}, {all, some}},
+      {InterfaceBroadcast(kDBT_DEVICEARRIVAL, disks, u"x"), {all, some, child}},
+      {InterfaceBroadcast(kDBT_DEVICEARRIVAL, GUID_DEVINTERFACE_VOLUME, u"x"), {all}}};
   std::vector<std::byte> seen;
   g_answer = [&](const MSG& message) {
     if (message.lParam == 0) return 0;
@@ -214,17 +212,17 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
     seen.assign(bytes, bytes + size);
     return 0;
   };
-  for (const auto& test : kCases) {
+  for (const auto& [broadcast, recipients] : kCases) {
     handled.clear();
-    EXPECT_EQ(desktop.Broadcast(test.broadcast), test.recipients.size());
-    ASSERT_EQ(handled.size(), test.recipients.size());
+    EXPECT_EQ(desktop.Broadcast(broadcast), recipients.size());
+    ASSERT_EQ(handled.size(), recipients.size());
     for (std::size_t i = 0; i < handled.size(); ++i) {
-      EXPECT_EQ(handled[i].window, test.recipients[i]);
+      EXPECT_EQ(handled[i].window, recipients[i]);
       EXPECT_EQ(handled[i].message, kWM_DEVICECHANGE);
-      EXPECT_EQ(handled[i].wParam, test.broadcast.event);
+      EXPECT_EQ(handled[i].wParam, broadcast.event);
     }
-    if (!test.broadcast.record.empty()) {
-      EXPECT_EQ(seen, test.broadcast.record);
+    if (!broadcast.record.empty()) {
+      EXPECT_EQ(seen, broadcast.record);
     }
   }
   g_answer = nullptr;
@@ -232,15 +230,12 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
   DEV_BROADCAST_DEVICEINTERFACE_W shorter = filter, volumes = filter;
   shorter.dbcc_size = 28;
   volumes.dbcc_devicetype = kDBT_DEVTYP_VOLUME;
-  const struct {
-    WindowHandle window;
-    DEV_BROADCAST_DEVICEINTERFACE_W* filter;
-    std::uint32_t flags, error;
-  } kRefused[] = {{0, &filter, 4, 87},    {all, nullptr, 4, 87},  {all, &filter, 1, 87},
-                  {all, &shorter, 4, 87}, {all, &volumes, 4, 87}, {all + 100, &filter, 4, 1400}};
-  for (const auto& test : kRefused) {
+  const std::tuple<WindowHandle, DEV_BROADCAST_DEVICEINTERFACE_W*, std::uint32_t, std::uint32_t> kRefused[] = {
+      {0, &filter, 4, 87},    {all, nullptr, 4, 87},  {all, &filter, 1, 87},
+      {all, &shorter, 4, 87}, {all, &volumes, 4, 87}, {all + 100, &filter, 4, 1400}};
+  for (const auto& [window, filter, flags, error] : kRefused) {
     NotificationHandle refused = 5;
-    EXPECT_EQ(desktop.RegisterDeviceNotificationW(test.window, test.filter, test.flags, refused).error, test.error);
+    EXPECT_EQ(desktop.RegisterDeviceNotificationW(window, filter, flags, refused).error, error);
     EXPECT_EQ(refused, 0);
   }
   EXPECT_TRUE(desktop.UnregisterDeviceNotification(registrations[1]));

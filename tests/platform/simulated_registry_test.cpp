@@ -31,11 +31,7 @@ TEST(SimulatedRegistry, FindsKeysAsTheSystemDoes) {
   const std::u16string tooLong = longest + u"n";
   std::u16string tooDeep;
   for (int level = 0; level < 512; ++level) tooDeep += u"d\\";
-  const struct {
-    const char* what;
-    std::u16string path;
-    std::uint32_t open, create, remove;  // the codes of opening, of creating and then deleting it
-  } kCases[] = {
+  const std::tuple<const char*, std::u16string, std::uint32_t, std::uint32_t, std::uint32_t> kCases[] = {
       {"a key with another below", u"Top", kOk, kOk, kERROR_ACCESS_DENIED},
       {"without case, a backslash at the end", u"tOP\\sub\\", kOk, kOk, kOk},
       {"not there", u"Top\\Other\\Below", kERROR_FILE_NOT_FOUND, kOk, kOk},
@@ -45,24 +41,23 @@ TEST(SimulatedRegistry, FindsKeysAsTheSystemDoes) {
       {"a longer name", tooLong, kERROR_INVALID_PARAMETER, kERROR_INVALID_PARAMETER, kERROR_INVALID_PARAMETER},
       {"too many levels", tooDeep, kERROR_FILE_NOT_FOUND, kERROR_INVALID_PARAMETER, kERROR_FILE_NOT_FOUND},
   };
-  for (const auto& test : kCases) {
-    SCOPED_TRACE(test.what);
+  for (const auto& [what, path, open, create, remove] : kCases) {
+    SCOPED_TRACE(what);
     SimulatedRegistry registry;
     Put(registry, u"Top\\Sub");
     RegistryKeyHandle key = 77;
-    EXPECT_EQ(Code(registry.OpenKey(kHKEY_CLASSES_ROOT, test.path.c_str(), kKEY_READ, key)), test.open);
-    EXPECT_EQ(key != kNoRegistryKey, test.open == kOk);
-    if (test.open == kOk) {
+    EXPECT_EQ(Code(registry.OpenKey(kHKEY_CLASSES_ROOT, path.c_str(), kKEY_READ, key)), open);
+    EXPECT_EQ(key != kNoRegistryKey, open == kOk);
+    if (open == kOk) {
       EXPECT_TRUE(registry.CloseKey(key));
     }
     std::uint32_t disposition = 0;
-    EXPECT_EQ(Code(registry.CreateKey(kHKEY_CLASSES_ROOT, test.path.c_str(), kKEY_READ, key, disposition)),
-              test.create);
-    if (test.create == kOk) {
-      EXPECT_EQ(disposition, test.open == kOk ? kREG_OPENED_EXISTING_KEY : kREG_CREATED_NEW_KEY);
+    EXPECT_EQ(Code(registry.CreateKey(kHKEY_CLASSES_ROOT, path.c_str(), kKEY_READ, key, disposition)), create);
+    if (create == kOk) {
+      EXPECT_EQ(disposition, open == kOk ? kREG_OPENED_EXISTING_KEY : kREG_CREATED_NEW_KEY);
       EXPECT_TRUE(registry.CloseKey(key));
     }
-    EXPECT_EQ(Code(registry.DeleteKey(kHKEY_CLASSES_ROOT, test.path.c_str())), test.remove);
+    EXPECT_EQ(Code(registry.DeleteKey(kHKEY_CLASSES_ROOT, path.c_str())), remove);
     ExpectAllClosed(registry);
   }
 }

@@ -123,12 +123,7 @@ std::string ToText(const Records& level) {
 }
 
 TEST(DeviceForest, ChainsThatEndInDiskDrives) {
-  struct Case {
-    const char* what;
-    const char* records;
-    const char* forest;
-  };
-  const Case cases[] = {
+  const char* const cases[][3] = {
       {"parents read first", "a- ba d*b", "a(b(d))"},
       {"children read first", "d*b ba a-", "a(b(d))"},
       {"branches without disk", "a- ba ca d*c e*a fa", "a(c(d) e)"},
@@ -145,8 +140,8 @@ TEST(DeviceForest, ChainsThatEndInDiskDrives) {
       {"a circle of three", "ac ba cb d*b", "c(a(b(d)))"},
       {"a circle without disk", "ab ba d*x", "d"},
   };
-  for (const Case& c : cases) {
-    EXPECT_EQ(ToText(LinkDeviceForest(FromText(c.records))), c.forest) << c.what;
+  for (const auto& [what, records, forest] : cases) {
+    EXPECT_EQ(ToText(LinkDeviceForest(FromText(records))), forest) << what;
   }
 }
 
@@ -169,12 +164,7 @@ std::string NodesOf(const Records& forest, const NodePtr& root) {
 }
 
 TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
-  struct Case {
-    const char* what;
-    Records forest;
-    const char* nodes;
-  };
-  const Case cases[] = {
+  const std::tuple<const char*, Records, const char*> cases[] = {
       {"no PCI device", {Record(u"ACPI\\A", {Record(u"pci\\B", {Record(u"IDE\\D")})})}, ""},
       {"below something else, by the text anywhere in its id, and after one at the top",
        {Record(u"PCI\\T"), Record(u"ACPI\\A", {Record(u"ACPI\\B", {Record(u"XPCI\\C")})})},
@@ -191,8 +181,8 @@ TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
        "..port 0 status 0 D port 0 < of D\n...device D 'name of D' class of D speed 0\n"
        "..port 0 status 0 E port 0 < of E\n...device E 'name of E' class of E speed 0\n"},
   };
-  for (const Case& c : cases) {
-    EXPECT_EQ(NodesOf(c.forest, MakeRecord<CZKUMUsbTreeRootImpl>()), c.nodes) << c.what;
+  for (const auto& [what, forest, nodes] : cases) {
+    EXPECT_EQ(NodesOf(forest, MakeRecord<CZKUMUsbTreeRootImpl>()), nodes) << what;
   }
 
   // A controller of the USB walk has a description, so both are in the tree, that one first.

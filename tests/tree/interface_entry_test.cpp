@@ -8,11 +8,7 @@ namespace {
 using Bytes = std::vector<std::uint8_t>;
 
 TEST(SplitConfiguration, EndsWithTheBytesOrTheTotalLength) {
-  struct {
-    const char* Name;
-    Bytes Data;
-    std::vector<std::size_t> Sizes;
-  } const cases[] = {
+  const std::tuple<const char*, Bytes, std::vector<std::size_t>> cases[] = {
       {"a total below what came", {9, 2, 11, 0, 1, 1, 0, 0, 0, 3, 7, 7}, {9, 2}},
       {"a total that leaves one byte over", {9, 2, 10, 0, 1, 1, 0, 0, 0, 3, 7, 7}, {9}},
       {"a total within the first descriptor", {9, 2, 4, 0, 1, 1, 0, 0, 0, 3, 7, 7}, {4}},
@@ -25,15 +21,15 @@ TEST(SplitConfiguration, EndsWithTheBytesOrTheTotalLength) {
       {"length one", {2, 7, 1, 7, 2, 7}, {2}},
       {"length zero first", {0, 2, 9, 0}, {}},
   };
-  for (const auto& c : cases) {
+  for (const auto& [Name, Data, Sizes] : cases) {
     std::vector<std::size_t> sizes;
-    const std::uint8_t* expected = c.Data.data();
-    for (const RawDescriptor& one : SplitConfiguration(c.Data)) {
-      EXPECT_EQ(one.data(), expected) << c.Name;
+    const std::uint8_t* expected = Data.data();
+    for (const RawDescriptor& one : SplitConfiguration(Data)) {
+      EXPECT_EQ(one.data(), expected) << Name;
       sizes.push_back(one.size());
       expected += one.size();
     }
-    EXPECT_EQ(sizes, c.Sizes) << c.Name;
+    EXPECT_EQ(sizes, Sizes) << Name;
   }
 }
 
