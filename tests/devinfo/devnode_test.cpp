@@ -57,19 +57,16 @@ struct ScriptedManager final : platform::DeviceManager {
 
 TEST(DevNode, TextsAreReadWithinTheirBuffers) {
   const std::u16string longest(199, u'x'), tooLong(200, u'x');
-  struct Case {
-    ScriptedManager::Node node;
-    std::u16string description, id;
-  };
-  const Case cases[] = {{{.id = u"A/B\\C/", .description = u"A/B"}, u"A/B", u"A\\B\\C\\"},
-                        {{}, u"", u""},
-                        {{.id = longest, .description = longest}, longest, longest},
-                        {{.id = tooLong, .description = tooLong}, u"", u""},
-                        {{.id = tooLong, .description = tooLong, .withoutZero = true}, u"", u""},
-                        {{.id = u"AB", .description = u"AB", .withoutZero = true}, u"AB", u"AB"},
-                        {{.description = u"ABC", .claimedBytes = 5}, u"AB", u""},
-                        {{.description = u"ABC", .claimedBytes = 0}, u"", u""},
-                        {{.description = u"ABC", .claimedBytes = 100000}, u"ABC", u""}};
+  const std::tuple<ScriptedManager::Node, std::u16string, std::u16string> cases[] = {
+      {{.id = u"A/B\\C/", .description = u"A/B"}, u"A/B", u"A\\B\\C\\"},
+      {{}, u"", u""},
+      {{.id = longest, .description = longest}, longest, longest},
+      {{.id = tooLong, .description = tooLong}, u"", u""},
+      {{.id = tooLong, .description = tooLong, .withoutZero = true}, u"", u""},
+      {{.id = u"AB", .description = u"AB", .withoutZero = true}, u"AB", u"AB"},
+      {{.description = u"ABC", .claimedBytes = 5}, u"AB", u""},
+      {{.description = u"ABC", .claimedBytes = 0}, u"", u""},
+      {{.description = u"ABC", .claimedBytes = 100000}, u"ABC", u""}};
   ScriptedManager manager;
   for (const auto& [node, description, id] : cases) {
     manager.nodes[5] = node;
@@ -84,16 +81,13 @@ TEST(DevNode, TextsAreReadWithinTheirBuffers) {
 }
 
 TEST(DevNode, ParentIsResolved) {
-  struct Case {
-    const char16_t *id, *parentId, *resolved;
-  };
-  const Case cases[] = {{u"USB\\A", u"USB/HUB\\1", u"USB\\HUB\\1"},
-                        {u"V\\_??_USBSTOR#DISK#1#{x}", u"ROOT\\VOLMGR\\0000", u"USBSTOR\\DISK\\1"},
-                        {u"V\\_??_#{x}", u"ROOT\\VOLMGR\\0000", u""},
-                        {u"V\\_??_USBSTOR#DISK#1", u"ROOT\\VOLMGR\\0000", u"ROOT\\VOLMGR\\0000"},
-                        {u"V\\_??_A#{x}", u"root\\volmgr\\0000", u"root\\volmgr\\0000"},
-                        {u"V\\_??_A#{x}", u"ROOT\\VOLMGR", u"ROOT\\VOLMGR"},
-                        {u"V\\_??_A#{x}", u"X\\ROOT\\VOLMGR\\", u"X\\ROOT\\VOLMGR\\"}};
+  const char16_t* const cases[][3] = {{u"USB\\A", u"USB/HUB\\1", u"USB\\HUB\\1"},
+                                      {u"V\\_??_USBSTOR#DISK#1#{x}", u"ROOT\\VOLMGR\\0000", u"USBSTOR\\DISK\\1"},
+                                      {u"V\\_??_#{x}", u"ROOT\\VOLMGR\\0000", u""},
+                                      {u"V\\_??_USBSTOR#DISK#1", u"ROOT\\VOLMGR\\0000", u"ROOT\\VOLMGR\\0000"},
+                                      {u"V\\_??_A#{x}", u"root\\volmgr\\0000", u"root\\volmgr\\0000"},
+                                      {u"V\\_??_A#{x}", u"ROOT\\VOLMGR", u"ROOT\\VOLMGR"},
+                                      {u"V\\_??_A#{x}", u"X\\ROOT\\VOLMGR\\", u"X\\ROOT\\VOLMGR\\"}};
   for (const auto& [id, parentId, resolved] : cases) {
     ScriptedManager manager;
     manager.nodes = {{2, {.parent = 3}}, {3, {.id = parentId}}};

@@ -14,6 +14,7 @@ namespace {
 using platform::Guid;
 using platform::ToUtf8;
 using testing::ElementsAre;
+using Text = const char16_t*;
 
 TEST(HexField, ScansWithinTheCount) {
   // Blanks use the count up as well; a 0x whose digit lies behind the count is no number, but a
@@ -43,20 +44,20 @@ TEST(HexField, ScansWithinTheCount) {
 TEST(InstanceId, IsTakenApart) {
   // The record held 7, 8, "V", "P", "S" before; a value that shows them was not touched.
   constexpr std::uint32_t kNone = kUnknownId;
-  const std::tuple<const char16_t*, std::uint32_t, std::uint32_t, const char16_t*, const char16_t*, const char16_t*>
-      cases[] = {{u"USB\\VID_046D&PID_C52B&MI_00\\6&1A&0&0000", 0x046D, 0xC52B, u"V", u"P", u"6&1A&0&0000"},
-                 {u"USBSTOR\\DISK&VEN_X&PROD_Y&REV_1.00\\4C53&0", kNone, 8, u"X", u"Y&REV_1.00", u"4C53&0"},
-                 {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04\\3&11583659&0&A0", kNone, 8, u"8086", u"", u"S"},
-                 {u"", kNone, 8, u"", u"P", u"S"},
-                 {u"USB\\VID_046D\\1", kNone, 8, u"", u"P", u"S"},
-                 {u"USB\\VID_046D\\VEN_A&PROD_B\\1", 0x046D, kNone, u"V", u"P", u"S"},
-                 {u"VID_&PID_\\X", kNone, kNone, u"V", u"P", u"X"},
-                 {u"USB\\VID_1&PID_2\\", 1, 2, u"V", u"P", u"S"},
-                 {u"USB\\VID_1&PID_2", 1, kNone, u"V", u"P", u"S"},
-                 {u"PID_2\\VID_1&X", 1, kNone, u"V", u"P", u"S"},
-                 {u"A\\VEN_X&PROD_Y", kNone, 8, u"X", u"", u"S"},
-                 {u"A\\VEN_X&PROD_Y\\", kNone, 8, u"X", u"Y", u"S"},
-                 {u"VEN_&PROD_\\X", kNone, 8, u"", u"", u"X"}};
+  const std::tuple<Text, std::uint32_t, std::uint32_t, Text, Text, Text> cases[] = {
+      {u"USB\\VID_046D&PID_C52B&MI_00\\6&1A&0&0000", 0x046D, 0xC52B, u"V", u"P", u"6&1A&0&0000"},
+      {u"USBSTOR\\DISK&VEN_X&PROD_Y&REV_1.00\\4C53&0", kNone, 8, u"X", u"Y&REV_1.00", u"4C53&0"},
+      {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04\\3&11583659&0&A0", kNone, 8, u"8086", u"", u"S"},
+      {u"", kNone, 8, u"", u"P", u"S"},
+      {u"USB\\VID_046D\\1", kNone, 8, u"", u"P", u"S"},
+      {u"USB\\VID_046D\\VEN_A&PROD_B\\1", 0x046D, kNone, u"V", u"P", u"S"},
+      {u"VID_&PID_\\X", kNone, kNone, u"V", u"P", u"X"},
+      {u"USB\\VID_1&PID_2\\", 1, 2, u"V", u"P", u"S"},
+      {u"USB\\VID_1&PID_2", 1, kNone, u"V", u"P", u"S"},
+      {u"PID_2\\VID_1&X", 1, kNone, u"V", u"P", u"S"},
+      {u"A\\VEN_X&PROD_Y", kNone, 8, u"X", u"", u"S"},
+      {u"A\\VEN_X&PROD_Y\\", kNone, 8, u"X", u"Y", u"S"},
+      {u"VEN_&PROD_\\X", kNone, 8, u"", u"", u"X"}};
   for (const auto& [id, vendorId, productId, vendor, product, serial] : cases) {
     NodeIdentity node;
     node.m_nVendorId = 7;
@@ -66,9 +67,10 @@ TEST(InstanceId, IsTakenApart) {
     node.m_strSerialNumber = u"S";
     node.SetInstanceId(id);
     node.SetSerialNumber(u"");
-    EXPECT_THAT((std::array{node.m_nVendorId, node.m_nProductId}), ElementsAre(vendorId, productId)) << ToUtf8(id);
-    EXPECT_THAT((std::array{node.m_strDevInstId, node.m_strVendor, node.m_strProduct, node.m_strSerialNumber}),
-                ElementsAre(id, vendor, product, serial));
+    EXPECT_EQ(std::tie(node.m_strDevInstId, node.m_nVendorId, node.m_nProductId), std::tie(id, vendorId, productId));
+    EXPECT_THAT((std::array{node.m_strVendor, node.m_strProduct, node.m_strSerialNumber}),
+                ElementsAre(vendor, product, serial))
+        << ToUtf8(id);
   }
 }
 
@@ -91,7 +93,7 @@ TEST(GuidText, KeepsWhatStandsBeforeABreak) {
 
 TEST(GuidText, FollowsTheRulesOfAScan) {
   // Blanks do not count against a width, but against the place where a group must end.
-  const std::tuple<const char16_t*, std::uint32_t, std::uint16_t, std::uint16_t, bool> cases[] = {
+  const std::tuple<Text, std::uint32_t, std::uint16_t, std::uint16_t, bool> cases[] = {
       {u"x12345678-9ABC-DEF0-1234-56789ABCDEF0 more", 0x12345678, 0x9ABC, 0xDEF0, true},
       {u"{ 2345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x2345678, 0x9ABC, 0xDEF0, true},
       {u"{ 12345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
@@ -113,29 +115,23 @@ TEST(GuidText, FollowsTheRulesOfAScan) {
 }
 
 TEST(DerivedIds, ComeFromPathsAndVolumes) {
-  const std::pair<const char16_t*, const char16_t*> paths[] = {
+  const std::pair<Text, Text> paths[] = {
       {u"USB#ROOT_HUB20#4&2f5a2f0&0#{f18a0e88-c30c-11d0-8815-00a0c906bed8}", u"USB\\ROOT_HUB20\\4&2F5A2F0&0"},
       {u"\\\\?\\usb#vid_1#2#{g}", u"\\\\?\\USB\\VID_1\\2"},
-      {u"\u00E4#", u"\u00C4"},
-      {u"#", u""},
-      {u"usb\\x", u""},
-      {u"", u""},
-      {nullptr, u""}};
+      {u"\u00E4#", u"\u00C4"}};
   for (const auto& [path, id] : paths) EXPECT_EQ(InterfacePathToInstanceId(path), id);
-  const std::pair<std::u16string, std::optional<std::u16string>> volumes[] = {
+  for (const char16_t* none : {u"#", u"usb\\x", u"", Text()}) EXPECT_EQ(InterfacePathToInstanceId(none), u"");
+  const std::pair<std::u16string, std::u16string> volumes[] = {
       {u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_X#4C53&0#{53f56307-b6bf}", u"USBSTOR\\DISK&VEN_X\\4C53&0"},
       {u"_??_A#{B#{_??_C", u"A"},
-      {u"_??_#{", u""},
-      {u"_??#{", {}},
-      {u"#{_??_A", {}},
-      {u"_??_A#", {}},
-      {u"A#{", {}},
-      {u"", {}}};
+      {u"_??_#{", u""}};
   for (const auto& [volume, disk] : volumes) EXPECT_EQ(DiskIdOfVolumeId(volume), disk);
+  for (const auto* none : {u"_??#{", u"#{_??_A", u"_??_A#", u"A#{", u""})
+    EXPECT_EQ(DiskIdOfVolumeId(none), std::nullopt);
 }
 
 TEST(PciHardwareId, NeedsAllFourNumbers) {
-  const std::tuple<const char16_t*, bool, std::uint32_t, std::uint32_t, std::uint32_t, std::uint32_t> cases[] = {
+  const std::tuple<Text, bool, std::uint32_t, std::uint32_t, std::uint32_t, std::uint32_t> cases[] = {
       {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04", true, 0x8086, 0x1E31, 0x1E318086, 4},
       {u"PCI\\VEN_ 8086&DEV_+1&SUBSYS_-1&REV_0x4Z", true, 0x8086, 1, 0xFFFFFFFF, 4},
       {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1&REV_", false, 0x8086, 0x1E31, 1, 0},
@@ -144,8 +140,8 @@ TEST(PciHardwareId, NeedsAllFourNumbers) {
       {nullptr, false, 0, 0, 0, 0}};
   for (const auto& [text, complete, vendor, device, subSys, revision] : cases) {
     const PciHardwareId id = ParsePciHardwareId(text);
-    EXPECT_THAT((std::array{id.Complete ? 1u : 0u, id.VendorId, id.DeviceId, id.SubSysId, id.Revision}),
-                ElementsAre(complete, vendor, device, subSys, revision))
+    EXPECT_EQ(std::tie(id.Complete, id.VendorId, id.DeviceId, id.SubSysId, id.Revision),
+              std::tie(complete, vendor, device, subSys, revision))
         << (text ? ToUtf8(text) : "null");
   }
 }

@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <array>
-#include <memory>
 #include <random>
 
 #include "devinfo/devnode.h"

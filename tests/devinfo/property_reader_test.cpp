@@ -4,7 +4,6 @@
 
 #include <cstring>
 #include <map>
-#include <optional>
 #include <sstream>
 
 #include "platform/simulated/simulated_pc.h"

@@ -1,9 +1,6 @@
 // Parts of a simulated PC that tests of the storage side are built from.
 #pragma once
 
-#include <string>
-#include <vector>
-
 #include "platform/setup_api.h"
 #include "platform/simulated/machine.h"
 

@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <vector>
 
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/intercepting_host.h"

@@ -53,10 +53,8 @@ Machine After(Machine machine, const auto& change) {
 }
 
 TEST(Broadcasts, TellTheDifferenceInTheSystemsOrder) {
-  const Machine whole = StickMachine();
-  const Machine without = After(whole, Unplug{kStick});
-  const std::string disk = ToUtf8(kDiskPath) + " 53f56307";
-  const std::string volume = ToUtf8(kStickVolumePath) + " 53f5630d";
+  const Machine whole = StickMachine(), without = After(whole, Unplug{kStick});
+  const std::string disk = ToUtf8(kDiskPath) + " 53f56307", volume = ToUtf8(kStickVolumePath) + " 53f5630d";
   EXPECT_THAT(Shown(whole, without), ElementsAre("-E:", "-" + volume, "-" + disk, "*"));
   EXPECT_THAT(Shown(without, whole), ElementsAre("+" + disk, "+" + volume, "+E:", "*"));
   Machine unordered = whole;
@@ -89,16 +87,10 @@ struct Listener {
   explicit Listener(const Machine& machine) : pc(machine) {
     s_listener = this;
     testing_support::Launch(desktop, [this] {
-      WNDCLASSW windowClass;
-      windowClass.lpszClassName = u"Class";
-      windowClass.lpfnWndProc = Procedure;
-      EXPECT_TRUE(desktop.RegisterClassW(windowClass));
-      CREATESTRUCTW creation;
-      creation.lpszClass = u"Class";
       WindowHandle window = 0;
-      EXPECT_TRUE(desktop.CreateWindowExW(creation, window));
-      MSG message;
-      while (desktop.GetMessageW(message, 0, 0, 0) != 0) continue;
+      EXPECT_TRUE(testing_support::RegisterWindowClass(desktop, Procedure));
+      EXPECT_TRUE(testing_support::MakeWindow(desktop, window));
+      testing_support::PumpMessages(desktop);
     });
     desktop.RunFor(0);
   }
@@ -122,9 +114,8 @@ TEST(Broadcasts, GoOutAfterOrBeforeTheChangeOrNotAtAll) {
       {BroadcastTime::After, {"volume, stick there", "nodes, stick there"}},
       {BroadcastTime::Before, {"volume, no stick", "nodes, no stick"}},
       {BroadcastTime::None, {}}};
-  const Machine without = After(StickMachine(), Unplug{kStick});
   for (const auto& [when, heard] : kCases) {
-    Listener listener(without);
+    Listener listener(After(StickMachine(), Unplug{kStick}));
     const Step step{0, u"", StickPlug(), when};
     EXPECT_EQ(ToUtf8(PlayStep(listener.pc, listener.desktop, step)), "");
     EXPECT_TRUE(listener.Sees());

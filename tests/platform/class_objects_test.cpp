@@ -1,8 +1,6 @@
 // How builds without the system find the classes of COM.
 #include <gtest/gtest.h>
 
-#include <string>
-
 #include "platform/com.h"
 #include "platform/simulated/registry.h"
 #include "platform/system.h"

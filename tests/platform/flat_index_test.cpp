@@ -7,8 +7,6 @@
 #include <random>
 #include <string>
 #include <unordered_set>
-#include <utility>
-#include <vector>
 
 namespace platform {
 namespace {

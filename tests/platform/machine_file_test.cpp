@@ -9,8 +9,7 @@
 namespace platform::simulated {
 namespace {
 
-using testing::ElementsAre;
-using testing::StartsWith;
+using namespace testing;  // NOLINT: nothing but matchers
 
 std::string MachineError(const std::string& json) {
   try {
@@ -21,9 +20,9 @@ std::string MachineError(const std::string& json) {
   return "no error";
 }
 
-std::string Repeated(const std::string& text, std::size_t times) {
+std::string Repeated(const char* text, std::size_t times) {
   std::string all;
-  for (std::size_t i = 0; i < times; ++i) all += text;
+  while (times-- > 0) all += text;
   return all;
 }
 
@@ -67,27 +66,18 @@ TEST(MachineFile, ReadsEveryMember) {
   EXPECT_TRUE(device.noParent && device.noClassImage && device.noClassDescription);
   const Device& bare = machine.devices.at(1);
   EXPECT_FALSE(bare.deviceClass || bare.hardwareIds || bare.uiNumber || bare.noParent);
-  EXPECT_EQ(machine.interfaces.at(0).interfaceClass,
-            (Guid{0x00112233, 0x4455, 0x6677, {0x88, 0x99, 0xaa, 0xbb, 0xcc, 0xdd, 0xee, 0xff}}));
-  EXPECT_EQ(machine.interfaces[0].path + machine.interfaces[0].device, u"Pusb\\a\\1");
-  EXPECT_THAT(machine.hostControllers.at(0).names, ElementsAre(u"\\\\.\\HCD0", u"\\\\.\\HCD12"));
-  EXPECT_EQ(machine.hostControllers[0].driverKey.value() + *machine.hostControllers[0].rootHub, u"kH");
-  EXPECT_EQ(machine.hubs.at(0).name, u"H");
-  EXPECT_TRUE(machine.hubs[0].busPowered);
+  const Guid guid{0x00112233, 0x4455, 0x6677, {0x88, 0x99, 0xaa, 0xbb, 0xcc, 0xdd, 0xee, 0xff}};
+  EXPECT_THAT(machine.interfaces.at(0), FieldsAre(guid, u"P", u"usb\\a\\1"));
+  EXPECT_THAT(machine.hostControllers.at(0), FieldsAre(ElementsAre(u"\\\\.\\HCD0", u"\\\\.\\HCD12"), u"k", u"H"));
+  ASSERT_THAT(machine.hubs.at(0), FieldsAre(u"H", SizeIs(6), true));
   const auto& ports = machine.hubs[0].ports;
-  ASSERT_EQ(ports.size(), 6u);
   // What a port says makes it connected, a hub or configured.
-  const struct {
-    std::uint32_t status;
-    bool isHub;
-    int configuration;
-  } kPorts[] = {{0, false, 0}, {1, false, 1}, {1, true, 1}, {1, false, 1}, {255, true, 0}, {1, false, 2}};
+  const std::tuple<std::uint32_t, bool, int, Speed, int> kPorts[] = {
+      {0, false, 0, Speed::Full, 0}, {1, false, 1, Speed::Full, 0},  {1, true, 1, Speed::Full, 0},
+      {1, false, 1, Speed::Full, 0}, {255, true, 0, Speed::Full, 0}, {1, false, 2, Speed::Super, 65535}};
   for (std::size_t i = 0; i < 6; ++i) {
-    EXPECT_EQ(ports[i].status, kPorts[i].status) << i;
-    EXPECT_EQ(ports[i].isHub, kPorts[i].isHub) << i;
-    EXPECT_EQ(ports[i].configuration, kPorts[i].configuration) << i;
-    EXPECT_EQ(ports[i].speed, i == 5 ? Speed::Super : Speed::Full) << i;
-    EXPECT_EQ(ports[i].address, i == 5 ? 65535 : 0) << i;
+    const auto& [status, speed, isHub, hubName, driverKey, descriptor, configuration, address, pipes] = ports[i];
+    EXPECT_EQ(std::tie(status, isHub, configuration, speed, address), kPorts[i]) << i;
   }
   EXPECT_EQ(ports[5].hubName.value() + ports[5].driverKey.value(), u"Bk");
   const auto bytes = [](const auto& record) {
@@ -96,25 +86,15 @@ TEST(MachineFile, ReadsEveryMember) {
   };
   EXPECT_THAT(bytes(ports[5].descriptor), ElementsAre(18, 1, 0x10, 0x02, 2, 3, 4, 5, 6, 0, 7, 0, 8, 0, 9, 10, 11, 12));
   EXPECT_THAT(bytes(ports[5].pipes.at(0)), ElementsAre(7, 5, 0x81, 3, 0, 4, 12, 99, 0, 0, 0));
-  const Storage& disk = machine.storage.at(0);
-  EXPECT_EQ(disk.path, u"P");
-  EXPECT_TRUE(disk.deviceType == 5 && disk.deviceTypeModifier == 6 && disk.removable);
-  EXPECT_THAT((std::vector{disk.vendor, disk.product, disk.revision, disk.serial}),
-              ElementsAre("V\xFF ", "", "r", "s"));
-  const DeviceNumber number = disk.deviceNumber.value();
-  EXPECT_THAT((std::vector{number.type, number.number, number.partition}), ElementsAre(7u, 8u, 9u));
-  EXPECT_EQ(disk.mediaSerialNumber, u"media");
-  const Storage& silent = machine.storage.at(1);
-  EXPECT_FALSE(silent.deviceType || silent.vendor || silent.deviceNumber || silent.mediaSerialNumber ||
-               silent.removable);
-  const Volume& volume = machine.volumes.at(0);
-  EXPECT_EQ(volume.name + volume.device, u"\\\\?\\Volume{1}\\USB\\A\\1");
-  EXPECT_THAT(volume.paths, ElementsAre(u"E:\\", u"C:\\M\\"));
-  EXPECT_TRUE(volume.serial == 7u && volume.driveType == kDRIVE_REMOVABLE && volume.reparsePoints);
-  EXPECT_EQ(volume.folderMounts.at(0).folder + volume.folderMounts[0].volume, u"Mount\\\\\\?\\Volume{2}\\");
-  EXPECT_TRUE(machine.volumes.at(1).driveType == kDRIVE_FIXED && !machine.volumes[1].serial);
-  EXPECT_TRUE(machine.drives.at(0).letter == u'E' && machine.drives[0].type == kDRIVE_CDROM);
-  EXPECT_EQ(machine.drives[0].dosDevice.value() + machine.drives[0].device, u"DUSB\\A\\1");
+  const auto kNone = Eq(std::nullopt);
+  EXPECT_THAT(machine.storage, ElementsAre(FieldsAre(u"P", 5, 6, true, "V\xFF ", "", "r", "s",
+                                                     Optional(FieldsAre(7u, 8u, 9u)), u"media"),
+                                           FieldsAre(u"Q", kNone, 0, false, kNone, kNone, kNone, kNone, kNone, kNone)));
+  EXPECT_THAT(machine.volumes,
+              ElementsAre(FieldsAre(u"\\\\?\\Volume{1}\\", u"USB\\A\\1", ElementsAre(u"E:\\", u"C:\\M\\"), 7u,
+                                    kDRIVE_REMOVABLE, true, ElementsAre(FieldsAre(u"Mount\\", u"\\\\?\\Volume{2}\\"))),
+                          FieldsAre(u"\\\\?\\Volume{2}\\", u"", IsEmpty(), kNone, kDRIVE_FIXED, false, IsEmpty())));
+  EXPECT_THAT(machine.drives.at(0), FieldsAre(u'E', kDRIVE_CDROM, u"D", u"USB\\A\\1"));
 }
 
 TEST(MachineFile, NamesTheFileThatCannotBeRead) {

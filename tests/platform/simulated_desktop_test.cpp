@@ -3,7 +3,6 @@
 #include <gmock/gmock.h>
 
 #include <cstring>
-#include <functional>
 #include <set>
 #include <thread>
 
@@ -13,8 +12,10 @@
 namespace platform::simulated {
 namespace {
 
-using testing::ElementsAre;
-using testing::IsEmpty;
+using namespace testing;  // NOLINT: nothing but matchers
+using testing_support::MakeWindow;
+using testing_support::PumpMessages;
+using testing_support::RegisterWindowClass;
 
 constexpr std::uint32_t kWM_USER = 0x0400;
 
@@ -25,41 +26,18 @@ struct Handled {
   WParam wParam;
   std::uint32_t thread;
 };
-std::vector<Handled>* g_handled = nullptr;
-SimulatedDesktop* g_desktop = nullptr;
-std::function<LResult(const MSG&)> g_answer;
-
-LResult ZKUSB_WINDOW_CALL Procedure(WindowHandle window, std::uint32_t message, WParam wParam, LParam lParam) {
-  g_handled->push_back({window, message, wParam, g_desktop->CurrentThreadId()});
-  if (g_answer) return g_answer({window, message, wParam, lParam});
-  return g_desktop->DefWindowProcW(window, message, wParam, lParam);
-}
 
 class SimulatedDesktopTest : public testing::Test {
  protected:
-  SimulatedDesktopTest() {
-    g_handled = &handled;
-    g_desktop = &desktop;
-    g_answer = nullptr;
+  SimulatedDesktopTest() { s_test = this; }
+  static LResult ZKUSB_WINDOW_CALL Procedure(WindowHandle window, std::uint32_t message, WParam wParam, LParam lParam) {
+    s_test->handled.push_back({window, message, wParam, s_test->desktop.CurrentThreadId()});
+    if (s_test->answer) return s_test->answer({window, message, wParam, lParam});
+    return s_test->desktop.DefWindowProcW(window, message, wParam, lParam);
   }
-
   void Launch(std::function<void()> body) { testing_support::Launch(desktop, std::move(body)); }
-  Status Register(const char16_t* name = u"Class") {
-    WNDCLASSW windowClass;
-    windowClass.lpfnWndProc = Procedure;
-    windowClass.lpszClassName = name;
-    return desktop.RegisterClassW(windowClass);
-  }
-  Status Create(WindowHandle& window, WindowHandle parent = 0, const char16_t* name = u"Class") {
-    CREATESTRUCTW creation;
-    creation.lpszClass = name;
-    creation.hwndParent = parent;
-    return desktop.CreateWindowExW(creation, window);
-  }
-  void Pump() {
-    MSG message;
-    while (desktop.GetMessageW(message, 0, 0, 0) != 0) desktop.DispatchMessageW(message);
-  }
+  Status Register(const char16_t* name = u"Class") { return RegisterWindowClass(desktop, Procedure, name); }
+  Status Create(WindowHandle& window, WindowHandle parent = 0) { return MakeWindow(desktop, window, parent); }
   std::vector<std::uint32_t> Messages() const {
     std::vector<std::uint32_t> messages;
     for (const Handled& each : handled) messages.push_back(each.message);
@@ -67,7 +45,9 @@ class SimulatedDesktopTest : public testing::Test {
   }
 
   std::vector<Handled> handled;
+  std::function<LResult(const MSG&)> answer;
   SimulatedDesktop desktop;
+  static inline SimulatedDesktopTest* s_test = nullptr;
 };
 
 TEST_F(SimulatedDesktopTest, ThreadsTakeTurnsAndTimeMovesWhenAllWait) {
@@ -99,8 +79,7 @@ TEST_F(SimulatedDesktopTest, ThreadsTakeTurnsAndTimeMovesWhenAllWait) {
   }
   EXPECT_EQ(ids.size(), 5u);
   // A client thread holds the time while it counts, and lets go of it while it waits elsewhere.
-  std::uint64_t client = 0;
-  std::uint64_t uncounted = 0;
+  std::uint64_t client = 0, uncounted = 0;
   Launch([&] {
     desktop.Sleep(1000);
     uncounted = desktop.Now();
@@ -134,7 +113,7 @@ TEST_F(SimulatedDesktopTest, WindowsLiveInTheirThread) {
     ASSERT_TRUE(Create(window));
     // The system's messages of a window's making come before it is made.
     EXPECT_THAT(Messages(), ElementsAre(0x24u, 0x81u, 0x83u, 0x01u));
-    Pump();
+    PumpMessages(desktop);
     EXPECT_TRUE(desktop.DestroyWindow(window));
   });
   desktop.RunFor(0);
@@ -144,10 +123,9 @@ TEST_F(SimulatedDesktopTest, WindowsLiveInTheirThread) {
   EXPECT_EQ(desktop.SetWindowUserData(window, 13), 12);
   EXPECT_EQ(desktop.WindowUserData(window), 13);
   handled.clear();
-  g_answer = [](const MSG& message) { return static_cast<LResult>(message.wParam) * 2; };
+  answer = [](const MSG& message) { return static_cast<LResult>(message.wParam) * 2; };
   EXPECT_EQ(desktop.SendToWindow(window, kWM_USER, 21, 0), 42);
-  ASSERT_EQ(handled.size(), 1u);
-  EXPECT_EQ(handled[0].thread, owner);
+  EXPECT_THAT(handled, ElementsAre(FieldsAre(_, _, _, owner)));
   EXPECT_TRUE(desktop.PostToWindow(window, 0x12, 0, 0));
   desktop.Settle();
   EXPECT_THAT(Messages(), ElementsAre(kWM_USER, 0x02u, 0x82u));
@@ -158,7 +136,7 @@ TEST_F(SimulatedDesktopTest, WindowsLiveInTheirThread) {
   EXPECT_THAT(desktop.Misuses(),
               ElementsAre(u"destruction of another thread's window", u"destruction of a window that is not there"));
   // A procedure can refuse its window, and what it throws is remembered.
-  g_answer = [](const MSG&) -> LResult { throw 1; };
+  answer = [](const MSG&) -> LResult { throw 1; };
   EXPECT_FALSE(Create(window));
   EXPECT_EQ(desktop.Counts().windows, 0u);
   EXPECT_EQ(desktop.Misuses().back(), u"an exception left a window procedure");
@@ -195,7 +173,7 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
     filter.dbcc_classguid = disks;
     ASSERT_TRUE(desktop.RegisterDeviceNotificationW(some, &filter, 0, registrations[1]));
     ASSERT_TRUE(desktop.RegisterDeviceNotificationW(child, &filter, 0, registrations[2]));
-    Pump();
+    PumpMessages(desktop);
   });
   desktop.RunFor(0);
   const std::pair<DeviceBroadcast, std::vector<WindowHandle>> kCases[] = {
@@ -204,7 +182,7 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
       {InterfaceBroadcast(kDBT_DEVICEARRIVAL, disks, u"x"), {all, some, child}},
       {InterfaceBroadcast(kDBT_DEVICEARRIVAL, GUID_DEVINTERFACE_VOLUME, u"x"), {all}}};
   std::vector<std::byte> seen;
-  g_answer = [&](const MSG& message) {
+  answer = [&](const MSG& message) {
     if (message.lParam == 0) return 0;
     const auto* bytes = reinterpret_cast<const std::byte*>(message.lParam);
     std::uint32_t size = 0;
@@ -215,17 +193,15 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
   for (const auto& [broadcast, recipients] : kCases) {
     handled.clear();
     EXPECT_EQ(desktop.Broadcast(broadcast), recipients.size());
-    ASSERT_EQ(handled.size(), recipients.size());
-    for (std::size_t i = 0; i < handled.size(); ++i) {
-      EXPECT_EQ(handled[i].window, recipients[i]);
-      EXPECT_EQ(handled[i].message, kWM_DEVICECHANGE);
-      EXPECT_EQ(handled[i].wParam, broadcast.event);
-    }
+    std::vector<WindowHandle> windows;
+    for (const Handled& each : handled) windows.push_back(each.window);
+    EXPECT_EQ(windows, recipients);
+    EXPECT_THAT(handled, Each(FieldsAre(_, kWM_DEVICECHANGE, broadcast.event, _)));
     if (!broadcast.record.empty()) {
       EXPECT_EQ(seen, broadcast.record);
     }
   }
-  g_answer = nullptr;
+  answer = nullptr;
 
   DEV_BROADCAST_DEVICEINTERFACE_W shorter = filter, volumes = filter;
   shorter.dbcc_size = 28;
@@ -248,13 +224,8 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
 TEST_F(SimulatedDesktopTest, EndsItsThreadsWhereverTheyWait) {
   for (const ClockMode mode : {ClockMode::Virtual, ClockMode::Real}) {
     SimulatedDesktop process(mode);
-    std::atomic<int> left = 0;
-    std::atomic<int> wentOn = 0;
-    const std::function<void()> waits[] = {[&] { process.Sleep(0xFFFFFFFF); },
-                                           [&] {
-                                             MSG message;
-                                             process.GetMessageW(message, 0, 0, 0);
-                                           },
+    std::atomic<int> left = 0, wentOn = 0;
+    const std::function<void()> waits[] = {[&] { process.Sleep(0xFFFFFFFF); }, [&] { PumpMessages(process); },
                                            [&] { process.ExitProcess(7); }};
     for (const auto& wait : waits) {
       testing_support::Launch(process, [&] {

@@ -4,7 +4,6 @@
 #include <cstring>
 #include <tuple>
 #include <utility>
-#include <vector>
 
 #include "platform/simulated/simulated_pc.h"
 #include "platform/storage_ioctl.h"

@@ -3,8 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
-
 #include "platform/text.h"
 #include "tree/port_device.h"
 #include "tree/records.h"

@@ -1,9 +1,6 @@
 // What a hub answers about one of its ports, for records of port devices.
 #pragma once
 
-#include <cstdint>
-#include <memory>
-#include <string>
 #include <utility>
 
 #include "tree/usb_port_info.h"

@@ -1,12 +1,8 @@
 // A small PC whose devices come, go and move at random.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
 #include <optional>
 #include <random>
-#include <string>
-#include <vector>
 
 #include "platform/simulated/simulated_pc.h"
 

@@ -4,7 +4,6 @@
 #include <map>
 #include <set>
 #include <sstream>
-#include <string>
 
 #include "platform/wrappers/intercepting_host.h"
 #include "tests/support/desk_pc.h"

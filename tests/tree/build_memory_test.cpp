@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 
 #include <new>
-#include <string>
 
 #include "tests/support/desk_pc.h"
 #include "tests/support/failing_memory.h"

@@ -2,9 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include <optional>
 #include <sstream>
-#include <string>
 
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/failing_host.h"

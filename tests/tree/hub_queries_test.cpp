@@ -3,7 +3,6 @@
 #include <gmock/gmock.h>
 
 #include <array>
-#include <string>
 
 #include "devinfo/device_set.h"
 #include "platform/simulated/simulated_pc.h"

@@ -2,8 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
-
 #include "platform/text.h"
 #include "tests/support/port_records.h"
 

@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <random>
-#include <string>
 
 #include "tests/support/desk_pc.h"
 #include "tree/tree_index.h"

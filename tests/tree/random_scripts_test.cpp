@@ -7,9 +7,6 @@
 #include <iostream>
 #include <map>
 #include <set>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "devinfo/interface_device.h"
 #include "platform/text.h"

@@ -3,7 +3,6 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
-#include <string>
 
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/counting_host.h"

@@ -2,8 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <string>
-
 #include "platform/wrappers/failing_host.h"
 #include "tests/support/desk_pc.h"
 #include "tree/port_device.h"
