@@ -116,6 +116,7 @@ TEST(ClassObjects, AreNamedByProgramIdentifiers) {
       {u"Server.1", u"{+2345678-9ABC-DEF0-0102-0304050607FF}", CO_E_CLASSSTRING},
       {u"Server.1", u"{12345678-9ABC-DEF0-01020-304050607FF}", CO_E_CLASSSTRING}};
   CLSID clsid{};
+  // The text is what the registry has for Server.1.
   for (const auto& [progId, text, result] : kCases) {
     SCOPED_TRACE(platform::ToUtf8(progId + (u" " + text)));
     platform::simulated::SimulatedRegistry registry;

@@ -15,7 +15,7 @@ using platform::controls::CountBstrs;
 using namespace std::string_view_literals;
 
 TEST(ComFunctions, TextsCarryTheirLengthInBytesBeforeThem) {
-  const std::int64_t alive = CountBstrs().alive, allocated = CountBstrs().allocated;
+  const auto [alive, allocated] = CountBstrs();
   for (const std::u16string_view text : {u""sv, u"a"sv, u"a\0b"sv}) {
     const BSTR made = SysAllocStringLen(platform::ToSystemText(text.data()), static_cast<UINT>(text.size()));
     ASSERT_NE(made, nullptr);
@@ -23,8 +23,7 @@ TEST(ComFunctions, TextsCarryTheirLengthInBytesBeforeThem) {
     std::memcpy(&prefix, reinterpret_cast<const char*>(made) - 4, sizeof prefix);
     EXPECT_EQ(prefix, 2 * text.size());
     EXPECT_EQ(SysStringByteLen(made), prefix);
-    EXPECT_EQ(SysStringLen(made), text.size());
-    EXPECT_EQ(platform::BstrText(made), text);
+    EXPECT_EQ(std::tuple(SysStringLen(made), platform::BstrText(made)), std::tuple(text.size(), text));
     EXPECT_EQ(made[text.size()], OLECHAR{});
     EXPECT_EQ(CountBstrs().alive, alive + 1);
     SysFreeString(made);
@@ -36,8 +35,7 @@ TEST(ComFunctions, TextsCarryTheirLengthInBytesBeforeThem) {
   EXPECT_EQ(SysAllocStringLen(nullptr, 0xFFFFFFFF), nullptr);
   EXPECT_EQ(SysStringLen(nullptr), 0u);
   SysFreeString(nullptr);
-  EXPECT_EQ(CountBstrs().alive, alive);
-  EXPECT_EQ(CountBstrs().allocated, allocated + 4);
+  EXPECT_EQ(std::pair(CountBstrs().alive, CountBstrs().allocated), std::pair(alive, allocated + 4));
 }
 
 struct CountedUnknown final : IUnknown {
@@ -97,13 +95,12 @@ TEST(ComFunctions, VariantsOfOtherTypesAreRefusedAndKept) {
 }
 
 TEST(ComFunctions, ApartmentsNestPerThread) {
-  const std::tuple<HRESULT, DWORD, HRESULT, std::uint32_t> rows[] = {
-      {E_OUTOFMEMORY, COINIT_MULTITHREADED, E_OUTOFMEMORY, 0},
-      {S_OK, COINIT_APARTMENTTHREADED, S_OK, 1},
-      {S_OK, COINIT_MULTITHREADED, RPC_E_CHANGED_MODE, 1},
-      {S_OK, COINIT_APARTMENTTHREADED, S_FALSE, 2}};
-  for (const auto& [ordered, model, result, depth] : rows) {
-    if (FAILED(ordered)) platform::controls::FailNextCoInitialize(ordered);
+  const std::tuple<DWORD, HRESULT, std::uint32_t> rows[] = {{COINIT_MULTITHREADED, E_OUTOFMEMORY, 0},
+                                                            {COINIT_APARTMENTTHREADED, S_OK, 1},
+                                                            {COINIT_MULTITHREADED, RPC_E_CHANGED_MODE, 1},
+                                                            {COINIT_APARTMENTTHREADED, S_FALSE, 2}};
+  platform::controls::FailNextCoInitialize(E_OUTOFMEMORY);
+  for (const auto& [model, result, depth] : rows) {
     EXPECT_EQ(CoInitializeEx(nullptr, model), result);
     EXPECT_EQ(platform::controls::ApartmentDepth(), depth);
   }

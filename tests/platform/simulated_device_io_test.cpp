@@ -2,8 +2,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <tuple>
-#include <utility>
 
 #include "platform/simulated/simulated_pc.h"
 #include "platform/storage_ioctl.h"
@@ -24,8 +22,7 @@ struct Reply {
   std::uint32_t returned = 99;
 
   template <class Record>
-  Record As() const {
-    Record record{};
+  Record As(Record record = {}) const {
     std::memcpy(&record, bytes.data(), std::min(sizeof(record), bytes.size()));
     return record;
   }
@@ -98,19 +95,13 @@ TEST_F(DeviceIoTest, WrongClosesAreRefusedAndRemembered) {
 }
 
 TEST_F(DeviceIoTest, NameRequestsAtEverySize) {
-  const FileHandle controller = Open(kControllerPath);
-  const FileHandle hub = Open(kRootHub);
-  const struct {
-    FileHandle handle;
-    std::uint32_t code;
-    std::uint8_t port;
-    std::uint32_t head;
-    Text name;
-  } kCases[] = {{controller, kIOCTL_GET_HCD_DRIVERKEY_NAME, 0, 4, u"{usb}\\0000"},
-                {controller, kIOCTL_USB_GET_ROOT_HUB_NAME, 0, 4, kRootHubName},
-                {hub, kIOCTL_USB_GET_NODE_CONNECTION_NAME, 2, 8, kHubName},
-                {hub, kIOCTL_USB_GET_NODE_CONNECTION_NAME, 1, 8, u""},  // no hub there
-                {hub, kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME, 1, 8, u"{usb}\\0003"}};
+  const FileHandle controller = Open(kControllerPath), hub = Open(kRootHub);
+  const std::tuple<FileHandle, std::uint32_t, std::uint8_t, std::uint32_t, Text> kCases[] = {
+      {controller, kIOCTL_GET_HCD_DRIVERKEY_NAME, 0, 4, u"{usb}\\0000"},
+      {controller, kIOCTL_USB_GET_ROOT_HUB_NAME, 0, 4, kRootHubName},
+      {hub, kIOCTL_USB_GET_NODE_CONNECTION_NAME, 2, 8, kHubName},
+      {hub, kIOCTL_USB_GET_NODE_CONNECTION_NAME, 1, 8, u""},  // no hub there
+      {hub, kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME, 1, 8, u"{usb}\\0003"}};
   for (const auto& [handle, code, port, head, name] : kCases) {
     const auto whole = static_cast<std::uint32_t>(head + (name.size() + 1) * 2);
     for (std::uint32_t out = 0; out <= whole + 3; ++out) {
@@ -133,27 +124,23 @@ TEST_F(DeviceIoTest, RefusedRequests) {
   const Bytes query(12, 0);
   constexpr std::uint32_t kConnection = kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION;
   constexpr std::uint32_t kHubOnPort = kIOCTL_USB_GET_NODE_CONNECTION_NAME;
-  const struct {
-    FileHandle handle;
-    std::uint32_t code;
-    Bytes in;
-    std::uint32_t out, error;
-  } kCases[] = {{controller, kHubOnPort, Bytes{1, 0, 0, 0}, 100, kERROR_INVALID_FUNCTION},
-                {hub, kIOCTL_GET_HCD_DRIVERKEY_NAME, {}, 100, kERROR_INVALID_FUNCTION},
-                {hub, kIOCTL_USB_GET_NODE_INFORMATION, {}, 75, kERROR_INSUFFICIENT_BUFFER},
-                {hub, kHubOnPort, Bytes{1, 0, 0}, 100, kERROR_INSUFFICIENT_BUFFER},
-                {hub, kHubOnPort, Bytes{0, 0, 0, 0}, 100, kERROR_INVALID_PARAMETER},
-                {hub, kConnection, Bytes{4, 0, 0, 0}, 365, kERROR_INVALID_PARAMETER},
-                {hub, kConnection, Bytes{1, 0, 0, 0}, 34, kERROR_INSUFFICIENT_BUFFER},
-                {disk, kIOCTL_STORAGE_QUERY_PROPERTY, Bytes{0, 0, 0, 0, 0, 0, 0}, 512, 24},
-                {disk, kIOCTL_STORAGE_QUERY_PROPERTY, Bytes{1, 0, 0, 0, 0, 0, 0, 0}, 512, kERROR_INVALID_PARAMETER},
-                {disk, kIOCTL_STORAGE_QUERY_PROPERTY, query, 7, kERROR_INSUFFICIENT_BUFFER},
-                {disk, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 11, kERROR_INSUFFICIENT_BUFFER},
-                {disk, kIOCTL_STORAGE_GET_MEDIA_SERIAL_NUMBER, {}, 3, kERROR_INSUFFICIENT_BUFFER},
-                {drive, kIOCTL_STORAGE_QUERY_PROPERTY, query, 512, kERROR_INVALID_FUNCTION},
-                {drive, kIOCTL_STORAGE_GET_MEDIA_SERIAL_NUMBER, {}, 4, kERROR_NOT_SUPPORTED},
-                {bare, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 12, kERROR_INVALID_FUNCTION},
-                {0x1002, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 12, kERROR_INVALID_HANDLE}};
+  const std::tuple<FileHandle, std::uint32_t, Bytes, std::uint32_t, std::uint32_t> kCases[] = {
+      {controller, kHubOnPort, Bytes{1, 0, 0, 0}, 100, kERROR_INVALID_FUNCTION},
+      {hub, kIOCTL_GET_HCD_DRIVERKEY_NAME, {}, 100, kERROR_INVALID_FUNCTION},
+      {hub, kIOCTL_USB_GET_NODE_INFORMATION, {}, 75, kERROR_INSUFFICIENT_BUFFER},
+      {hub, kHubOnPort, Bytes{1, 0, 0}, 100, kERROR_INSUFFICIENT_BUFFER},
+      {hub, kHubOnPort, Bytes{0, 0, 0, 0}, 100, kERROR_INVALID_PARAMETER},
+      {hub, kConnection, Bytes{4, 0, 0, 0}, 365, kERROR_INVALID_PARAMETER},
+      {hub, kConnection, Bytes{1, 0, 0, 0}, 34, kERROR_INSUFFICIENT_BUFFER},
+      {disk, kIOCTL_STORAGE_QUERY_PROPERTY, Bytes{0, 0, 0, 0, 0, 0, 0}, 512, 24},
+      {disk, kIOCTL_STORAGE_QUERY_PROPERTY, Bytes{1, 0, 0, 0, 0, 0, 0, 0}, 512, kERROR_INVALID_PARAMETER},
+      {disk, kIOCTL_STORAGE_QUERY_PROPERTY, query, 7, kERROR_INSUFFICIENT_BUFFER},
+      {disk, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 11, kERROR_INSUFFICIENT_BUFFER},
+      {disk, kIOCTL_STORAGE_GET_MEDIA_SERIAL_NUMBER, {}, 3, kERROR_INSUFFICIENT_BUFFER},
+      {drive, kIOCTL_STORAGE_QUERY_PROPERTY, query, 512, kERROR_INVALID_FUNCTION},
+      {drive, kIOCTL_STORAGE_GET_MEDIA_SERIAL_NUMBER, {}, 4, kERROR_NOT_SUPPORTED},
+      {bare, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 12, kERROR_INVALID_FUNCTION},
+      {0x1002, kIOCTL_STORAGE_GET_DEVICE_NUMBER, {}, 12, kERROR_INVALID_HANDLE}};
   for (const auto& [handle, code, in, out, error] : kCases) {
     const Reply reply = Ask(handle, code, in, out);
     EXPECT_EQ(Error(reply.status), error) << std::hex << code << " into " << out;
@@ -169,9 +156,9 @@ TEST_F(DeviceIoTest, NodeInformation) {
   const std::tuple<Text, int, int> kCases[] = {{kRootHub, 3, 0}, {Text(u"\\\\.\\") + kHubName, 2, 1}};
   for (const auto& [path, ports, busPowered] : kCases) {
     const Reply reply = Ask(Open(path), kIOCTL_USB_GET_NODE_INFORMATION, {}, 80);
-    EXPECT_EQ(reply.returned, 76u);
-    EXPECT_EQ(+reply.As<USB_NODE_INFORMATION>().HubDescriptor.bNumberOfPorts, ports);
-    EXPECT_EQ(+reply.As<USB_NODE_INFORMATION>().HubIsBusPowered, busPowered);
+    const auto node = reply.As<USB_NODE_INFORMATION>();
+    EXPECT_EQ(std::tuple(reply.returned, +node.HubDescriptor.bNumberOfPorts, +node.HubIsBusPowered),
+              std::tuple(76u, ports, busPowered));
   }
 }
 
@@ -180,9 +167,8 @@ TEST_F(DeviceIoTest, ConnectionInformation) {
   // One buffer for both directions: its four bytes in are copied before the answer overwrites them.
   Bytes record = {1, 0, 0, 0};
   record.resize(365, kMark);
-  std::uint32_t returned = 0;
-  ASSERT_TRUE(pc.DeviceControl(hub, kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX, record.data(), 365, record.data(),
-                               365, returned));
+  std::uint32_t code = kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX, returned = 0;
+  ASSERT_TRUE(pc.DeviceControl(hub, code, record.data(), 365, record.data(), 365, returned));
   Bytes expected = {1, 0, 0, 0, 18, 1, 0, 0, 0, 0, 0, 0, 0x81, 0x07, 0x80, 0x55, 0, 0, 0,
                     0, 0, 0, 1, 3,  0, 5, 0, 2, 0, 0, 0, 1,    0,    0,    0,    7, 5, 0x81,
                     2, 0, 4, 0, 0,  0, 0, 0, 7, 5, 2, 2, 0,    4,    0,    0,    0, 0, 0};
@@ -193,12 +179,12 @@ TEST_F(DeviceIoTest, ConnectionInformation) {
   for (const std::uint32_t out : {35u, 45u, 46u, 57u}) {
     const Reply cut = Ask(hub, kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, {1, 0, 0, 0}, out);
     EXPECT_EQ(cut.returned, 35 + (out - 35) / 11 * 11) << "only whole pipes";
-    EXPECT_EQ(+cut.As<USB_NODE_CONNECTION_INFORMATION>().NumberOfOpenPipes, 2u);
-    EXPECT_EQ(+cut.As<USB_NODE_CONNECTION_INFORMATION>().LowSpeed, 0);
+    const auto info = cut.As<USB_NODE_CONNECTION_INFORMATION>();
+    EXPECT_EQ(std::pair(+info.NumberOfOpenPipes, +info.LowSpeed), std::pair(2u, 0));
   }
   const auto port = [&](std::uint8_t index) {
-    return Ask(hub, kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, {index, 0, 0, 0}, 365)
-        .As<USB_NODE_CONNECTION_INFORMATION>();
+    const Reply reply = Ask(hub, kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, {index, 0, 0, 0}, 365);
+    return reply.As<USB_NODE_CONNECTION_INFORMATION>();
   };
   EXPECT_EQ(+port(2).DeviceIsHub, 1);
   EXPECT_EQ(+port(3).DeviceDescriptor.bLength, 0);
@@ -213,11 +199,9 @@ TEST_F(DeviceIoTest, StorageAnswers) {
   const Bytes query(12, 0);
   const Reply property = Ask(disk, kIOCTL_STORAGE_QUERY_PROPERTY, query, 512);
   const auto head = property.As<STORAGE_DEVICE_DESCRIPTOR>();
-  EXPECT_EQ(property.returned, 36u + 9u + 5u);
-  EXPECT_EQ(head.Size, property.returned);
-  EXPECT_EQ(head.RemovableMedia, 1);
-  EXPECT_EQ(head.ProductIdOffset, 0u);
-  EXPECT_EQ(head.ProductRevisionOffset, 0u);
+  constexpr std::uint32_t kSize = 36 + 9 + 5;
+  EXPECT_EQ(std::tuple(property.returned, +head.Size, +head.RemovableMedia), std::tuple(kSize, kSize, 1));
+  EXPECT_EQ(std::pair(+head.ProductIdOffset, +head.ProductRevisionOffset), std::pair(0u, 0u));
   const char* texts = reinterpret_cast<const char*>(property.bytes.data());
   EXPECT_STREQ(texts + head.VendorIdOffset, "SanDisk ");
   EXPECT_STREQ(texts + head.SerialNumberOffset, "AA01");

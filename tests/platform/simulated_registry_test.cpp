@@ -14,8 +14,7 @@ using testing_support::Lines;
 using testing_support::LinesOf;
 using testing_support::Put;
 
-constexpr std::uint32_t kOk = 0;
-constexpr std::uint32_t kBadPathname = 161;
+constexpr std::uint32_t kOk = 0, kBadPathname = 161;
 
 std::uint32_t Code(Status status) { return status ? kOk : status.error; }
 
@@ -27,10 +26,10 @@ RegistryKeyHandle Opened(SimulatedRegistry& registry, const char16_t* path,
 }
 
 TEST(SimulatedRegistry, FindsKeysAsTheSystemDoes) {
-  const std::u16string longest(kMaxKeyNameChars, u'n');
-  const std::u16string tooLong = longest + u"n";
+  const std::u16string longest(kMaxKeyNameChars, u'n'), tooLong = longest + u"n";
   std::u16string tooDeep;
   for (int level = 0; level < 512; ++level) tooDeep += u"d\\";
+  // What the path is, and the codes of opening, of creating and then deleting it.
   const std::tuple<const char*, std::u16string, std::uint32_t, std::uint32_t, std::uint32_t> kCases[] = {
       {"a key with another below", u"Top", kOk, kOk, kERROR_ACCESS_DENIED},
       {"without case, a backslash at the end", u"tOP\\sub\\", kOk, kOk, kOk},
@@ -39,8 +38,7 @@ TEST(SimulatedRegistry, FindsKeysAsTheSystemDoes) {
       {"a backslash in front", u"\\Top", kBadPathname, kBadPathname, kBadPathname},
       {"the longest name", longest, kERROR_FILE_NOT_FOUND, kOk, kOk},
       {"a longer name", tooLong, kERROR_INVALID_PARAMETER, kERROR_INVALID_PARAMETER, kERROR_INVALID_PARAMETER},
-      {"too many levels", tooDeep, kERROR_FILE_NOT_FOUND, kERROR_INVALID_PARAMETER, kERROR_FILE_NOT_FOUND},
-  };
+      {"too many levels", tooDeep, kERROR_FILE_NOT_FOUND, kERROR_INVALID_PARAMETER, kERROR_FILE_NOT_FOUND}};
   for (const auto& [what, path, open, create, remove] : kCases) {
     SCOPED_TRACE(what);
     SimulatedRegistry registry;
@@ -48,9 +46,7 @@ TEST(SimulatedRegistry, FindsKeysAsTheSystemDoes) {
     RegistryKeyHandle key = 77;
     EXPECT_EQ(Code(registry.OpenKey(kHKEY_CLASSES_ROOT, path.c_str(), kKEY_READ, key)), open);
     EXPECT_EQ(key != kNoRegistryKey, open == kOk);
-    if (open == kOk) {
-      EXPECT_TRUE(registry.CloseKey(key));
-    }
+    EXPECT_TRUE(open != kOk || registry.CloseKey(key));
     std::uint32_t disposition = 0;
     EXPECT_EQ(Code(registry.CreateKey(kHKEY_CLASSES_ROOT, path.c_str(), kKEY_READ, key, disposition)), create);
     if (create == kOk) {
@@ -94,7 +90,6 @@ TEST(SimulatedRegistry, HoldsValuesWithTheirTypes) {
   EXPECT_EQ(Code(registry.QueryValue(key, u"None", nullptr, nullptr, size)), kERROR_FILE_NOT_FOUND);
   EXPECT_TRUE(registry.DeleteValue(key, u"BYTES"));
   EXPECT_EQ(Code(registry.DeleteValue(key, u"BYTES")), kERROR_FILE_NOT_FOUND);
-
   RegistryKey owner(registry, key);
   std::u16string text = u"old";
   EXPECT_TRUE(owner.Text(u"", text));
@@ -114,27 +109,22 @@ TEST(SimulatedRegistry, GivesEachHandleOnlyWhatItWasOpenedFor) {
   Put(registry, u"Key\\Sub");  // a new one, of which the old handle knows nothing
   const RegistryKeyHandle closed = Opened(registry, u"Key");
   EXPECT_TRUE(registry.CloseKey(closed));
-  const struct {
-    RegistryKeyHandle key;
-    std::uint32_t read, write, below;
-  } kCases[] = {
+  const std::tuple<RegistryKeyHandle, std::uint32_t, std::uint32_t, std::uint32_t> kCases[] = {
       {kHKEY_CLASSES_ROOT, kOk, kOk, kERROR_FILE_NOT_FOUND},
       {reader, kOk, kERROR_ACCESS_DENIED, kOk},
       {writer, kERROR_ACCESS_DENIED, kOk, kOk},
       {gone, kERROR_KEY_DELETED, kERROR_KEY_DELETED, kERROR_KEY_DELETED},
       {closed, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE},
-      {kNoRegistryKey, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE},
-  };
-  for (const auto& test : kCases) {
+      {kNoRegistryKey, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE, kERROR_INVALID_HANDLE}};
+  for (const auto& [key, read, write, openBelow] : kCases) {
     char16_t name[kMaxKeyNameChars + 1];
     std::uint32_t size = 0, chars = kMaxKeyNameChars + 1;
-    EXPECT_EQ(Code(registry.SetValue(test.key, u"v", kREG_SZ, u"", 2)), test.write);
+    EXPECT_EQ(Code(registry.SetValue(key, u"v", kREG_SZ, u"", 2)), write);
     Put(registry, u"Key", u"v");  // for those that cannot write it
-    EXPECT_EQ(Code(registry.QueryValue(test.key, u"v", nullptr, nullptr, size)), test.read);
-    EXPECT_EQ(Code(registry.EnumKey(test.key, 0, name, chars)), test.read);
-    EXPECT_EQ(Code(registry.DeleteValue(test.key, u"v")), test.write);
-    RegistryKey below(registry);
-    EXPECT_EQ(Code(below.Open(test.key, u"Sub")), test.below);
+    EXPECT_EQ(Code(registry.QueryValue(key, u"v", nullptr, nullptr, size)), read);
+    EXPECT_EQ(Code(registry.EnumKey(key, 0, name, chars)), read);
+    EXPECT_EQ(Code(registry.DeleteValue(key, u"v")), write);
+    EXPECT_EQ(Code(RegistryKey(registry).Open(key, u"Sub")), openBelow);
   }
   std::uint32_t chars = 3;  // "Sub" and its terminator need four
   char16_t name[4] = u"???";
@@ -172,18 +162,17 @@ TEST(SimulatedRegistry, DeletesTreesAndTakesNoHiddenKeyForGone) {
 
 TEST(SimulatedRegistry, TakesThreads) {
   SimulatedRegistry registry;
-  {
-    std::vector<std::jthread> threads;
-    for (int i = 0; i < 4; ++i) {
-      threads.emplace_back([&registry, path = u"Shared\\Own" + Decimal(i)] {
-        for (int round = 0; round < 50; ++round) {
-          Put(registry, path, u"", Decimal(round));
-          Put(registry, path + u"\\Sub");
-          EXPECT_TRUE(registry.DeleteKey(kHKEY_CLASSES_ROOT, (path + u"\\Sub").c_str()));
-        }
-      });
-    }
+  std::vector<std::jthread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([&registry, path = u"Shared\\Own" + Decimal(i)] {
+      for (int round = 0; round < 50; ++round) {
+        Put(registry, path, u"", Decimal(round));
+        Put(registry, path + u"\\Sub");
+        EXPECT_TRUE(registry.DeleteKey(kHKEY_CLASSES_ROOT, (path + u"\\Sub").c_str()));
+      }
+    });
   }
+  threads.clear();
   EXPECT_EQ(LinesOf(registry, false).size(), 4u);
   EXPECT_EQ(LinesOf(registry).back(), "Shared\\Own3  (default) = \"49\"");
   ExpectAllClosed(registry);

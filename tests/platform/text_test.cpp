@@ -47,31 +47,27 @@ TEST(Texts, CasePartsAndReplacement) {
 
 TEST(Texts, Numbers) {
   const Guid guid = {0x3869C27A, 0x31B8, 0x01E8, {0x9B, 0x02, 0xEC, 0xF4, 0xBB, 0x48, 0x7F, 0x0D}};
-  const struct {
-    std::u16string text, expected;
-  } kCases[] = {{Hex(0), u"0"},
-                {Hex(0xC52B, 4), u"C52B"},
-                {Hex(0xFFFFFFFF, 4), u"FFFFFFFF"},
-                {HexLower(0xA, 2), u"0a"},
-                {Decimal(0), u"0"},
-                {Decimal(-1, 4), u"  -1"},
-                {Decimal(12345, 2), u"12345"},
-                {Decimal(std::numeric_limits<std::int32_t>::min()), u"-2147483648"},
-                {GuidText(guid), u"{3869C27A-31B8-01E8-9B02-ECF4BB487F0D}"},
-                {GuidText(kNullGuid), u"{00000000-0000-0000-0000-000000000000}"}};
+  const std::u16string kCases[][2] = {{Hex(0), u"0"},
+                                      {Hex(0xC52B, 4), u"C52B"},
+                                      {Hex(0xFFFFFFFF, 4), u"FFFFFFFF"},
+                                      {HexLower(0xA, 2), u"0a"},
+                                      {Decimal(0), u"0"},
+                                      {Decimal(-1, 4), u"  -1"},
+                                      {Decimal(12345, 2), u"12345"},
+                                      {Decimal(std::numeric_limits<std::int32_t>::min()), u"-2147483648"},
+                                      {GuidText(guid), u"{3869C27A-31B8-01E8-9B02-ECF4BB487F0D}"},
+                                      {GuidText(kNullGuid), u"{00000000-0000-0000-0000-000000000000}"}};
   for (const auto& [text, expected] : kCases) EXPECT_EQ(text, expected);
 }
 
 TEST(Utf8, RoundTripsAndReplacesWhatIsMalformed) {
-  const struct {
-    std::u16string_view text;
-    std::string_view bytes;
-  } kCases[] = {{u"", ""},
-                {u"USB", "USB"},
-                {u"\x7F\x80\x7FF\x800", "\x7F\xC2\x80\xDF\xBF\xE0\xA0\x80"},
-                {u"\xFFFD\xFFFF", "\xEF\xBF\xBD\xEF\xBF\xBF"},
-                {u"\xD800\xDC00\xDBFF\xDFFF", "\xF0\x90\x80\x80\xF4\x8F\xBF\xBF"},
-                {{u"a\0b", 3}, {"a\0b", 3}}};
+  const std::pair<std::u16string_view, std::string_view> kCases[] = {
+      {u"", ""},
+      {u"USB", "USB"},
+      {u"\x7F\x80\x7FF\x800", "\x7F\xC2\x80\xDF\xBF\xE0\xA0\x80"},
+      {u"\xFFFD\xFFFF", "\xEF\xBF\xBD\xEF\xBF\xBF"},
+      {u"\xD800\xDC00\xDBFF\xDFFF", "\xF0\x90\x80\x80\xF4\x8F\xBF\xBF"},
+      {{u"a\0b", 3}, {"a\0b", 3}}};
   for (const auto& [text, bytes] : kCases) {
     EXPECT_EQ(ToUtf8(text), bytes);
     EXPECT_EQ(FromUtf8(bytes), text) << bytes;
