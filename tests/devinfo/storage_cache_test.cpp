@@ -17,9 +17,9 @@ namespace KelvoUHW {
 namespace {
 
 using platform::Status;
-using platform::simulated::OpenCounts;
-using platform::simulated::SimulatedPc;
+using platform::simulated::OpenCounts, platform::simulated::SimulatedPc;
 using platform::wrappers::Operation;
+using testing::_, testing::Contains, testing::Each, testing::ElementsAre, testing::FieldsAre, testing::Pair;
 
 // What the diagnostics say of a volume that is queried, of one that answers, and of a disk.
 const std::u16string kSeparator = u"++++++++++++++++++++++++++++++++++++++++++++++\r\n";
@@ -29,8 +29,7 @@ const std::u16string kAnswers =
 const std::u16string kDiskLine = u"IOCTL failed with error code 6.\r\n\r\n";
 
 // Answers oddly where told so, and remembers what files and sets are opened with.
-class OddStorage final : public platform::wrappers::InterceptingHost {
- public:
+struct OddStorage final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
   Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
                        void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
@@ -55,8 +54,6 @@ class OddStorage final : public platform::wrappers::InterceptingHost {
   std::uint32_t detailError = platform::kERROR_INVALID_DATA;
   std::set<std::tuple<std::u16string, std::uint32_t, std::uint32_t>> opened;
   std::vector<std::pair<platform::Guid, std::uint32_t>> sets;
-
- private:
   Status BeforeCall(const platform::wrappers::HostCall& call) noexcept override {
     if (call.operation == Operation::OpenDevice && call.path == closedPath) return Status::Failure(2);
     const bool readsDetail = call.operation == Operation::GetDeviceInterfaceDetail && call.outSize > 0;
@@ -119,15 +116,14 @@ TEST_F(StorageCacheTest, SetsAndFilesAreOpenedWithTheseFlags) {
   Start();
   Pass();
   using Set = std::pair<platform::Guid, std::uint32_t>;
-  for (const auto& [guid, flags] : odd->sets) EXPECT_EQ(flags, 0x12u);
+  EXPECT_THAT(odd->sets, Each(Pair(_, 0x12)));
   EXPECT_EQ(odd->sets[1].first, platform::GUID_DEVINTERFACE_VOLUME);
-  EXPECT_THAT(odd->sets, testing::Contains(Set{platform::GUID_DEVINTERFACE_DISK, 0x12}));
-  for (const auto& [path, access, share] : odd->opened) EXPECT_EQ(access * 16 + share, 3u) << platform::ToUtf8(path);
-  for (const auto path : {u"\\\\?\\vol1", u"\\\\?\\disk1", u"\\\\.\\E:"}) {
+  EXPECT_THAT(odd->sets, Contains(Set{platform::GUID_DEVINTERFACE_DISK, 0x12}));
+  EXPECT_THAT(odd->opened, Each(FieldsAre(_, 0, 3)));
+  for (const auto path : {u"\\\\?\\vol1", u"\\\\?\\disk1", u"\\\\.\\E:"})
     EXPECT_TRUE(odd->opened.contains({path, 0, 3}));
-  }
-  const std::u16string kNoClass = platform::GuidText(platform::kNullGuid);
   // Names of classes count exactly; every other name stands for all.
+  const std::u16string kNoClass = platform::GuidText(platform::kNullGuid);
   const std::pair<const char16_t*, std::u16string> classes[] = {
       {u"usb", u"{36FC9E60-C465-11CF-8056-444553540000}"},
       {u"volume", u"{71A27CDD-812A-11D0-BEC7-08002BE2092F}"},
@@ -141,9 +137,7 @@ TEST_F(StorageCacheTest, SetsAndFilesAreOpenedWithTheseFlags) {
   for (const auto& [name, guid] : classes) {
     odd->sets.clear();
     EXPECT_EQ(devices.EnumerateDeviceNodes(name), 0u);
-    ASSERT_EQ(odd->sets.size(), 1u);
-    EXPECT_EQ(platform::GuidText(odd->sets[0].first), guid);
-    EXPECT_EQ(odd->sets[0].second, guid == kNoClass ? 6u : 2u);
+    EXPECT_THAT(odd->sets, ElementsAre(Pair(testing::ResultOf(platform::GuidText, guid), guid == kNoClass ? 6 : 2)));
   }
 }
 
@@ -168,8 +162,7 @@ TEST_F(StorageCacheTest, ReportsWhenTheVolumesDiffer) {
   EXPECT_FALSE(Pass());
   EXPECT_EQ(Ids(cache->Volumes()), (Texts{StickVolumeId(1), u"USBSTOR\\SLOT", u"IDE\\DISK"}));
   EXPECT_EQ(Volume(1).MountPoints, Texts{u"F:\\"});
-  EXPECT_EQ(Volume(1).m_strDeviceDescr, u"");
-  EXPECT_EQ(Volume(1).DescriptorLength, 0u);
+  EXPECT_EQ(std::tuple(Volume(1).m_strDeviceDescr, Volume(1).DescriptorLength), std::tuple(u"", 0u));
   EXPECT_EQ(Volume(2).MountPoints, Texts{});
   EXPECT_TRUE(change({}, 2));
   EXPECT_TRUE(change({2}, 3));  // as many as before, but another
@@ -267,12 +260,13 @@ TEST_F(StorageCacheTest, DevicesByDeviceNumber) {
   const auto find = [&](std::uint32_t number, std::uint32_t driveType, const char16_t* dosName = u"") {
     return finder.FindStorageDevInstByDeviceNumber(number, driveType, dosName);
   };
-  EXPECT_THAT((std::vector{find(7, 2, u"\\Device\\Harddisk0"), find(7, 3, u"\\Device\\Floppy0"), find(10, 3),
-                           find(11, 2, u"\\Device\\Floppy0"), find(12, 5)}),
-              testing::ElementsAre(2, 2, 5, 6, 7));
-  EXPECT_THAT((std::vector{find(7, 2, u"\\Device\\Floppy0"), find(11, 2, u"\\Device\\floppy0"), find(11, 2, u"Floppy0"),
-                           find(8, 2), find(9, 3), find(12, 3), find(7, 0), find(7, 1), find(7, 4), find(7, 6)}),
-              testing::Each(0));
+  const auto floppy = u"\\Device\\Floppy0";
+  EXPECT_THAT((std::vector{find(7, 2, u"\\Device\\Harddisk0"), find(7, 3, floppy), find(10, 3), find(11, 2, floppy),
+                           find(12, 5)}),
+              ElementsAre(2, 2, 5, 6, 7));
+  EXPECT_THAT((std::vector{find(7, 2, floppy), find(11, 2, u"\\Device\\floppy0"), find(11, 2, u"Floppy0"), find(8, 2),
+                           find(9, 3), find(12, 3), find(7, 0), find(7, 1), find(7, 4), find(7, 6)}),
+              Each(0));
   odd->shortNumbers = true;
   EXPECT_EQ(DiskLetterFinder(*odd).FindStorageDevInstByDeviceNumber(7, 3, u""), 0u);
   EXPECT_EQ(pc->Open(), (OpenCounts{0, 1, 0, 0}));
@@ -307,11 +301,13 @@ TEST_F(StorageCacheTest, AsksForTheWholePcOnceInAPass) {
   cache.emplace(host);
   Pass();
   EXPECT_EQ(cache->Volumes().size(), kSticks);
-  EXPECT_EQ(host.Count(Operation::OpenDevice), 2 * kSticks + 26);  // volumes, disks, letters
-  EXPECT_EQ(host.Count(Operation::FirstVolume), 1u);
-  EXPECT_EQ(host.Count(Operation::VolumePathNames), kSticks);
-  EXPECT_EQ(host.Count(Operation::VolumeNameForMountPoint), kSticks + 3);
-  EXPECT_EQ(host.Count(Operation::DriveType), 3u + 3u + 3u);  // roots, path names, letters
+  const std::pair<Operation, unsigned> counts[] = {
+      {Operation::OpenDevice, 2 * kSticks + 26},  // volumes, disks, letters
+      {Operation::FirstVolume, 1},
+      {Operation::VolumePathNames, kSticks},
+      {Operation::VolumeNameForMountPoint, kSticks + 3},
+      {Operation::DriveType, 3 + 3 + 3}};  // roots, path names, letters
+  for (const auto& [operation, count] : counts) EXPECT_EQ(host.Count(operation), count);
 }
 
 }  // namespace
