@@ -5,7 +5,7 @@
 #include <sstream>
 
 #include "devinfo/devnode.h"
-#include "platform/text.h"
+#include "tests/support/outline.h"
 
 namespace KelvoUHW {
 namespace {
@@ -31,42 +31,36 @@ void FillEveryField(CZKUMInfoDeviceImpl& device) {
   device.UiNumber = 0x1F;
 }
 
-std::u16string Dump(const CZKUMInfoDeviceImpl& device) {
-  std::u16string out;
-  device.ToString(out, u"> ");
-  return out;
-}
-
 // Of a record with nothing in it but what these lines show.
-std::u16string DumpWith(const std::u16string& classLine, const std::u16string& busType) {
-  return u">  Info ------------------------------------------\r\n> devInstHandle        : -1\r\n"
-         u"> devInstHandleParent  : -1\r\n" +
-         classLine + (busType.empty() ? u"" : u"> INTERFACE_TYPE: " + busType + u"\r\n") +
-         u"childvector size0\r\nChildsToString End\r\n";
+std::string DumpWith(const std::string& classLine, const std::string& busType) {
+  return ">  Info ------------------------------------------\r\n> devInstHandle        : -1\r\n"
+         "> devInstHandleParent  : -1\r\n" +
+         classLine + (busType.empty() ? "" : "> INTERFACE_TYPE: " + busType + "\r\n") +
+         "childvector size0\r\nChildsToString End\r\n";
 }
 
 TEST(InfoDevice, DumpsEveryFieldAndResetLeavesThree) {
   CZKUMInfoDeviceImpl device;
   FillEveryField(device);
   // The class name decides about the first class line and is not in it: this is meant.
-  EXPECT_EQ(Dump(device),
-            u">  Info ------------------------------------------\r\n"
-            u"> DevInstId            : USBSTOR\\DISK&VEN_V&PROD_P\\S\r\n"
-            u"> driverKeyName : driver\r\n> m_strDevInstIdParent : parent\r\n> deviceDescr : descr\r\n"
-            u"> serial number        : S\r\n> Vendor; product: V;P\r\n"
-            u"> devInstHandle        : 21\r\n> devInstHandleParent  : 22\r\n"
-            u"> SPDRP_CLASS: guid text\r\n> SPDRP_CLASS: {4D36E967-E325-11CE-BFC1-08002BE10318}\r\n"
-            u"> SPDRP_FRIENDLYNAME: friendly\r\n> SPDRP_MFG: mfg\r\n> INTERFACE_TYPE: TurboChannel\r\n"
-            u"> SPDRP_HARDWAREID: hardware\r\n> SPDRP_PHYSICAL_DEVICE_OBJECT_NAME: physical\r\n"
-            u"> SPDRP_SERVICE: service\r\n> SPDRP_ENUMERATOR_NAME: enum\r\n"
-            u"> SPDRP_LOCATION_INFORMATION: location\r\n> SPDRP_UI_NUMBER    : 0x1F\r\n"
-            u"childvector size0\r\nChildsToString End\r\n");
+  EXPECT_EQ(DumpOf(device, u"> "),
+            ">  Info ------------------------------------------\r\n"
+            "> DevInstId            : USBSTOR\\DISK&VEN_V&PROD_P\\S\r\n"
+            "> driverKeyName : driver\r\n> m_strDevInstIdParent : parent\r\n> deviceDescr : descr\r\n"
+            "> serial number        : S\r\n> Vendor; product: V;P\r\n"
+            "> devInstHandle        : 21\r\n> devInstHandleParent  : 22\r\n"
+            "> SPDRP_CLASS: guid text\r\n> SPDRP_CLASS: {4D36E967-E325-11CE-BFC1-08002BE10318}\r\n"
+            "> SPDRP_FRIENDLYNAME: friendly\r\n> SPDRP_MFG: mfg\r\n> INTERFACE_TYPE: TurboChannel\r\n"
+            "> SPDRP_HARDWAREID: hardware\r\n> SPDRP_PHYSICAL_DEVICE_OBJECT_NAME: physical\r\n"
+            "> SPDRP_SERVICE: service\r\n> SPDRP_ENUMERATOR_NAME: enum\r\n"
+            "> SPDRP_LOCATION_INFORMATION: location\r\n> SPDRP_UI_NUMBER    : 0x1F\r\n"
+            "childvector size0\r\nChildsToString End\r\n");
   device.m_nVendorId = device.m_nProductId = 1;
   device.Reset();
   EXPECT_TRUE(device.m_nVendorId == kUnknownId && device.m_nProductId == kUnknownId);
   EXPECT_EQ(device.m_strSerialNumber + device.Location + device.EnumName, u"Slocationenum");
   device.m_strSerialNumber = device.Location = device.EnumName = u"";
-  EXPECT_EQ(Dump(device), DumpWith(u"", u"InterfaceTypeUndefined"));
+  EXPECT_EQ(DumpOf(device, u"> "), DumpWith("", "InterfaceTypeUndefined"));
 }
 
 TEST(InfoDevice, ClassLinesAndBusTypes) {
@@ -74,9 +68,9 @@ TEST(InfoDevice, ClassLinesAndBusTypes) {
   named.DevClass = u"Class";
   named.ClassGuidText = withGuid.ClassGuidText = u"text";
   withGuid.ClassGuid = {1, 0, 0, {}};
-  const std::u16string undefined = u"InterfaceTypeUndefined";
-  EXPECT_EQ(Dump(named), DumpWith(u"> SPDRP_CLASS: text\r\n", undefined));
-  EXPECT_EQ(Dump(withGuid), DumpWith(u"> SPDRP_CLASS: {00000001-0000-0000-0000-000000000000}\r\n", undefined));
+  const std::string undefined = "InterfaceTypeUndefined";
+  EXPECT_EQ(DumpOf(named, u"> "), DumpWith("> SPDRP_CLASS: text\r\n", undefined));
+  EXPECT_EQ(DumpOf(withGuid, u"> "), DumpWith("> SPDRP_CLASS: {00000001-0000-0000-0000-000000000000}\r\n", undefined));
   // That names reach one too far, to 17, is meant, and so is the name of 17.
   std::istringstream names(
       "InterfaceTypeUndefined Internal Isa Eisa MicroChannel TurboChannel PCIBus VMEBus NuBus PCMCIABus CBus MPIBus "
@@ -84,7 +78,7 @@ TEST(InfoDevice, ClassLinesAndBusTypes) {
   for (onBus.LegacyBusType = -2; onBus.LegacyBusType <= 18; ++onBus.LegacyBusType) {
     std::string name;
     if (onBus.LegacyBusType >= -1) names >> name;
-    EXPECT_EQ(Dump(onBus), DumpWith(u"", platform::FromUtf8(name))) << onBus.LegacyBusType;
+    EXPECT_EQ(DumpOf(onBus, u"> "), DumpWith("", name)) << onBus.LegacyBusType;
   }
 }
 

@@ -301,13 +301,11 @@ TEST_F(StorageCacheTest, AsksForTheWholePcOnceInAPass) {
   cache.emplace(host);
   Pass();
   EXPECT_EQ(cache->Volumes().size(), kSticks);
-  const std::pair<Operation, unsigned> counts[] = {
-      {Operation::OpenDevice, 2 * kSticks + 26},  // volumes, disks, letters
-      {Operation::FirstVolume, 1},
-      {Operation::VolumePathNames, kSticks},
-      {Operation::VolumeNameForMountPoint, kSticks + 3},
-      {Operation::DriveType, 3 + 3 + 3}};  // roots, path names, letters
-  for (const auto& [operation, count] : counts) EXPECT_EQ(host.Count(operation), count);
+  EXPECT_EQ(host.Count(Operation::OpenDevice), 2 * kSticks + 26);  // volumes, disks, letters
+  EXPECT_EQ(host.Count(Operation::FirstVolume), 1u);
+  EXPECT_EQ(host.Count(Operation::VolumePathNames), kSticks);
+  EXPECT_EQ(host.Count(Operation::VolumeNameForMountPoint), kSticks + 3);
+  EXPECT_EQ(host.Count(Operation::DriveType), 3u + 3u + 3u);  // roots, path names, letters
 }
 
 }  // namespace

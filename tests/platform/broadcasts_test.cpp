@@ -63,12 +63,10 @@ TEST(Broadcasts, TellTheDifferenceInTheSystemsOrder) {
   unordered.devices[6].parent = kDisk;  // a circle has no first one, and ends all the same
   EXPECT_EQ(Shown(without, unordered).size(), 4u);
   EXPECT_THAT(Shown(whole, whole), IsEmpty());
-
   const Machine dismounted = After(whole, Dismount{kStickVolumeName, u"E:\\"});
   EXPECT_THAT(Shown(whole, dismounted), ElementsAre("-E: medium")) << "the letter belongs to the disk";
   EXPECT_THAT(Shown(whole, After(whole, Dismount{kStickVolumeName, u"C:\\Mount\\Stick\\"})), IsEmpty());
   EXPECT_THAT(Shown(whole, After(whole, Mount{kStickVolumeName, u"Q:\\"})), ElementsAre("+Q:"));
-
   // Another volume behind the same letter; a device without an interface; letters in either case.
   Machine swapped = whole;
   swapped.volumes[1].name = u"\\\\?\\Volume{other}\\";
@@ -95,14 +93,12 @@ struct Listener {
     desktop.RunFor(0);
   }
   bool Sees() const { return pc.Snapshot().devices.size() == StickMachine().devices.size(); }
-
   static LResult ZKUSB_WINDOW_CALL Procedure(WindowHandle, std::uint32_t message, WParam event, LParam) {
     if (message != kWM_DEVICECHANGE) return 1;
     const std::string what = event == kDBT_DEVNODES_CHANGED ? "nodes" : "volume";
     s_listener->heard.push_back(what + (s_listener->Sees() ? ", stick there" : ", no stick"));
     return 0;
   }
-
   SimulatedPc pc;
   std::vector<std::string> heard;
   SimulatedDesktop desktop;

@@ -57,7 +57,6 @@ TEST(ClassObjects, OfTheProcessComeBeforeThoseOfTheRegistry) {
   EXPECT_EQ(CoRegisterClassObject(kClass, &first, CLSCTX_INPROC_SERVER, 0, nullptr), E_INVALIDARG);
   EXPECT_EQ(CoGetClassObject(kClass, CLSCTX_INPROC_SERVER, nullptr, IUnknown::kIid, nullptr), E_POINTER);
   EXPECT_EQ(CoCreateInstance(kClass, nullptr, CLSCTX_INPROC_SERVER, IUnknown::kIid, nullptr), E_POINTER);
-
   ASSERT_EQ(CoRegisterClassObject(kClass, &first, CLSCTX_INPROC_SERVER, 0, &firstCookie), S_OK);
   ASSERT_EQ(CoRegisterClassObject(kClass, &second, CLSCTX_INPROC_SERVER, 0, &secondCookie), S_OK);
   EXPECT_NE(firstCookie, secondCookie);

@@ -43,7 +43,6 @@ class SimulatedDesktopTest : public testing::Test {
     for (const Handled& each : handled) messages.push_back(each.message);
     return messages;
   }
-
   std::vector<Handled> handled;
   std::function<LResult(const MSG&)> answer;
   SimulatedDesktop desktop;
@@ -106,7 +105,6 @@ TEST_F(SimulatedDesktopTest, WindowsLiveInTheirThread) {
   EXPECT_EQ(Register().error, 1410u);
   EXPECT_TRUE(Register(u"class"));
   EXPECT_EQ(Register(nullptr).error, 87u);
-
   std::uint32_t owner = 0;
   Launch([&] {
     owner = desktop.CurrentThreadId();
@@ -202,7 +200,6 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
     }
   }
   answer = nullptr;
-
   DEV_BROADCAST_DEVICEINTERFACE_W shorter = filter, volumes = filter;
   shorter.dbcc_size = 28;
   volumes.dbcc_devicetype = kDBT_DEVTYP_VOLUME;

@@ -20,7 +20,6 @@ struct Reply {
   Status status;
   Bytes bytes;
   std::uint32_t returned = 99;
-
   template <class Record>
   Record As(Record record = {}) const {
     std::memcpy(&record, bytes.data(), std::min(sizeof(record), bytes.size()));
@@ -40,7 +39,6 @@ class DeviceIoTest : public testing::Test {
     EXPECT_TRUE(pc.OpenDevice(path.c_str(), kGENERIC_WRITE, kFILE_SHARE_WRITE, handle));
     return handle;
   }
-
   // The bytes behind those returned stay as the caller left them.
   Reply Ask(FileHandle handle, std::uint32_t code, Bytes in, std::uint32_t out) {
     Reply reply{{}, Bytes(out, kMark)};
@@ -49,7 +47,6 @@ class DeviceIoTest : public testing::Test {
     EXPECT_EQ(std::count(reply.bytes.begin() + reply.returned, reply.bytes.end(), kMark), out - reply.returned);
     return reply;
   }
-
   SimulatedPc pc{StickMachine()};
 };
 
@@ -175,7 +172,6 @@ TEST_F(DeviceIoTest, ConnectionInformation) {
   EXPECT_EQ(returned, expected.size());
   expected.resize(365, kMark);
   EXPECT_EQ(record, expected);
-
   for (const std::uint32_t out : {35u, 45u, 46u, 57u}) {
     const Reply cut = Ask(hub, kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, {1, 0, 0, 0}, out);
     EXPECT_EQ(cut.returned, 35 + (out - 35) / 11 * 11) << "only whole pipes";

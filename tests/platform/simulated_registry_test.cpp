@@ -76,7 +76,6 @@ TEST(SimulatedRegistry, HoldsValuesWithTheirTypes) {
   EXPECT_THAT(LinesOf(registry), ElementsAre("AB", "AB  (default) = type 1: 61 00 62 00", "AB  Bytes = type 3: 01 FF",
                                              "AB  Empty = type 1:", "AB  Number = dword 0x0000002A", "A_",
                                              "A_  (default) = \"x = \"y\"\"", "A_\\Sub", "b"));
-
   std::uint32_t type = 0, size = 3;
   std::uint8_t buffer[4] = {9, 9, 9, 9};
   EXPECT_EQ(Code(registry.QueryValue(key, u"NUMBER", &type, buffer, size)), kERROR_MORE_DATA);
@@ -134,7 +133,6 @@ TEST(SimulatedRegistry, GivesEachHandleOnlyWhatItWasOpenedFor) {
   EXPECT_TRUE(registry.EnumKey(reader, 0, name, chars));
   EXPECT_EQ(std::u16string(name, chars + 1), std::u16string(u"Sub\0", 4));
   EXPECT_EQ(Code(registry.EnumKey(reader, 1, name, chars)), kERROR_NO_MORE_ITEMS);
-
   for (const RegistryKeyHandle key : {reader, writer, gone}) EXPECT_TRUE(registry.CloseKey(key));
   EXPECT_EQ(Code(registry.CloseKey(gone)), kERROR_INVALID_HANDLE);
   EXPECT_EQ(Code(registry.CloseKey(0x1000)), kERROR_INVALID_HANDLE);

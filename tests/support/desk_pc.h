@@ -31,12 +31,6 @@ inline std::string ListsText(const CZKUMUsbTreeBuilder& builder) {
   return text;
 }
 
-inline std::u16string DumpOf(const NodePtr& root) {
-  std::u16string dump;
-  if (root) root->ToString(dump, u"");
-  return dump;
-}
-
 // A PC with devices, and a builder that sees it through a host.
 template <class Host>
 struct Desk {

@@ -1,4 +1,4 @@
-// A tree as text, one line a node.
+// Records as text: their dumps, and a tree with one line a node.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -8,6 +8,12 @@
 #include "tree/records.h"
 
 namespace KelvoUHW {
+
+inline std::string DumpOf(const CZKUMUsbTreeNodeImpl& node, const char16_t* indent = u"") {
+  std::u16string out;
+  node.ToString(out, indent);
+  return platform::ToUtf8(out);
+}
 
 // Depth in dots, kind, what tells the node apart, and where it hangs by its own account.
 inline std::string OutlineOf(const NodePtr& node, const std::string& dots = "") {

@@ -33,11 +33,9 @@ std::u16string DiskId(const Gadget& gadget, std::size_t disk);
 class RandomPc {
  public:
   explicit RandomPc(std::uint32_t seed);
-
   // One change, or a pause where there is nothing to change.
   void Change();
   std::uint32_t Below(std::uint32_t bound) { return static_cast<std::uint32_t>(m_random() % bound); }
-
   platform::simulated::SimulatedPc& Pc() { return *m_pc; }
   // All that ever were plugged in; one that comes back is the same as before.
   const std::vector<Gadget>& Gadgets() const { return m_gadgets; }
@@ -51,7 +49,6 @@ class RandomPc {
   void MountOrDismount();
   std::u16string NewVolume();
   void Apply(platform::simulated::Step step, const char* what, std::u16string_view which);
-
   std::mt19937 m_random;
   std::optional<platform::simulated::SimulatedPc> m_pc;
   std::vector<Gadget> m_gadgets;

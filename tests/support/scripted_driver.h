@@ -18,14 +18,11 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
   // Sees the buffers of one request; returns the outcome.
   using Answer =
       std::function<platform::Status(const void* in, void* out, std::uint32_t outBytes, std::uint32_t& returned)>;
-
   using InterceptingHost::InterceptingHost;
-
   // The n-th request with this code is answered by the n-th answer given; later ones by the base.
   void Next(std::uint32_t code, Answer answer) { m_answers[code].push_back(std::move(answer)); }
   // Every request with this code changes the base's answer.
   void Always(std::uint32_t code, Answer change) { m_changes[code] = std::move(change); }
-
   platform::Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
                                  void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
     if (auto& answers = m_answers[code]; !answers.empty()) {
@@ -41,7 +38,6 @@ class ScriptedDriver : public platform::wrappers::InterceptingHost {
 
  private:
   platform::Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
-
   std::map<std::uint32_t, std::vector<Answer>> m_answers;
   std::map<std::uint32_t, Answer> m_changes;
 };

@@ -7,7 +7,7 @@
 
 #include "platform/wrappers/intercepting_host.h"
 #include "tests/support/desk_pc.h"
-#include "tree/port_device.h"
+#include "tests/support/outline.h"
 
 namespace KelvoUHW {
 namespace {
@@ -22,13 +22,11 @@ constexpr std::uint64_t kNoCall = static_cast<std::uint64_t>(-1);
 class FaultyHost final : public platform::wrappers::InterceptingHost {
  public:
   using InterceptingHost::InterceptingHost;
-
   void Arm(std::uint64_t call, bool onwards) {
     m_call = call;
     m_onwards = onwards;
     m_calls = m_sets = 0;
   }
-
   std::optional<Operation> firstFailure;
   // Readings of the device manager that were told of a device without parent.
   std::size_t readingsStopped = 0;
@@ -49,7 +47,6 @@ class FaultyHost final : public platform::wrappers::InterceptingHost {
     if (call.operation == Operation::GetParent && m_reading) ++readingsStopped;
     return Status::Failure(IsConfigurationManager(call.operation) ? 0x13 : 31);
   }
-
   std::uint64_t m_call = kNoCall, m_calls = 0, m_sets = 0;
   bool m_onwards = false, m_reading = false;
 };
@@ -90,9 +87,9 @@ Shown NextEvent(FaultyDesk& desk) {
   desk.Do({Gadget(u"NEXT", 4)});
   Shown shown{desk.builder.Build() ? "" : "nothing new\n", ""};
   for (const DeviceList& list : desk.Lists()) shown.lists += Sorted(ShortNames(list), ' ') + "\n";
-  std::u16string dump = DumpOf(desk.builder.Root());
-  for (const InfoDevicePtr& record : desk.builder.DeviceInfo().Current()) dump += DumpOf(record);
-  shown.dumps = Sorted(platform::ToUtf8(dump), '\n');
+  std::string dump = desk.builder.Root() ? DumpOf(*desk.builder.Root()) : "";
+  for (const InfoDevicePtr& record : desk.builder.DeviceInfo().Current()) dump += DumpOf(*record);
+  shown.dumps = Sorted(dump, '\n');
   desk.builder.CommitDeviceCache();
   return shown;
 }

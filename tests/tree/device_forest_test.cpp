@@ -182,7 +182,6 @@ TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
   for (const auto& [what, forest, nodes] : cases) {
     EXPECT_EQ(NodesOf(forest, MakeRecord<CZKUMUsbTreeRootImpl>()), nodes) << what;
   }
-
   // A controller of the USB walk has a description, so both are in the tree, that one first.
   const NodePtr root = MakeRecord<CZKUMUsbTreeRootImpl>();
   const auto walked = MakeRecord<CZKUMHostControllerImpl>();

@@ -32,12 +32,10 @@ class HubQueries : public testing::Test {
     EXPECT_EQ(m_pc.Open(), platform::simulated::OpenCounts{});
     EXPECT_THAT(m_pc.Misuses(), testing::IsEmpty());
   }
-
   static platform::FileHandle Opened(DeviceFile& file, const std::u16string& path) {
     EXPECT_TRUE(file.Open(path, platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE));
     return file.Get();
   }
-
   SimulatedPc m_pc{TwoPorts()};
   ScriptedDriver m_driver{m_pc};
   LoggingHost m_log{m_driver};

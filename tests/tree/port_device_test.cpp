@@ -2,7 +2,9 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/text.h"
+#include <fstream>
+
+#include "tests/support/outline.h"
 #include "tests/support/port_records.h"
 
 namespace KelvoUHW {
@@ -19,37 +21,24 @@ std::unique_ptr<DescriptorRequest> Configuration() {
   return request;
 }
 
-std::string Dump(const CZKUMPortDeviceImpl& device, const char16_t* indent) {
-  std::u16string out;
-  device.ToString(out, indent);
-  return platform::ToUtf8(out);
-}
-
 TEST(PortDevice, TakesItsIdentityFromRecordAndStrings) {
-  struct Case {
-    const char* what;
-    bool record, strings;
-    const char16_t* id;
-    std::uint32_t vendor, product;
-    const char16_t *serial, *manufacturer;
-  };
-  const Case cases[] = {
+  using Text = const char16_t*;
+  const std::tuple<const char*, bool, bool, Text, std::uint32_t, std::uint32_t, Text, Text> cases[] = {
       {"nothing", false, false, u"", kUnknownId, kUnknownId, u"", u""},
       {"the id alone", false, true, u"USB\\VID_046D&PID_C52B\\7", 0x46D, 0xC52B, u"7", u""},
       {"the record over the id", true, false, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"7", u""},
-      {"the strings over the id", true, true, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"AA01", u"SanDisk"},
-  };
-  for (const Case& c : cases) {
-    const auto device = MakeRecord<CZKUMPortDeviceImpl>(5u, c.record ? Connection(1) : nullptr, nullptr,
-                                                        c.strings ? Strings() : nullptr, u"key", u"descr", c.id);
-    EXPECT_EQ(device->m_devInstHandle, 5u) << c.what;
-    EXPECT_EQ(device->m_nVendorId, c.vendor) << c.what;
-    EXPECT_EQ(device->m_nProductId, c.product) << c.what;
-    EXPECT_EQ(device->m_strSerialNumber, c.serial) << c.what;
-    EXPECT_EQ(device->m_strUsbManufacturer, c.manufacturer) << c.what;
-    EXPECT_EQ(device->Speed(), c.record ? 2 : 0) << c.what;
-    EXPECT_EQ(device->NumberInterfaces(), 0) << c.what;
-    EXPECT_TRUE(device->AcceptNode(device)) << c.what;
+      {"the strings over the id", true, true, u"USB\\VID_046D&PID_C52B\\7", 0x781, 0x5580, u"AA01", u"SanDisk"}};
+  for (const auto& [what, record, strings, id, vendor, product, serial, manufacturer] : cases) {
+    const auto device = MakeRecord<CZKUMPortDeviceImpl>(5u, record ? Connection(1) : nullptr, nullptr,
+                                                        strings ? Strings() : nullptr, u"key", u"descr", id);
+    EXPECT_EQ(
+        std::tie(device->m_nVendorId, device->m_nProductId, device->m_strSerialNumber, device->m_strUsbManufacturer),
+        std::tie(vendor, product, serial, manufacturer))
+        << what;
+    EXPECT_EQ(std::tuple(device->m_devInstHandle, device->Speed(), device->NumberInterfaces()),
+              std::tuple(5u, record ? 2 : 0, 0))
+        << what;
+    EXPECT_TRUE(device->AcceptNode(device)) << what;
   }
 }
 
@@ -64,12 +53,12 @@ TEST(PortDevice, WithoutConnectionOnlyItsNeighboursAreDumped) {
     const auto device = MakeRecord<CZKUMPortDeviceImpl>(1u, std::unique_ptr<ConnectionRecord>(record), nullptr, nullptr,
                                                         u"k", u"d", u"i");
     device->m_infoDevice = info;
-    EXPECT_EQ(Dump(*device, u"x "), rest);
+    EXPECT_EQ(DumpOf(*device, u"x "), rest);
   }
   auto record = Connection(1);
   record->Info.DeviceDescriptor.idVendor = 0xFFFF;
   const auto nameless = MakeRecord<CZKUMPortDeviceImpl>(0u, std::move(record), nullptr, nullptr, u"", u"", u"");
-  EXPECT_NE(Dump(*nameless, u"").find("idVendor      : 0xFFFF (null)\r\n"), std::string::npos);
+  EXPECT_NE(DumpOf(*nameless, u"").find("idVendor      : 0xFFFF (null)\r\n"), std::string::npos);
 }
 
 TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
@@ -77,33 +66,8 @@ TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
                                                       u"USB Mass Storage Device", u"USB\\VID_0781&PID_5580\\AA01");
   EXPECT_EQ(device->NumberInterfaces(), 1);
   ASSERT_EQ(device->m_interfaceDescrs.size(), 1u);
-  EXPECT_EQ(Dump(*device, u"> "),
-            "> PortDevice: ==================================================\r\n"
-            "> DevInstId            : USB\\VID_0781&PID_5580\\AA01\r\n> driverKeyName : key\r\n"
-            "> deviceDescr : USB Mass Storage Device\r\n> serial number        : AA01\r\n"
-            "> VendorId; productId: 0x781; 0x5580\r\n> devInstHandle        : 6\r\n> manufacturer  : SanDisk\r\n"
-            "> product       : Extreme\r\n> idVendor      : 0x0781 SanDisk Corporation\r\n"
-            "> ConnectionInfo :::\r\n"
-            "> Device Descriptor:\r\n> bcdUSB:                 0x0000\r\n> bDeviceClass:           0x00\r\n"
-            "> bDeviceSubClass:        0x00\r\n> bDeviceProtocol:        0x00\r\n"
-            "> bMaxPacketSize0:        0x00 (0)\r\n> bcdDevice:              0x0000\r\n"
-            "> bNumConfigurations:     0x00\r\n> ConnectionStatus: DeviceConnected\r\n"
-            "> Current Config Value: 0x01\r\n> Device Bus Speed:     High\r\n> DeviceIsHub: no\r\n"
-            "> Device Address:       0x09\r\n> Open Pipes:              0\r\n> End ConnectionInfo ---\r\n"
-            "> ConfigDesc :::\r\n"
-            "> \r\nConfiguration Descriptor:\r\n> wTotalLength:       0x0019\r\n> bNumInterfaces:       0x01\r\n"
-            "> bConfigurationValue:  0x01\r\n> iConfiguration:       0x04\r\n> (LanguageID=0x0409):    \"Stick\"\r\n"
-            "> bmAttributes:         0xA0 (> Bus Powered > Remote Wakeup)\r\n"
-            "> MaxPower:             0x32 (100 Ma)\r\n"
-            "> \r\n> Endpoint Descriptor:\r\n> bEndpointAddress:     0x81  IN\r\n> Transfer Type:        Bulk\r\n"
-            "> wMaxPacketSize:       0x0200 (512)\r\n> bInterval:            0x00\r\n"
-            "> End ConfigDesc ...\r\n"
-            "> . \r\nInterface Descriptor:\r\n> . bInterfaceNumber:     0x00\r\n> . bAlternateSetting:    0x00\r\n"
-            "> . bNumEndpoints:        0x02\r\n> . bInterfaceClass:      0x08 (Interface: Mass Storage)\r\n"
-            "> . bInterfaceSubClass:   0x06 (SCSI transparent)\r\n"
-            "> . bInterfaceProtocol:   0x50 (Bulk-Only Transport)\r\n> . iInterface:           0x04\r\n"
-            "> . (LanguageID=0x0409):    \"Stick\"\r\n> End device -------------------------------------------\r\n"
-            "childvector size0\r\nChildsToString End\r\n");
+  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/port-device.txt", std::ios::binary);
+  EXPECT_EQ(DumpOf(*device, u"> "), std::string(std::istreambuf_iterator<char>(file), {}));
 }
 
 }  // namespace

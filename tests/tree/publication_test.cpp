@@ -171,7 +171,6 @@ TEST(Merging, JoinsDeviceNodesToPortDevices) {
   ASSERT_EQ(stick->m_childs, DeviceList{current.FindByInstanceId(DiskId(u"S1"))});
   EXPECT_EQ(entry->m_childs, stick->m_childs);
   EXPECT_EQ(stick->m_childs[0]->m_pParent, stick.Get());
-
   // The hubs on the way up are named after the device manager's parents; their ports are not, and
   // the controller and the root stay as the walk left them.
   const auto handleOf = [&](const Text& id) { return std::to_string(current.FindByInstanceId(id)->m_devInstHandle); };

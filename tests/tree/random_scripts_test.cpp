@@ -103,11 +103,9 @@ Picture PictureOfTree(const NodePtr& root) {
 class Watcher {
  public:
   explicit Watcher(std::uint32_t seed) : m_pc(seed), m_builder(m_pc.Pc()) {}
-
   RandomPc& Pc() { return m_pc; }
   int Publications() const { return m_publications; }
   const Ids& Ever() const { return m_ever; }
-
   void Build() {
     NoteEmptiedSlots();
     if (m_builder.Build()) {
@@ -117,7 +115,6 @@ class Watcher {
     }
     m_builder.CommitDeviceCache();
   }
-
   // With nothing going on, every device is connected that has a way to be.
   void CheckAtRest() {
     for (int i = 0; i < kBuildsUntilHeldAreBack; ++i) Build();
@@ -132,13 +129,11 @@ class Watcher {
   // Exception: a device whose own node is left out by its service has no info device. It is in the
   // tree and never in a list of arrivals; hubs are in no list at all.
   static bool IsReported(const Gadget& gadget) { return gadget.kind != Kind::Unreported && gadget.kind != Kind::Hub; }
-
   // Exception: a card that is taken out takes its slot and the reader along, which are reported as
   // removed and held back until they have a child again.
   bool MayBeHeld(const Gadget& gadget) const {
     return gadget.kind == Kind::CardReader && m_lostACard.contains(ToUtf8(gadget.id));
   }
-
   // Exception: a reader all of whose slots were emptied has no child that could bring it back.
   bool CannotReturn(const Gadget& gadget) const {
     if (!MayBeHeld(gadget)) return false;
@@ -148,7 +143,6 @@ class Watcher {
     }
     return true;
   }
-
   void NoteEmptiedSlots() {
     for (const Gadget& gadget : m_pc.Gadgets()) {
       if (!gadget.plugged || gadget.kind != Kind::CardReader) continue;
@@ -165,7 +159,6 @@ class Watcher {
       }
     }
   }
-
   Ids ListOf(DeviceListKind kind) const {
     Ids ids;
     for (const NodePtr& node : *m_builder.GetDeviceList(kind)) {
@@ -173,7 +166,6 @@ class Watcher {
     }
     return ids;
   }
-
   // What was connected, with those that came and without those that left, is connected now; and
   // nothing comes that was connected, or leaves the tree unreported.
   void CheckLists() {
@@ -185,18 +177,15 @@ class Watcher {
     for (const std::string& id : removed) expected.erase(id);
     EXPECT_EQ(m_connected, expected);
     m_ever.insert(m_connected.begin(), m_connected.end());
-
     Picture shown = PictureOfTree(m_builder.Root());
     for (const auto& [id, seen] : m_shown) EXPECT_TRUE(shown.contains(id) || removed.contains(id));
     m_shown = std::move(shown);
   }
-
   // Exception: a held reader may return and be held again in one build. It is reported as both, in
   // this order, and shows what it had when it was held the first time.
   bool CameAndLeft(const std::string& id) const {
     return ListOf(kAttachedList).contains(id) && ListOf(kRemovedList).contains(id);
   }
-
   void CheckTree() {
     Picture shown = m_shown;
     Picture expected = PictureOfPc(m_pc.Pc().Snapshot(), m_pc);
@@ -214,7 +203,6 @@ class Watcher {
     EXPECT_EQ(m_connected, reported);
     std::erase_if(m_lostACard, [this](const std::string& id) { return m_connected.contains(id); });
   }
-
   RandomPc m_pc;
   CZKUMUsbTreeBuilder m_builder;
   Picture m_shown;  // by the last publication

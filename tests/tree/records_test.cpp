@@ -2,17 +2,10 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/text.h"
-#include "tree/port_device.h"
+#include "tests/support/outline.h"
 
 namespace KelvoUHW {
 namespace {
-
-std::string Dump(const CZKUMUsbTreeNodeImpl& node, const char16_t* indent = u"") {
-  std::u16string out;
-  node.ToString(out, indent);
-  return platform::ToUtf8(out);
-}
 
 const std::string kNoChildren = "childvector size0\r\nChildsToString End\r\n";
 
@@ -39,7 +32,7 @@ TEST(Node, BaseLinesAppearOnlyWithTheirValues) {
   for (const Case& c : cases) {
     const auto node = MakeRecord<CZKUMUsbTreeNodeImpl>();
     c.fill(*node);
-    EXPECT_EQ(Dump(*node, u"> "), c.lines + kNoChildren) << c.what;
+    EXPECT_EQ(DumpOf(*node, u"> "), c.lines + kNoChildren) << c.what;
   }
 }
 
@@ -119,12 +112,11 @@ TEST(Node, ADeepChainNeedsNoDeepStackAndIsDumped) {
   root.Reset();
   EXPECT_EQ(kept->m_pParent, nullptr);
   EXPECT_NE(FindByInstanceId(kept, u"9999"), nullptr);
-
   root = Node(u"0");
   HangChainBelow(root.Get(), 500);
   std::string indent;
   for (int i = 1; i < 500; ++i) indent += "- ";
-  EXPECT_NE(Dump(*root).find("\r\n" + indent + "DevInstId            : 499\r\nchildvector size0\r\n"),
+  EXPECT_NE(DumpOf(*root).find("\r\n" + indent + "DevInstId            : 499\r\nchildvector size0\r\n"),
             std::string::npos);
 }
 
@@ -135,7 +127,7 @@ TEST(Records, PortsTellTheirStatusAndHubsAreNamedAfterTheirPaths) {
     const auto port = MakeRecord<CZKUMHubPortImpl>(7u);
     port->SetInstanceId(u"a port");
     port->m_nStatus = status;
-    EXPECT_EQ(Dump(*port, u"+"), "+HubPort 7:\r\n+status : bad device\r\n" + kNoChildren);
+    EXPECT_EQ(DumpOf(*port, u"+"), "+HubPort 7:\r\n+status : bad device\r\n" + kNoChildren);
   }
   const auto hub = MakeRecord<CZKUMHubDeviceImpl>();
   hub->SetHubName(u"USB#Root_Hub#1#{f18a0e88-c30c-11d0-8815-00a0c906bed8}");

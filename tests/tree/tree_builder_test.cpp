@@ -4,7 +4,7 @@
 
 #include "platform/wrappers/failing_host.h"
 #include "tests/support/desk_pc.h"
-#include "tree/port_device.h"
+#include "tests/support/outline.h"
 #include "tree/publication.h"
 
 namespace KelvoUHW {
@@ -31,7 +31,6 @@ Change PortOnly(const Text& serial, std::uint32_t port) {
 class BuildDesk : public Desk<platform::wrappers::FailingHost> {
  public:
   using Desk::Desk;
-
   // The lists as text, or "same" where nothing was published.
   std::string Build(bool commit = true) {
     const NodePtr before = builder.Root();
@@ -51,7 +50,6 @@ class BuildDesk : public Desk<platform::wrappers::FailingHost> {
     if (commit) builder.CommitDeviceCache();
     return changed ? ListsText(builder) : "same";
   }
-  std::string Dump() const { return platform::ToUtf8(DumpOf(builder.Root())); }
 };
 
 // A mouse, a stick and a card reader with two empty slots, beside an internal disk.
@@ -90,7 +88,6 @@ TEST(Builds, WhatComesAndGoes) {
        {{{}, "same"}, {{Gadget(u"M1", 1)}, "M1 | M1 | - | -"}},
        {},
        "same"},
-
       // Parents of what left are reported with it and come back one level per build, and only where
       // another child of theirs is there.
       {"a second volume on a stick that is there",
@@ -111,7 +108,6 @@ TEST(Builds, WhatComesAndGoes) {
        {ExternalHub(u"HUB", 1, kNewHubService), Gadget(u"K1", 1, hub), Stick(u"S3", 2, u'E', hub)},
        "K1 S3 | K1 S3 | - | -",
        kNewHubService},
-
       // What the caches do not see is in the next tree that something else brings about, and leaves
       // as what was in the last tree and is not in the new one.
       {"excluded and not admitted",
@@ -169,9 +165,9 @@ TEST(Builds, ARemovedReaderShowsTheCardThatLeft) {
   const NodePtr withCard = desk.builder.Root();
   desk.Do({Out(VolumeId(DiskId(u"CR")))});
   desk.Build();
-  EXPECT_THAT(desk.Dump(), Not(HasSubstr("of F:")));
+  EXPECT_THAT(DumpOf(*desk.builder.Root()), Not(HasSubstr("of F:")));
   const NodePtr removed = desk.builder.GetDeviceList(kRemovedList)->at(0);
-  EXPECT_THAT(platform::ToUtf8(DumpOf(removed)), HasSubstr("devMountPoint   : F:\\\r\n"));
+  EXPECT_THAT(DumpOf(*removed), HasSubstr("devMountPoint   : F:\\\r\n"));
   EXPECT_EQ(removed.StaticCast<CZKUMPortDeviceImpl>()->m_infoDevice->m_pParent,
             static_cast<CZKUMUsbTreeNodeImpl*>(removed->m_pParent));
 }
@@ -189,7 +185,6 @@ TEST(Builds, RecordsSharedBetweenTreesLeaveNoLinkBehind) {
   BuildDesk desk(BarePc(), {ExternalHub(u"HUB", 1), Stick(u"S1", 1, u'E', UsbId(u"HUB"))});
   EXPECT_EQ(desk.Build(), "S1 | S1 | - | -");
   NodePtr first = desk.builder.Root();
-
   // The hub, behind the controller and its root hub, does not open: its stick is gone from the
   // tree, though not from the device manager.
   desk.Do({Gadget(u"M1", 2)});
@@ -198,7 +193,6 @@ TEST(Builds, RecordsSharedBetweenTreesLeaveNoLinkBehind) {
   EXPECT_EQ(desk.host.Failures(), 1u);
   NodePtr second = desk.builder.Root();
   const auto removed = desk.builder.GetDeviceList(kRemovedList)->at(0).StaticCast<CZKUMPortDeviceImpl>();
-
   // It opens again. The stick is connected, and was never away for the device manager.
   EXPECT_EQ(desk.Build(), "same");
   desk.Do({Gadget(u"M2", 3)});

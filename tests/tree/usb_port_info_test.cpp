@@ -22,7 +22,6 @@ TEST(ConnectionRecord, BeginsAtZeroAndIsCounted) {
   EXPECT_EQ(ConnectionRecord::LiveCount(), live + 1);
   record->~ConnectionRecord();
   EXPECT_EQ(ConnectionRecord::LiveCount(), live);
-
   ConnectionRecord::KeepForProcessLife(nullptr);
   EXPECT_EQ(ConnectionRecord::KeptCount(), kept);
   // A leak checker that runs at the end of this program must find both of them.
