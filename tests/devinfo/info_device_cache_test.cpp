@@ -11,21 +11,14 @@
 #include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
 #include "platform/wrappers/failing_host.h"
+#include "tests/support/machines.h"
 
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::Device;
-using platform::simulated::SimulatedPc;
-using platform::simulated::Unplug;
+using platform::simulated::Device, platform::simulated::SimulatedPc, platform::simulated::Unplug;
 using platform::wrappers::Operation;
-
-Device Node(std::u16string id, std::u16string parent = {}) {
-  Device device;
-  device.id = std::move(id);
-  device.parent = std::move(parent);
-  return device;
-}
+using testing_support::BareDevice;
 
 template <class Records>
 std::string Ids(const Records& records) {
@@ -86,11 +79,12 @@ class InfoDeviceCacheTest : public testing::Test {
 
 TEST_F(InfoDeviceCacheTest, AdmitsByTheStartOfTheParentId) {
   // A volume is judged by its disk.
-  std::vector<Device> devices = {Node(u"ROOT\\VOLMGR\\0"), Node(u"V\\_??_SCSI#DISK#1#{x}", u"ROOT\\VOLMGR\\0"),
-                                 Node(u"V\\_??_SATA#DISK#1#{x}", u"ROOT\\VOLMGR\\0")};
+  std::vector<Device> devices = {BareDevice(u"ROOT\\VOLMGR\\0"),
+                                 BareDevice(u"V\\_??_SCSI#DISK#1#{x}", u"ROOT\\VOLMGR\\0"),
+                                 BareDevice(u"V\\_??_SATA#DISK#1#{x}", u"ROOT\\VOLMGR\\0")};
   for (const std::u16string parent : {u"USB\\P", u"USBSTOR\\P", u"IUSB\\P", u"SD\\P", u"SDX\\P", u"PCI\\P", u"SCSI\\P",
                                       u"usb\\Q", u"ACPI\\P", u"XUSB\\P", u"ROOT\\P", u"Scsi\\Q"}) {
-    devices.insert(devices.end(), {Node(parent), Node(u"_" + parent, parent)});
+    devices.insert(devices.end(), {BareDevice(parent), BareDevice(u"_" + parent, parent)});
   }
   Start(devices);
   EXPECT_TRUE(Collect());
@@ -100,15 +94,15 @@ TEST_F(InfoDeviceCacheTest, AdmitsByTheStartOfTheParentId) {
 
 // This is meant: what an excluded or a rejected node leaves in the record, the next node shows.
 TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
-  Device excluded = Node(u"USB\\P");
+  Device excluded = BareDevice(u"USB\\P");
   excluded.friendlyName = excluded.location = excluded.enumerator = excluded.manufacturer = u"other";
   excluded.service = u"USBHUB";
   Device rejected = excluded;
   rejected.id = u"ACPI\\VID_1&PID_2\\SERIAL";
   rejected.service.reset();
-  Device node = Node(u"USB\\A", u"USB\\P");
+  Device node = BareDevice(u"USB\\A", u"USB\\P");
   node.manufacturer = u"own";
-  Start({excluded, node, Node(u"USB\\B", u"USB\\P"), rejected, Node(u"USB\\C", u"USB\\P")});
+  Start({excluded, node, BareDevice(u"USB\\B", u"USB\\P"), rejected, BareDevice(u"USB\\C", u"USB\\P")});
   ASSERT_TRUE(Collect());
   for (const auto& [id, texts] : {std::pair{u"USB\\A", u"other|own|other|other||"},
                                   {u"USB\\B", u"|||||"},
@@ -122,9 +116,9 @@ TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
 }
 
 TEST_F(InfoDeviceCacheTest, APresentDeviceKeepsItsRecordAndFirstProperties) {
-  Device node = Node(u"USB\\A", u"USB\\P");
+  Device node = BareDevice(u"USB\\A", u"USB\\P");
   node.description = u"first";
-  Start({Node(u"USB\\P"), node});
+  Start({BareDevice(u"USB\\P"), node});
   EXPECT_TRUE(Collect());
   const InfoDevicePtr record = cache->Current().FindByInstanceId(u"USB\\A");
   ASSERT_TRUE(record);
@@ -148,8 +142,8 @@ TEST_F(InfoDeviceCacheTest, WhatPassesReport) {
   const std::pair<std::vector<Device>, std::vector<Beat>> stories[] = {
       // Held parents return one level per pass. They are in the set of what left and not in its
       // count; of a whole branch that goes at once every node counts.
-      {{Node(u"PCI\\H"), Node(u"USB\\A", u"PCI\\H"), Node(u"USB\\B", u"USB\\A"), Node(u"USB\\C", u"USB\\B"),
-        Node(u"USB\\D", u"USB\\C")},
+      {{BareDevice(u"PCI\\H"), BareDevice(u"USB\\A", u"PCI\\H"), BareDevice(u"USB\\B", u"USB\\A"),
+        BareDevice(u"USB\\C", u"USB\\B"), BareDevice(u"USB\\D", u"USB\\C")},
        {{"changed: USB\\A USB\\B USB\\C USB\\D | USB\\A USB\\B USB\\C USB\\D |  |  | "},
         {"same: USB\\A USB\\B USB\\C USB\\D |  |  |  | "},
         {"changed: USB\\A |  | 1 of USB\\D USB\\C USB\\B | USB\\C USB\\B | ", u"USB\\D"},
@@ -159,7 +153,7 @@ TEST_F(InfoDeviceCacheTest, WhatPassesReport) {
         {"same: USB\\A USB\\B USB\\C USB\\D |  |  |  | "},
         {"changed:  |  | 4 of USB\\A USB\\B USB\\C USB\\D |  | ", u"USB\\A"}}},
       // New devices wait for the tree.
-      {{Node(u"USB\\P"), Node(u"USB\\A", u"USB\\P"), Node(u"USB\\B", u"USB\\P")},
+      {{BareDevice(u"USB\\P"), BareDevice(u"USB\\A", u"USB\\P"), BareDevice(u"USB\\B", u"USB\\P")},
        {{"changed: USB\\A USB\\B | USB\\B |  |  | USB\\A", nullptr, nullptr, nullptr, u"USB\\A"},
         {"same: USB\\A USB\\B |  |  |  | USB\\A", nullptr, nullptr, nullptr, u"USB\\A"},
         {"changed: USB\\A USB\\B | USB\\A |  |  | "},
@@ -169,12 +163,12 @@ TEST_F(InfoDeviceCacheTest, WhatPassesReport) {
     Start(devices);
     for (const Beat& beat : beats) {
       if (beat.gone) Remove(beat.gone);
-      if (beat.came) Add(Node(beat.came, beat.below));
+      if (beat.came) Add(BareDevice(beat.came, beat.below));
       EXPECT_EQ(Pass(beat.hidden), beat.pass);
     }
   }
   // Without a tree nothing new is reported.
-  Add(Node(u"USB\\D", u"USB\\P"));
+  Add(BareDevice(u"USB\\D", u"USB\\P"));
   EXPECT_FALSE(cache->Collect(NodePtr()));
   EXPECT_EQ(Ids(cache->Pending()), "USB\\D");
 }
@@ -187,15 +181,15 @@ TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
     record.ParentInstanceId = parent;
     return record;
   };
-  const Device root = Node(u"USB\\DISK"), other = Node(u"USB\\OTHER");
-  const Device a = Node(u"A", root.id), ofOther = Node(u"B", other.id);
+  const Device root = BareDevice(u"USB\\DISK"), other = BareDevice(u"USB\\OTHER");
+  const Device a = BareDevice(u"A", root.id), ofOther = BareDevice(u"B", other.id);
   const DeviceNodeRecord disk = drive(u"USB\\DISK", u"P");
   // A record made for a drive counts for the drives behind it.
   const std::tuple<std::vector<Device>, std::vector<DeviceNodeRecord>, std::string> cases[] = {
       {{root}, {disk}, "USB\\DISK"},  // no record at all
       {{root, a}, {drive(u"usb\\Disk", u"P")}, "A usb\\Disk"},
       {{root, other, a, ofOther}, {disk}, "A B"},
-      {{root, a, Node(u"C", root.id)}, {drive(u"USB\\X", u"P"), disk}, "A C USB\\DISK"},
+      {{root, a, BareDevice(u"C", root.id)}, {drive(u"USB\\X", u"P"), disk}, "A C USB\\DISK"},
       {{}, {drive(u"D1", u"D2"), drive(u"D2", u"d2"), drive(u"D2", u"D3"), drive(u"D2", u"")}, "D1 D2 D2"}};
   for (const auto& [devices, drives, current] : cases) {
     Start(devices);
@@ -223,7 +217,7 @@ TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
 }
 
 TEST_F(InfoDeviceCacheTest, WithoutAListOfDevicesNothingChanges) {
-  Start({Node(u"USB\\P"), Node(u"USB\\A", u"USB\\P"), Node(u"USB\\B", u"USB\\A")});
+  Start({BareDevice(u"USB\\P"), BareDevice(u"USB\\A", u"USB\\P"), BareDevice(u"USB\\B", u"USB\\A")});
   Pass();
   Remove(u"USB\\B");
   EXPECT_TRUE(Collect());

@@ -2,11 +2,10 @@
 #pragma once
 
 #include "platform/setup_api.h"
-#include "platform/simulated/machine.h"
+#include "tests/support/machines.h"
 
 namespace KelvoUHW {
 
-using platform::simulated::Machine;
 using platform::simulated::Storage;
 using Texts = std::vector<std::u16string>;
 
@@ -16,8 +15,7 @@ inline std::u16string Numbered(const char16_t* text, unsigned number, const char
 }
 
 inline void AddDevice(Machine& machine, const std::u16string& id, const std::u16string& parent) {
-  machine.devices.emplace_back().id = id;
-  machine.devices.back().parent = parent;
+  machine.devices.push_back(testing_support::BareDevice(id, parent));
 }
 
 // What the storage requests answer for a path; deviceType is 0, the number that of a disk.

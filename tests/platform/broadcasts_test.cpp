@@ -9,6 +9,7 @@
 #include "platform/simulated/steps.h"
 #include "tests/platform/stick_pc.h"
 #include "tests/support/launch.h"
+#include "tests/support/machines.h"
 
 namespace platform::simulated {
 namespace {
@@ -74,7 +75,7 @@ TEST(Broadcasts, TellTheDifferenceInTheSystemsOrder) {
   swapped.interfaces[1].path = ToUpper(swapped.interfaces[1].path);
   EXPECT_THAT(Shown(whole, swapped), ElementsAre("-E: medium", "+E: medium"));
   Machine more = whole;
-  more.devices.push_back(MakeDevice(u"USB\\VID_1&PID_2\\3", kHub, u"USB", u"{usb}\\0009"));
+  more.devices.push_back(testing_support::DeviceNode(u"USB\\VID_1&PID_2\\3", kHub, u"USB", u"{usb}\\0009", u""));
   EXPECT_THAT(Shown(whole, more), ElementsAre("*"));
   // A short path leaves the record as long as its fixed part.
   EXPECT_EQ(InterfaceBroadcast(kDBT_DEVICEARRIVAL, {}, u"").record.size(), 32u);

@@ -23,15 +23,6 @@ inline constexpr char16_t kStickVolumeName[] = u"\\\\?\\Volume{3869c27a}\\";
 // The error of a refusal, 0 of a success.
 inline std::uint32_t Error(const Status& status) { return status.ok ? 0 : status.error; }
 
-inline Device MakeDevice(Text id, Text parent, Text deviceClass, Text driver) {
-  Device device;
-  device.id = std::move(id);
-  device.parent = std::move(parent);
-  device.deviceClass = std::move(deviceClass);
-  device.driver = std::move(driver);
-  return device;
-}
-
 inline Machine StickMachine() { return LoadMachine(ZKUSB_SOURCE_DIR "/tests/platform/stick-pc.json"); }
 
 // What comes back with the stick.

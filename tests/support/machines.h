@@ -20,10 +20,15 @@ inline Text HubName(const Text& id) {
   return platform::Replaced(id, u'\\', u'#') + u"#{f18a0e88-c30c-11d0-8815-00a0c906bed8}";
 }
 
-inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceClass, Text driver, Text description) {
+inline platform::simulated::Device BareDevice(Text id, Text parent = {}) {
   platform::simulated::Device device;
   device.id = std::move(id);
   device.parent = std::move(parent);
+  return device;
+}
+
+inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceClass, Text driver, Text description) {
+  platform::simulated::Device device = BareDevice(std::move(id), std::move(parent));
   device.deviceClass = std::move(deviceClass);
   device.classGuid = u"{36fc9e60-c465-11cf-8056-444553540000}";
   device.driver = std::move(driver);

@@ -12,11 +12,8 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::Device;
-using platform::simulated::OpenCounts;
-using platform::simulated::SimulatedPc;
-using platform::wrappers::FailingHost;
-using platform::wrappers::Operation;
+using platform::simulated::Device, platform::simulated::OpenCounts, platform::simulated::SimulatedPc;
+using platform::wrappers::FailingHost, platform::wrappers::Operation;
 using Records = std::vector<DeviceNodeRecord>;
 
 // The changes of a case go to the second device.
@@ -45,16 +42,14 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
       {"a processor", [](Device& d) { d.deviceClass = u"pROCESSOR"; }, "first third "},
       {"a computer", [](Device& d) { d.deviceClass = u"COMPUTER"; }, "first third "},
       {"a class that begins alike", [](Device& d) { d.deviceClass = u"Computers"; }, "first second third "},
-      {"a friendly name of 126 bytes with its zero", [](Device& d) { d.friendlyName = std::u16string(62, u'f'); },
+      {"a friendly name of 126 bytes with its zero", [](Device& d) { d.friendlyName = Text(62, u'f'); },
        "first " + std::string(62, 'f') + " third "},
-      {"a friendly name that is too long", [](Device& d) { d.friendlyName = std::u16string(63, u'f'); },
-       "first second third "},
-      {"both names too long", [](Device& d) { d.friendlyName = d.description = std::u16string(63, u'f'); },
-       "first  third "},
-      {"a class name that is too long", [](Device& d) { d.deviceClass = std::u16string(260, u'c'); }, "first third "},
+      {"a friendly name that is too long", [](Device& d) { d.friendlyName = Text(63, u'f'); }, "first second third "},
+      {"both names too long", [](Device& d) { d.friendlyName = d.description = Text(63, u'f'); }, "first  third "},
+      {"a class name that is too long", [](Device& d) { d.deviceClass = Text(260, u'c'); }, "first third "},
       {"no parent", [](Device& d) { d.noParent = true; }, "", 1},
       {"a processor without parent", [](Device& d) { d.noParent = true, d.deviceClass = u"Processor"; }, "", 1},
-      {"no parent and no class, which is asked first", [](Device& d) { d.noParent = true, d.deviceClass.reset(); },
+      {"no class and no parent, asked last", [](Device& d) { d.noParent = true, d.deviceClass.reset(); },
        "first third "},
       {"no set", [](Device&) {}, "", 0, Operation::GetClassDevs},
       {"no image list", [](Device&) {}, "", 0, Operation::GetClassImageList},
@@ -64,14 +59,13 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
     Machine machine = ThreeDevices();
     c.change(machine.devices[1]);
     SimulatedPc pc(machine);
-    FailingHost host(
-        pc, {.call = c.fails ? 1u : platform::wrappers::FailurePlan::kNever, .onwards = true, .operation = c.fails});
+    const std::uint64_t call = c.fails ? 1 : platform::wrappers::FailurePlan::kNever;
+    FailingHost host(pc, {.call = call, .onwards = true, .operation = c.fails});
     std::string names;
     for (const DeviceNodeRecord& record : ReadDeviceRecords(host)) names += platform::ToUtf8(record.Name) + " ";
     EXPECT_EQ(names, c.names) << c.what;
     EXPECT_EQ(host.Failures() != 0, c.fails.has_value()) << c.what;
-    EXPECT_EQ(pc.Open(), (OpenCounts{.sets = c.setsLeftOpen})) << c.what;
-    EXPECT_TRUE(pc.Misuses().empty()) << c.what;
+    EXPECT_TRUE(pc.Open() == OpenCounts{.sets = c.setsLeftOpen} && pc.Misuses().empty()) << c.what;
   }
 }
 

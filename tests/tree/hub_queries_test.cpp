@@ -13,8 +13,6 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::SimulatedPc;
-using platform::wrappers::LoggingHost;
 using testing::ElementsAre;
 
 Machine TwoPorts() {
@@ -29,18 +27,16 @@ class HubQueries : public testing::Test {
   ~HubQueries() override {
     m_controller.Close();
     m_hub.Close();
-    EXPECT_EQ(m_pc.Open(), platform::simulated::OpenCounts{});
-    EXPECT_THAT(m_pc.Misuses(), testing::IsEmpty());
+    EXPECT_TRUE(m_pc.Open() == platform::simulated::OpenCounts{} && m_pc.Misuses().empty());
   }
   static platform::FileHandle Opened(DeviceFile& file, const std::u16string& path) {
     EXPECT_TRUE(file.Open(path, platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE));
     return file.Get();
   }
-  SimulatedPc m_pc{TwoPorts()};
+  platform::simulated::SimulatedPc m_pc{TwoPorts()};
   ScriptedDriver m_driver{m_pc};
-  LoggingHost m_log{m_driver};
-  DeviceFile m_controller{m_log};
-  DeviceFile m_hub{m_log};
+  platform::wrappers::LoggingHost m_log{m_driver};
+  DeviceFile m_controller{m_log}, m_hub{m_log};
   platform::FileHandle m_hcd = Opened(m_controller, u"\\\\.\\HCD0");
   platform::FileHandle m_root = Opened(m_hub, u"\\\\.\\" + HubName(kRootHubId));
 };
@@ -48,56 +44,37 @@ class HubQueries : public testing::Test {
 constexpr std::uint32_t kGigabyte = 0x40000000;
 
 TEST_F(HubQueries, ADriverThatLiesGivesNoNameOrAShorterOne) {
-  struct Query {
-    const char* what;
-    std::uint32_t code;
-    std::uint32_t head;
-    std::u16string (*ask)(platform::DeviceIo&, platform::FileHandle);
-    bool testsSize = true;
-  };
-  // What the driver answers to the first and to the second request, and what comes of it.
-  struct Case {
-    const char* what;
-    std::uint32_t claimed;   // ActualLength of the first answer
-    std::u16string text;     // of the second answer
-    std::uint32_t received;  // bytes of the second answer; 0: it fails
-    std::size_t requests;
-    const char16_t* name;
-  };
-  const Query queries[] = {
-      {"hcd driver key", platform::kIOCTL_GET_HCD_DRIVERKEY_NAME, 4,
-       [](auto& io, auto handle) { return GetHcdDriverKeyName(io, handle); }},
-      {"root hub", platform::kIOCTL_USB_GET_ROOT_HUB_NAME, 4,
-       [](auto& io, auto handle) { return GetRootHubName(io, handle); }, false},
-      {"connection driver key", platform::kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME, 8,
-       [](auto& io, auto handle) { return GetConnectionDriverKeyName(io, handle, 1); }},
-      {"connection name", platform::kIOCTL_USB_GET_NODE_CONNECTION_NAME, 8,
-       [](auto& io, auto handle) { return GetConnectionName(io, handle, 2); }},
-  };
-  for (const Query& query : queries) {
-    const std::uint32_t head = query.head;
-    const Case cases[] = {
+  using Ask = std::u16string (*)(platform::DeviceIo&, platform::FileHandle);
+  const std::tuple<std::uint32_t, std::uint32_t, Ask> queries[] = {
+      {platform::kIOCTL_GET_HCD_DRIVERKEY_NAME, 4, [](auto& io, auto hcd) { return GetHcdDriverKeyName(io, hcd); }},
+      {platform::kIOCTL_USB_GET_ROOT_HUB_NAME, 4, [](auto& io, auto hcd) { return GetRootHubName(io, hcd); }},
+      {platform::kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME, 8,
+       [](auto& io, auto hub) { return GetConnectionDriverKeyName(io, hub, 1); }},
+      {platform::kIOCTL_USB_GET_NODE_CONNECTION_NAME, 8,
+       [](auto& io, auto hub) { return GetConnectionName(io, hub, 2); }}};
+  for (const auto& [code, head, ask] : queries) {
+    const std::size_t untested = code == platform::kIOCTL_USB_GET_ROOT_HUB_NAME ? 2 : 1;
+    // The length that the first answer claims, the text of the second and the bytes received (0: it
+    // fails); the requests that were made, and the name that comes of them.
+    const std::tuple<const char*, std::uint32_t, Text, std::uint32_t, std::size_t, Text> cases[] = {
         {"nothing at all", 0, u"", 0, 1, u""},
-        {"nothing but the declared character", head + 2, u"", head + 2, query.testsSize ? 1u : 2u, u""},
+        {"nothing but the declared character", head + 2, u"", head + 2, untested, u""},
         {"one character and no zero", head + 4, u"ab", head + 4, 2, u"ab"},
         {"the second request fails", head + 8, u"abc", 0, 2, u""},
         {"fewer bytes than claimed", head + 400, u"abc", head + 6, 2, u"abc"},
         {"an odd number of bytes", head + 7, u"abc", head + 5, 2, u"ab"},
         {"more bytes received than there is room", head + 6, u"abc", 0xFFFFFFFF, 2, u"abc"},
-        {"a zero in the middle", head + 10, std::u16string(u"ab\0cd", 5), head + 10, 2, u"ab"},
+        {"a zero in the middle", head + 10, Text(u"ab\0cd", 5), head + 10, 2, u"ab"},
         {"no more than the head", head + 8, u"abc", head, 2, u""},
-        {"a gigabyte", kGigabyte, u"abc", head + 8, 2, u"abc"},
-    };
-    for (const Case& c : cases) {
+        {"a gigabyte", kGigabyte, u"abc", head + 8, 2, u"abc"}};
+    for (const auto& [what, claimed, text, received, requests, expected] : cases) {
       m_log.Clear();
-      m_driver.Next(query.code, c.claimed == 0 ? RefuseRequest : NameAnswer(head, c.claimed, u"", head + 2));
-      if (c.requests == 2) {
-        m_driver.Next(query.code, c.received == 0 ? RefuseRequest : NameAnswer(head, c.claimed, c.text, c.received));
-      }
-      const std::u16string name = query.ask(m_log, head == 8 ? m_root : m_hcd);
+      m_driver.Next(code, claimed == 0 ? RefuseRequest : NameAnswer(head, claimed, u"", head + 2));
+      if (requests == 2) m_driver.Next(code, received == 0 ? RefuseRequest : NameAnswer(head, claimed, text, received));
+      const Text name = ask(m_log, head == 8 ? m_root : m_hcd);
       // On a machine that grants no gigabyte the name is empty instead.
-      EXPECT_TRUE(name == c.name || (c.claimed == kGigabyte && name.empty())) << query.what << ": " << c.what;
-      EXPECT_EQ(m_log.Log().size(), c.requests) << query.what << ": " << c.what;
+      EXPECT_TRUE(name == expected || (claimed == kGigabyte && name.empty())) << std::hex << code << ": " << what;
+      EXPECT_EQ(m_log.Log().size(), requests) << std::hex << code << ": " << what;
     }
   }
 }

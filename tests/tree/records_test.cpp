@@ -16,23 +16,17 @@ RingPtr<CZKUMUsbTreeNodeImpl> Node(const char16_t* id) {
 }
 
 TEST(Node, BaseLinesAppearOnlyWithTheirValues) {
-  struct Case {
-    const char* what;
-    void (*fill)(CZKUMUsbTreeNodeImpl&);
-    const char* lines;
-  };
-  const Case cases[] = {
+  const std::tuple<const char*, void (*)(CZKUMUsbTreeNodeImpl&), const char*> cases[] = {
       {"nothing", [](auto&) {}, ""},
       {"one id known", [](auto& n) { n.m_nVendorId = 0x1234; }, "> VendorId; productId: 0x1234; 0xFFFFFFFF\r\n"},
       {"names", [](auto& n) { n.m_strVendor = u"SANDISK", n.m_strProduct = u"CRUZER"; },
        "> Vendor; product: SANDISK;CRUZER\r\n"},
       {"handles", [](auto& n) { n.m_devInstHandle = 7, n.m_devInstHandleParent = kUnknownId; },
-       "> devInstHandle        : 7\r\n> devInstHandleParent  : -1\r\n"},
-  };
-  for (const Case& c : cases) {
+       "> devInstHandle        : 7\r\n> devInstHandleParent  : -1\r\n"}};
+  for (const auto& [what, fill, lines] : cases) {
     const auto node = MakeRecord<CZKUMUsbTreeNodeImpl>();
-    c.fill(*node);
-    EXPECT_EQ(DumpOf(*node, u"> "), c.lines + kNoChildren) << c.what;
+    fill(*node);
+    EXPECT_EQ(DumpOf(*node, u"> "), lines + kNoChildren) << what;
   }
 }
 
@@ -43,8 +37,7 @@ TEST(Node, SameNodeComparesAllButTheVendorId) {
       {[](auto& n) { n.m_nProductId = 1; }, false},
       {[](auto& n) { n.m_strProduct = u"x"; }, false},
       {[](auto& n) { n.m_strSerialNumber = u"x"; }, false},
-      {[](auto& n) { n.m_strDeviceDescr = u"x"; }, false},
-  };
+      {[](auto& n) { n.m_strDeviceDescr = u"x"; }, false}};
   for (const auto& [change, same] : cases) {
     const auto parent = Node(u"parent"), first = Node(u"A"), second = Node(u"A");
     change(*second);
@@ -116,8 +109,8 @@ TEST(Node, ADeepChainNeedsNoDeepStackAndIsDumped) {
   HangChainBelow(root.Get(), 500);
   std::string indent;
   for (int i = 1; i < 500; ++i) indent += "- ";
-  EXPECT_NE(DumpOf(*root).find("\r\n" + indent + "DevInstId            : 499\r\nchildvector size0\r\n"),
-            std::string::npos);
+  const std::string last499 = "\r\n" + indent + "DevInstId            : 499\r\nchildvector size0\r\n";
+  EXPECT_NE(DumpOf(*root).find(last499), std::string::npos);
 }
 
 // The golden dumps of whole PCs have ports that work, and ports without device.
@@ -136,32 +129,26 @@ TEST(Records, PortsTellTheirStatusAndHubsAreNamedAfterTheirPaths) {
 }
 
 TEST(Records, HubNamesAndTheRecordThatIsKept) {
-  const std::size_t live = ConnectionRecord::LiveCount();
-  const std::size_t kept = ConnectionRecord::KeptCount();
-  struct Case {
-    std::uint32_t status;
-    const char16_t *description, *leafName;
-  };
-  const Case cases[] = {{1, u"Generic USB Hub", u"[Port3] DeviceConnected :  Generic USB Hub"},
-                        {5, u"", u"[Port3] DeviceNotEnoughPower :  HUB"},
-                        {6, u"", u"[Port3] (unknown) :  HUB"},
-                        {0xFFFFFFFF, u"", u"[Port3] (unknown) :  HUB"}};
-  for (const Case& c : cases) {
+  const std::size_t live = ConnectionRecord::LiveCount(), kept = ConnectionRecord::KeptCount();
+  const std::tuple<std::uint32_t, const char16_t*, const char16_t*> cases[] = {
+      {1, u"Generic USB Hub", u"[Port3] DeviceConnected :  Generic USB Hub"},
+      {5, u"", u"[Port3] DeviceNotEnoughPower :  HUB"},
+      {6, u"", u"[Port3] (unknown) :  HUB"},
+      {0xFFFFFFFF, u"", u"[Port3] (unknown) :  HUB"}};
+  for (const auto& [status, description, leafName] : cases) {
     const auto hub = MakeRecord<CZKUMHubDeviceImpl>();
     hub->SetHubName(u"HUB");
-    EXPECT_EQ(hub->m_strDevInstId, u"");
-    EXPECT_EQ(hub->m_guid, platform::Guid{});
-    EXPECT_EQ(hub->LeafName(), u"HUB");
+    EXPECT_EQ(std::tuple(hub->m_strDevInstId, hub->m_guid, hub->LeafName()), std::tuple(u"", platform::Guid{}, u"HUB"));
     auto record = std::make_unique<ConnectionRecord>();
     record->Info.ConnectionIndex = 3;
-    record->Info.ConnectionStatus = c.status;
+    record->Info.ConnectionStatus = status;
     hub->SetConnectionInfo(std::move(record), nullptr, nullptr);
-    hub->m_strDeviceDescr = c.description;
-    EXPECT_EQ(hub->LeafName(), c.leafName);
+    hub->m_strDeviceDescr = description;
+    EXPECT_EQ(hub->LeafName(), leafName);
   }
   // A hub never frees its connection record.
-  EXPECT_EQ(ConnectionRecord::LiveCount(), live + std::size(cases));
-  EXPECT_EQ(ConnectionRecord::KeptCount(), kept + std::size(cases));
+  EXPECT_EQ(ConnectionRecord::LiveCount() - live, std::size(cases));
+  EXPECT_EQ(ConnectionRecord::KeptCount() - kept, std::size(cases));
 }
 
 }  // namespace

@@ -14,10 +14,9 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::OpenCounts;
-using platform::simulated::SimulatedPc;
-using platform::wrappers::LoggingHost;
-using platform::wrappers::Operation;
+using platform::simulated::OpenCounts, platform::simulated::SimulatedPc;
+using platform::wrappers::LoggingHost, platform::wrappers::Operation;
+using testing::EndsWith, testing::HasSubstr;
 
 std::size_t Count(const NodePtr& root, bool (*counts)(const CZKUMUsbTreeNodeImpl&)) {
   std::size_t count = 0;
@@ -34,9 +33,9 @@ bool IsHub(const CZKUMUsbTreeNodeImpl& node) { return node.m_nType == KUDTHub; }
 Machine Busy() {
   constexpr char16_t kHubId[] = u"USB\\VID_05E3&PID_0610\\2";
   Machine machine = OneController(5);
-  machine.devices.push_back(
-      DeviceNode(u"USB\\VID_046D&PID_C52B\\7", kRootHubId, u"HIDClass", u"{usb}\\0004", u"Mouse"));
-  machine.devices.push_back(DeviceNode(kHubId, kRootHubId, u"USB", u"{usb}\\0005", u"Generic Hub"));
+  machine.devices.insert(machine.devices.end(),
+                         {DeviceNode(u"USB\\VID_046D&PID_C52B\\7", kRootHubId, u"HIDClass", u"{usb}\\0004", u"Mouse"),
+                          DeviceNode(kHubId, kRootHubId, u"USB", u"{usb}\\0005", u"Generic Hub")});
   auto& ports = machine.hubs[0].ports;
   ports[0] = DevicePort(u"{USB}\\0004", 0x046D, 0xC52B);
   ports[0].speed = platform::simulated::Speed::Low;
@@ -71,8 +70,7 @@ TEST(Walk, EveryPortThatAnswersIsInTheTree) {
   CZKUMTopologyWalker walker(pc);
   walker.StartWalk();
   EXPECT_EQ(OutlineOf(walker.m_building), kBusyOutline);
-  EXPECT_EQ(walker.m_nConnectedDevices, 4u);
-  EXPECT_EQ(walker.m_nConnectedHubs, 1u);
+  EXPECT_EQ(std::pair(walker.m_nConnectedDevices, walker.m_nConnectedHubs), std::pair(4u, 1u));
   EXPECT_EQ(pc.Open(), OpenCounts{});
   walker.Commit();
   EXPECT_EQ(walker.m_building, nullptr);
@@ -83,13 +81,11 @@ TEST(Walk, EveryPortThatAnswersIsInTheTree) {
 }
 
 // Every controller and hub is opened for writing, shared for writing, and nothing else.
-class AccessHost final : public ScriptedDriver {
- public:
+struct AccessHost final : ScriptedDriver {
   using ScriptedDriver::ScriptedDriver;
   platform::Status OpenDevice(const char16_t* path, std::uint32_t access, std::uint32_t share,
                               platform::FileHandle& handle) noexcept override {
-    EXPECT_EQ(access, 0x40000000u);
-    EXPECT_EQ(share, 2u);
+    EXPECT_EQ(std::pair(access, share), std::pair(0x40000000u, 2u));
     return ScriptedDriver::OpenDevice(path, access, share, handle);
   }
 };
@@ -116,13 +112,11 @@ TEST(Walk, RequestsOfAPortGoInOrder) {
                                   "DeviceControl #2 0x220420 in 10 out 10\nDeviceControl #2 0x220420 in 30 out 30\n" +
                                   connection));
   // The hub on the last port is opened with the port's hub still open, and closed before it.
-  EXPECT_THAT(requests, testing::HasSubstr("DeviceControl #2 0x220414 in 10 out 10\n"
-                                           "DeviceControl #2 0x220414 in 134 out 134\n"
-                                           "OpenDevice \\\\.\\USB#VID_05E3&PID_0610#2#{" +
-                                           hub + "#3\n"));
-  EXPECT_THAT(requests, testing::HasSubstr("CloseDevice #3\nCloseDevice #2\nCloseDevice #1\n"
-                                           "OpenDevice \\\\.\\HCD1 ! 2\n"));
-  EXPECT_THAT(requests, testing::EndsWith("OpenDevice \\\\.\\HCD9 ! 2\n"));
+  EXPECT_THAT(requests, HasSubstr("DeviceControl #2 0x220414 in 10 out 10\nDeviceControl #2 0x220414 in 134 out 134\n"
+                                  "OpenDevice \\\\.\\USB#VID_05E3&PID_0610#2#{" +
+                                  hub + "#3\n"));
+  EXPECT_THAT(requests, HasSubstr("CloseDevice #3\nCloseDevice #2\nCloseDevice #1\nOpenDevice \\\\.\\HCD1 ! 2\n"));
+  EXPECT_THAT(requests, EndsWith("OpenDevice \\\\.\\HCD9 ! 2\n"));
 }
 
 constexpr char16_t kHcd3[] = u"\\\\.\\HCD3";
@@ -133,35 +127,28 @@ void AddHcd1(Machine& machine, const char16_t* driverKey) {
 Text AddInterface(Machine& machine, const Text& path) {
   return machine.interfaces.emplace_back(platform::simulated::Interface{platform::kNullGuid, path, kControllerId}).path;
 }
+void Name(Machine& machine, const Text& name, bool oneMore = false) {
+  auto& names = machine.hostControllers[0].names;
+  if (!oneMore) names.clear();
+  names.push_back(name);
+}
 void RenameController(Machine& machine, const char16_t* id) { machine.devices[1].id = machine.devices[2].parent = id; }
 
 TEST(Walk, SourcesAndIdentityOfControllers) {
-  struct Case {
-    const char* what;
-    void (*change)(Machine&);
-    std::string controllers;
-  };
   // Device, revision and description are read in this order, and a missing part ends it.
   const std::string id = platform::ToUtf8(kControllerId), complete = " " + id + " 5 'EHCI Controller'";
-  const Case cases[] = {
+  const std::tuple<const char*, void (*)(Machine&), std::string> cases[] = {
       {"none", [](Machine& m) { m.hostControllers.clear(); }, ""},
-      {"a number above nine", [](Machine& m) { m.hostControllers[0].names = {u"\\\\.\\HCD10"}; }, ""},
-      {"two names for one controller",
-       [](Machine& m) {
-         m.hostControllers[0].names = {kHcd3, u"\\\\.\\HCD7"};
-       },
+      {"a number above nine", [](Machine& m) { Name(m, u"\\\\.\\HCD10"); }, ""},
+      {"two names for one controller", [](Machine& m) { Name(m, kHcd3), Name(m, u"\\\\.\\HCD7", true); },
        "\\\\.\\HCD3" + complete},
       {"a second controller with the same driver key in other case", [](Machine& m) { AddHcd1(m, u"{USB}\\0000"); },
        "\\\\.\\HCD0" + complete},
       {"no driver key", [](Machine& m) { m.hostControllers[0].driverKey.reset(); }, ""},
-      {"an interface and a name for one controller",
-       [](Machine& m) { m.hostControllers[0].names.push_back(AddInterface(m, u"\\\\?\\hc")); },
+      {"an interface and a name for one controller", [](Machine& m) { Name(m, AddInterface(m, u"\\\\?\\hc"), true); },
        "\\\\.\\HCD0" + complete},
       {"an interface alone, behind one that leads nowhere",
-       [](Machine& m) {
-         AddInterface(m, u"\\\\?\\gone");
-         m.hostControllers[0].names = {AddInterface(m, u"\\\\?\\hc")};
-       },
+       [](Machine& m) { AddInterface(m, u"\\\\?\\gone"), Name(m, AddInterface(m, u"\\\\?\\hc")); },
        "\\\\?\\hc" + complete},
       {"no device with that driver key", [](Machine& m) { m.devices[1].driver = u"{usb}\\0099"; },
        "\\\\.\\HCD0  0 '' without hub"},
@@ -178,11 +165,10 @@ TEST(Walk, SourcesAndIdentityOfControllers) {
       {"a root hub that does not open", [](Machine& m) { m.hubs.clear(); }, "\\\\.\\HCD0" + complete + " without hub"},
       {"two that fail before their ids are read look the same, and one is in the tree",
        [](Machine& m) { m.hostControllers[0].driverKey = u"{usb}\\0091", AddHcd1(m, u"{usb}\\0092"); },
-       "\\\\.\\HCD0  0 '' without hub"},
-  };
-  for (const Case& c : cases) {
+       "\\\\.\\HCD0  0 '' without hub"}};
+  for (const auto& [what, change, controllers] : cases) {
     Machine machine = OneController(1);
-    c.change(machine);
+    change(machine);
     SimulatedPc pc(machine);
     LoggingHost log(pc);
     CZKUMTopologyWalker walker(log);
@@ -193,67 +179,60 @@ TEST(Walk, SourcesAndIdentityOfControllers) {
       found += platform::ToUtf8(controller.m_strLeafName + u" " + controller.m_strDevInstId) + " " +
                std::to_string(controller.m_nPciRevision) + " '" + platform::ToUtf8(controller.m_strDeviceDescr) + "'" +
                (controller.m_childs.empty() ? " without hub" : "");
-      EXPECT_EQ(controller.m_devInstHandle, controller.m_strDevInstId.empty() ? 0u : 2u) << c.what;
+      EXPECT_EQ(controller.m_devInstHandle, controller.m_strDevInstId.empty() ? 0u : 2u) << what;
       if (controller.m_childs.empty()) continue;
       EXPECT_EQ(controller.m_nPciVendorId << 16 | controller.m_nPciDeviceId, 0x80861C26u);
       EXPECT_EQ(controller.m_nPciSubSysId, 0x1C268086u);
     }
-    EXPECT_EQ(found, c.controllers) << c.what;
-    EXPECT_EQ(pc.Open(), OpenCounts{}) << c.what;
+    EXPECT_EQ(found, controllers) << what;
+    EXPECT_EQ(pc.Open(), OpenCounts{}) << what;
     // The extra detail query of each interface reaches no driver: nothing is opened for it.
     const auto count = [&](const char16_t* call) {
       return std::ranges::count_if(log.Log(), [&](const Text& line) { return line.starts_with(call); });
     };
     const auto interfaces = static_cast<std::ptrdiff_t>(machine.interfaces.size());
-    EXPECT_EQ(count(u"GetDeviceInterfaceDetail"), 2 * interfaces) << c.what;
-    EXPECT_EQ(count(u"OpenDevice \\\\?\\"), interfaces) << c.what;
+    EXPECT_EQ(count(u"GetDeviceInterfaceDetail"), 2 * interfaces) << what;
+    EXPECT_EQ(count(u"OpenDevice \\\\?\\"), interfaces) << what;
   }
 }
 
 // Neither a request that fails nor a hub that does not build costs more than the root hub's port 5.
 TEST(Walk, PortsThatFailCostThemselvesAlone) {
   const std::string noDevice = "...port 5 status 0 USB\\ROOT_HUB20\\4&1 port 5\n";
-  struct Case {
-    const char* what;
-    std::uint32_t code;  // of the request that fails
-    void (*change)(Machine&);
-    std::string outline;  // of port 5
-    std::uint32_t hubs = 1;
-  };
   const auto leave = [](Machine&) {};
-  const Case cases[] = {
+  // The request that fails, the outline of port 5 and the number of hubs.
+  const std::tuple<const char*, std::uint32_t, void (*)(Machine&), std::string, std::uint32_t> cases[] = {
       {"probe", platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX, leave, noDevice, 0},
       {"older request", platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, leave, "", 0},
       {"driver key", platform::kIOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME, leave,
        "...port 5 status 1 USB\\ROOT_HUB20\\4&1 port 5\n....hub USB\\VID_05E3&PID_0610\\2 ''\n"
        ".....port 1 status 0 USB\\VID_05E3&PID_0610\\2 port 1\n.....port 2 status 1 USB\\VID_05E3&PID_0610\\2 port 2\n"
-       "......device  ''  speed 1\n"},
-      {"hub name", platform::kIOCTL_USB_GET_NODE_CONNECTION_NAME, leave, noDevice},
-      {"a hub that does not open", 0, [](Machine& m) { m.hubs.pop_back(); }, noDevice},
-      {"a hub that names one above", 0, [](Machine& m) { m.hubs[0].ports[4].hubName = m.hubs[0].name; }, noDevice},
-  };
-  for (const Case& c : cases) {
+       "......device  ''  speed 1\n",
+       1},
+      {"hub name", platform::kIOCTL_USB_GET_NODE_CONNECTION_NAME, leave, noDevice, 1},
+      {"a hub that does not open", 0, [](Machine& m) { m.hubs.pop_back(); }, noDevice, 1},
+      {"a hub that names one above", 0, [](Machine& m) { m.hubs[0].ports[4].hubName = m.hubs[0].name; }, noDevice, 1}};
+  for (const auto& [what, code, change, outline, hubs] : cases) {
     Machine machine = Busy();
-    c.change(machine);
+    change(machine);
     SimulatedPc pc(machine);
     ScriptedDriver driver(pc);
-    driver.Always(c.code, [](const void* in, void*, std::uint32_t, std::uint32_t&) {
+    driver.Always(code, [](const void* in, void*, std::uint32_t, std::uint32_t&) {
       const std::uint32_t port = *static_cast<const std::uint32_t*>(in);
       return port == 5 ? platform::Status::Failure(31) : platform::Status::Success();
     });
     const std::size_t live = ConnectionRecord::LiveCount();
     CZKUMTopologyWalker walker(driver);
     walker.StartWalk();
-    EXPECT_THAT(
-        OutlineOf(walker.m_building),
-        testing::EndsWith("...port 4 status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  ''  speed 1\n" + c.outline))
-        << c.what;
-    EXPECT_EQ(walker.m_nConnectedHubs, c.hubs) << c.what;
+    EXPECT_THAT(OutlineOf(walker.m_building),
+                EndsWith("...port 4 status 2 USB\\ROOT_HUB20\\4&1 port 4\n....device  ''  speed 1\n" + outline))
+        << what;
+    EXPECT_EQ(walker.m_nConnectedHubs, hubs) << what;
     // A record per port device and hub below a port, not for the root hub; the others are freed, that
     // of a hub without name among them.
     const auto owns = [](const auto& node) { return node.m_nType == KUDTPortDevice || IsHub(node); };
-    EXPECT_EQ(ConnectionRecord::LiveCount() - live, Count(walker.m_building, owns) - 1) << c.what;
-    EXPECT_EQ(pc.Open(), OpenCounts{}) << c.what;
+    EXPECT_EQ(ConnectionRecord::LiveCount() - live, Count(walker.m_building, owns) - 1) << what;
+    EXPECT_EQ(pc.Open(), OpenCounts{}) << what;
   }
 }
 
