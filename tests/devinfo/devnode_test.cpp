@@ -9,8 +9,7 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::DevInst;
-using platform::Status;
+using platform::DevInst, platform::Status;
 using Link = std::optional<DevInst>;
 using Text = std::optional<std::u16string>;
 

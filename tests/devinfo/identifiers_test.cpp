@@ -11,8 +11,7 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::Guid;
-using platform::ToUtf8;
+using platform::Guid, platform::ToUtf8;
 using testing::ElementsAre;
 using Text = const char16_t*;
 

@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/support/outline.h"
+
 namespace KelvoUHW {
 namespace {
 
@@ -37,14 +39,7 @@ TEST(InterfaceDevice, DumpsWhatItHas) {
   EXPECT_EQ(volume.MountPoint(), u"E:\\");
   std::u16string dump = u"before|\r\n";
   volume.ToString(dump, u"> ");
-  EXPECT_EQ(dump,
-            u"before|\r\n>  Interface ++++++++++++++++++++++++++++\r\n> serial number        : 4C53\r\n"
-            u"> Device Properties:\r\n> Device Type         : 0x1F (Unknown Device)\r\n"
-            u"> Device Modifier : 0xab\r\n> Removable Media     : Yes\r\n> Vendor ID           : SanDisk \r\n"
-            u"> Product ID          : Cruzer\r\n> Product Revision    : 1.00\r\n> Serial Number       : 4C53\r\n"
-            u"> DevicePath: \\\\?\\s\r\n> Volume serial number: -2147483648\r\n> MediaSerialNumber  : M-1\r\n"
-            u"> devVolumeName   : \\\\?\\Volume{1}\\\r\n> devMountPoint   : E:\\\r\n"
-            u"> devMountPoint   : C:\\Stick\\\r\nchildvector size0\r\nChildsToString End\r\n");
+  EXPECT_EQ(platform::ToUtf8(dump), Golden("interface-device.txt"));
 }
 
 }  // namespace

@@ -16,8 +16,7 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::Status;
-using platform::simulated::OpenCounts, platform::simulated::SimulatedPc;
+using platform::Status, platform::simulated::OpenCounts, platform::simulated::SimulatedPc;
 using platform::wrappers::Operation;
 using testing::_, testing::Contains, testing::Each, testing::ElementsAre, testing::FieldsAre, testing::Pair;
 

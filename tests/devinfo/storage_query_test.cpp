@@ -12,8 +12,7 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::Status;
-using platform::simulated::SimulatedPc;
+using platform::Status, platform::simulated::SimulatedPc;
 
 // Answers storage requests with given bytes, whatever the buffer's size, and any returned length.
 struct AnsweringHost final : platform::wrappers::InterceptingHost {

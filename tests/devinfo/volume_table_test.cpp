@@ -10,8 +10,7 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::Status;
-using platform::simulated::SimulatedPc;
+using platform::Status, platform::simulated::SimulatedPc;
 
 // Wants `more` characters for path names than it is given (above 1: always that many), and has any
 // drives.

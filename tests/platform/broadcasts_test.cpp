@@ -14,8 +14,7 @@
 namespace platform::simulated {
 namespace {
 
-using testing::ElementsAre;
-using testing::IsEmpty;
+using testing::ElementsAre, testing::IsEmpty;
 
 // "+E:", "-E: medium", "+PATH {class's first number}", "*" for changed nodes; "?" where the record
 // is not as long as it says.

@@ -37,8 +37,7 @@ TEST(MachineFile, RefusesEachMistakeWithItsPlace) {
       {Repeated("[", 100000), Repeated("[0]", 15) + ": is nested too deeply (at most 16 levels)"},
       {R"({"devices": [{"id": ")" + std::string(200, 'A') + R"("}]})", "devices[0].id: is longer than 199 characters"},
       {ports + R"("pipes": [{})" + Repeated(", {}", 30) + "]}]}]}", port + "pipes: has more than 30 entries"},
-      {ports + "}" + Repeated(", {}", 254) + "]}]}", "hubs[0].ports: has more than 255 entries"},
-  };
+      {ports + "}" + Repeated(", {}", 254) + "]}]}", "hubs[0].ports: has more than 255 entries"}};
   for (const auto& [json, error] : kCases) EXPECT_EQ(MachineError(json), "pc.json: " + error) << json.substr(0, 300);
   // The others in a file: the text, a tab, the error.
   std::ifstream file(ZKUSB_SOURCE_DIR "/tests/platform/machine-file-errors.tsv");

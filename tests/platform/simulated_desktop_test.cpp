@@ -13,9 +13,7 @@ namespace platform::simulated {
 namespace {
 
 using namespace testing;  // NOLINT: nothing but matchers
-using testing_support::MakeWindow;
-using testing_support::PumpMessages;
-using testing_support::RegisterWindowClass;
+using testing_support::MakeWindow, testing_support::PumpMessages, testing_support::RegisterWindowClass;
 
 constexpr std::uint32_t kWM_USER = 0x0400;
 

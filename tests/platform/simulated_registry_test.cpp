@@ -9,10 +9,7 @@ namespace platform::simulated {
 namespace {
 
 using testing::ElementsAre;
-using testing_support::ExpectAllClosed;
-using testing_support::Lines;
-using testing_support::LinesOf;
-using testing_support::Put;
+using testing_support::ExpectAllClosed, testing_support::Lines, testing_support::LinesOf, testing_support::Put;
 
 constexpr std::uint32_t kOk = 0, kBadPathname = 161;
 

@@ -1,7 +1,9 @@
-// Records as text: their dumps, and a tree with one line a node.
+// Records as text: their dumps, those that are kept as files, and a tree with one line a node.
 #pragma once
 
 #include <gtest/gtest.h>
+
+#include <fstream>
 
 #include "platform/text.h"
 #include "tree/port_device.h"
@@ -13,6 +15,11 @@ inline std::string DumpOf(const CZKUMUsbTreeNodeImpl& node, const char16_t* inde
   std::u16string out;
   node.ToString(out, indent);
   return platform::ToUtf8(out);
+}
+
+inline std::string Golden(const std::string& name) {
+  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/" + name, std::ios::binary);
+  return {std::istreambuf_iterator<char>(file), {}};
 }
 
 // Depth in dots, kind, what tells the node apart, and where it hangs by its own account.

@@ -12,15 +12,12 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::Status;
-using platform::wrappers::HostCall;
-using platform::wrappers::Operation;
+using platform::Status, platform::wrappers::HostCall, platform::wrappers::Operation;
 
 constexpr std::uint64_t kNoCall = static_cast<std::uint64_t>(-1);
 
 // Fails one call, or that one and all after it, and remembers what failed.
-class FaultyHost final : public platform::wrappers::InterceptingHost {
- public:
+struct FaultyHost final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
   void Arm(std::uint64_t call, bool onwards) {
     m_call = call;
@@ -32,8 +29,6 @@ class FaultyHost final : public platform::wrappers::InterceptingHost {
   std::size_t readingsStopped = 0;
   // Failed requests for a device-information set, by their number in the build.
   std::multiset<std::uint64_t> failedSets;
-
- private:
   Status BeforeCall(const HostCall& call) noexcept override {
     // Only the reading of the device manager uses an image list, and it does so all the time.
     if (call.operation == Operation::GetClassImageList) m_reading = true;
@@ -69,11 +64,9 @@ const Machine& FullPc() {
 std::string Sorted(const std::string& text, char separator) {
   std::multiset<std::string> parts;
   std::istringstream stream(text);
-  for (std::string part; std::getline(stream, part, separator);) {
-    if (!part.starts_with("child ")) parts.insert(part);
-  }
+  for (std::string part; std::getline(stream, part, separator);) parts.insert(part + separator);
   std::string sorted;
-  for (const std::string& part : parts) sorted += part + separator;
+  for (const std::string& part : parts) sorted += part.starts_with("child ") ? "" : part;
   return sorted;
 }
 

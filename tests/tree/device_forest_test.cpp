@@ -53,8 +53,7 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
        "first third "},
       {"no set", [](Device&) {}, "", 0, Operation::GetClassDevs},
       {"no image list", [](Device&) {}, "", 0, Operation::GetClassImageList},
-      {"no image for any", [](Device&) {}, "", 0, Operation::GetClassImageIndex},
-  };
+      {"no image for any", [](Device&) {}, "", 0, Operation::GetClassImageIndex}};
   for (const Case& c : cases) {
     Machine machine = ThreeDevices();
     c.change(machine.devices[1]);
@@ -115,23 +114,21 @@ std::string ToText(const Records& level) {
 }
 
 TEST(DeviceForest, ChainsThatEndInDiskDrives) {
-  const char* const cases[][3] = {
-      {"parents read first", "a- ba d*b", "a(b(d))"},
-      {"children read first", "d*b ba a-", "a(b(d))"},
-      {"branches without disk", "a- ba ca d*c e*a fa", "a(c(d) e)"},
-      {"what lies below a disk", "d*- ed", "d"},
-      {"a disk below a disk", "d*- ed fe g*f hf", "d(e(f(g)))"},
-      {"a USB record goes with its subtree", "a- b!a d*b e*a", "a(e)"},
-      {"at any depth, and its parent stays", "a- ba c!b d*c", "a(b)"},
-      {"one that is a parent of disks at the top stays", "a!- d*a", "a(d)"},
-      {"one that is at the top for want of a parent stays", "b!a d*b", "b(d)"},
-      {"class names in other case", "a- b~a d+b e+a", "a(e)"},
-      {"the top level as read", "x*- a*- m- n*m", "x a m(n)"},
-      {"children that waited, then those read later", "d*p e*p p- f*p", "p(d e f)"},
-      {"its own parent", "aa d*a", "a(d)"},
-      {"a circle of three", "ac ba cb d*b", "c(a(b(d)))"},
-      {"a circle without disk", "ab ba d*x", "d"},
-  };
+  const char* const cases[][3] = {{"parents read first", "a- ba d*b", "a(b(d))"},
+                                  {"children read first", "d*b ba a-", "a(b(d))"},
+                                  {"branches without disk", "a- ba ca d*c e*a fa", "a(c(d) e)"},
+                                  {"what lies below a disk", "d*- ed", "d"},
+                                  {"a disk below a disk", "d*- ed fe g*f hf", "d(e(f(g)))"},
+                                  {"a USB record goes with its subtree", "a- b!a d*b e*a", "a(e)"},
+                                  {"at any depth, and its parent stays", "a- ba c!b d*c", "a(b)"},
+                                  {"one that is a parent of disks at the top stays", "a!- d*a", "a(d)"},
+                                  {"one that is at the top for want of a parent stays", "b!a d*b", "b(d)"},
+                                  {"class names in other case", "a- b~a d+b e+a", "a(e)"},
+                                  {"the top level as read", "x*- a*- m- n*m", "x a m(n)"},
+                                  {"children that waited, then those read later", "d*p e*p p- f*p", "p(d e f)"},
+                                  {"its own parent", "aa d*a", "a(d)"},
+                                  {"a circle of three", "ac ba cb d*b", "c(a(b(d)))"},
+                                  {"a circle without disk", "ab ba d*x", "d"}};
   for (const auto& [what, records, forest] : cases) {
     EXPECT_EQ(ToText(LinkDeviceForest(FromText(records))), forest) << what;
   }
@@ -171,8 +168,7 @@ TEST(ForestNodes, PciDevicesWithTwoLevelsBelow) {
         Record(u"PCI\\C", {Record(u"G")})},
        "controller PCI\\C < of PCI\\C\n.hub H '' < of H\n"
        "..port 0 status 0 D port 0 < of D\n...device D 'name of D' class of D speed 0\n"
-       "..port 0 status 0 E port 0 < of E\n...device E 'name of E' class of E speed 0\n"},
-  };
+       "..port 0 status 0 E port 0 < of E\n...device E 'name of E' class of E speed 0\n"}};
   for (const auto& [what, forest, nodes] : cases) {
     EXPECT_EQ(NodesOf(forest, MakeRecord<CZKUMUsbTreeRootImpl>()), nodes) << what;
   }

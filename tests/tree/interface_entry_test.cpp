@@ -19,8 +19,7 @@ TEST(SplitConfiguration, EndsWithTheBytesOrTheTotalLength) {
       {"no configuration first", {4, 5, 1, 0, 2, 7}, {4, 2}},
       {"length beyond the end", {2, 7, 200, 7, 1}, {2, 3}},
       {"length one", {2, 7, 1, 7, 2, 7}, {2}},
-      {"length zero first", {0, 2, 9, 0}, {}},
-  };
+      {"length zero first", {0, 2, 9, 0}, {}}};
   for (const auto& [Name, Data, Sizes] : cases) {
     std::vector<std::size_t> sizes;
     const std::uint8_t* expected = Data.data();
@@ -49,10 +48,8 @@ TEST(MakeInterfaceEntries, TakesWholeInterfacesAndOwnsThem) {
   ASSERT_EQ(entries.size(), 2u);
   EXPECT_EQ(entries[0]->Descriptor, (Bytes{9, 4, 0, 0, 0, 0, 0, 0, 8}));
   ASSERT_TRUE(entries[0]->String);
-  EXPECT_EQ(entries[0]->String->LanguageID, 0x407);
-  EXPECT_EQ(entries[0]->String->Value, u"x");
-  EXPECT_EQ(entries[1]->Byte(2), 1);
-  EXPECT_EQ(entries[1]->Descriptor.size(), 11u);
+  EXPECT_EQ(std::tuple(entries[0]->String->LanguageID, entries[0]->String->Value), std::tuple(0x407, u"x"));
+  EXPECT_EQ(std::tuple(entries[1]->Byte(2), entries[1]->Descriptor.size()), std::tuple(1, 11u));
   EXPECT_FALSE(entries[1]->String);
 }
 

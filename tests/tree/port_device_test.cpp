@@ -2,8 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <fstream>
-
 #include "tests/support/outline.h"
 #include "tests/support/port_records.h"
 
@@ -66,8 +64,7 @@ TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
                                                       u"USB Mass Storage Device", u"USB\\VID_0781&PID_5580\\AA01");
   EXPECT_EQ(device->NumberInterfaces(), 1);
   ASSERT_EQ(device->m_interfaceDescrs.size(), 1u);
-  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/port-device.txt", std::ios::binary);
-  EXPECT_EQ(DumpOf(*device, u"> "), std::string(std::istreambuf_iterator<char>(file), {}));
+  EXPECT_EQ(DumpOf(*device, u"> "), Golden("port-device.txt"));
 }
 
 }  // namespace

@@ -83,8 +83,7 @@ TEST(Climbing, EndsAtTheNodeBelowAHubPort) {
 // Whether a node is kept, by its name and the children of its parent at that time.
 using Verdict = bool (*)(char16_t name, const std::u16string& siblings);
 
-class AskedNode final : public CZKUMUsbTreeNodeImpl {
- public:
+struct AskedNode final : CZKUMUsbTreeNodeImpl {
   AskedNode(Verdict verdict, std::string& asked, char16_t name) : m_verdict(verdict), m_asked(asked) {
     m_strDevInstId = name;
   }
@@ -95,8 +94,6 @@ class AskedNode final : public CZKUMUsbTreeNodeImpl {
     for (const NodePtr& child : m_pParent ? m_pParent->m_childs : DeviceList{}) siblings += child->m_strDevInstId;
     return m_verdict(m_strDevInstId[0], siblings);
   }
-
- private:
   const Verdict m_verdict;
   std::string& m_asked;
 };
@@ -121,8 +118,7 @@ TEST(PrunePass, AsksParentsFirstAndStartsAListAgain) {
        "RAaBCcdc", "RAaBCc", "RAaBCcd"},
       {"one goes because another went",
        [](char16_t name, Siblings all) { return name != u'B' && (name != u'A' || all.find(u'B') != all.npos); },
-       "RAaBACcd", "RCcd", "RAaB"},
-  };
+       "RAaBACcd", "RCcd", "RAaB"}};
   for (const Case& c : cases) {
     for (const bool prune : {true, false}) {
       std::string asked, left;
@@ -152,10 +148,8 @@ TEST(Merging, JoinsDeviceNodesToPortDevices) {
                            Stick(u"S1", 2, u'E', UsbId(u"HUB"))}) {
     EXPECT_EQ(CarryOut(machine, plug), u"");
   }
-  machine.hubs[0].name = u"USB#OTHER#1#{1}";
-  machine.hostControllers[0].rootHub = machine.hubs[0].name;
-  machine.hubs[1].name = u"USB#OTHER#2#{1}";
-  machine.hubs[0].ports[0].hubName = machine.hubs[1].name;
+  machine.hostControllers[0].rootHub = machine.hubs[0].name = u"USB#OTHER#1#{1}";
+  machine.hubs[0].ports[0].hubName = machine.hubs[1].name = u"USB#OTHER#2#{1}";
   SimulatedPc pc(machine);
   CZKUMUsbTreeBuilder builder(pc);
   ASSERT_TRUE(builder.Build());

@@ -19,12 +19,9 @@ namespace KelvoUHW {
 namespace {
 
 using platform::ToUtf8;
-using testing_support::Gadget;
-using testing_support::Kind;
-using testing_support::RandomPc;
+using testing_support::Gadget, testing_support::Kind, testing_support::RandomPc;
 
-constexpr int kScripts = 500;
-constexpr int kChangesPerScript = 14;
+constexpr int kScripts = 500, kChangesPerScript = 14;
 // The first build meets the last change; then held parents return, one level per build: a slot with
 // the second, its reader with the third.
 constexpr int kBuildsUntilHeldAreBack = 3;
@@ -104,7 +101,7 @@ class Watcher {
  public:
   explicit Watcher(std::uint32_t seed) : m_pc(seed), m_builder(m_pc.Pc()) {}
   RandomPc& Pc() { return m_pc; }
-  int Publications() const { return m_publications; }
+  std::size_t Publications() const { return m_publications; }
   const Ids& Ever() const { return m_ever; }
   void Build() {
     NoteEmptiedSlots();
@@ -138,8 +135,7 @@ class Watcher {
   bool CannotReturn(const Gadget& gadget) const {
     if (!MayBeHeld(gadget)) return false;
     for (std::size_t slot = 0; slot < gadget.disks.size(); ++slot) {
-      const bool empty = gadget.disks[slot].empty();
-      if (!empty || !m_emptied.contains(DiskId(gadget, slot))) return false;
+      if (!gadget.disks[slot].empty() || !m_emptied.contains(DiskId(gadget, slot))) return false;
     }
     return true;
   }
@@ -161,17 +157,14 @@ class Watcher {
   }
   Ids ListOf(DeviceListKind kind) const {
     Ids ids;
-    for (const NodePtr& node : *m_builder.GetDeviceList(kind)) {
-      ids.insert(ToUtf8(node->m_strDevInstId));
-    }
+    for (const NodePtr& node : *m_builder.GetDeviceList(kind)) ids.insert(ToUtf8(node->m_strDevInstId));
     return ids;
   }
   // What was connected, with those that came and without those that left, is connected now; and
   // nothing comes that was connected, or leaves the tree unreported.
   void CheckLists() {
     const Ids before = std::exchange(m_connected, ListOf(kConnectedList));
-    const Ids attached = ListOf(kAttachedList);
-    const Ids removed = ListOf(kRemovedList);
+    const Ids attached = ListOf(kAttachedList), removed = ListOf(kRemovedList);
     Ids expected = before;
     for (const std::string& id : attached) EXPECT_TRUE(expected.insert(id).second) << id;
     for (const std::string& id : removed) expected.erase(id);
@@ -206,19 +199,16 @@ class Watcher {
   RandomPc m_pc;
   CZKUMUsbTreeBuilder m_builder;
   Picture m_shown;  // by the last publication
-  Ids m_connected;
-  Ids m_ever;
-  Ids m_lostACard;
+  Ids m_connected, m_ever, m_lostACard;
   std::set<std::u16string> m_emptied;
   std::map<std::u16string, std::u16string> m_cards;  // by slot, as the last build met them
-  int m_publications = 0;
+  std::size_t m_publications = 0;
 };
 
 TEST(RandomScripts, PublishWhatIsThereAndReportWhatChanged) {
   const std::uint32_t firstSeed = FirstSeed();
   std::cout << "ZKUSB_RANDOM_SEED=" << firstSeed << '\n';
-  int publications = 0;
-  std::size_t devices = 0;
+  std::size_t publications = 0, devices = 0;
   for (std::uint32_t seed = firstSeed; seed < firstSeed + kScripts; ++seed) {
     Watcher watcher(seed);
     for (int i = 0; i < kChangesPerScript; ++i) {
@@ -232,7 +222,7 @@ TEST(RandomScripts, PublishWhatIsThereAndReportWhatChanged) {
     ASSERT_FALSE(HasFailure()) << "seed " << seed << ":" << watcher.Pc().Script();
   }
   std::cout << publications << " publications, " << devices << " devices\n";
-  EXPECT_GE(publications, 1200);
+  EXPECT_GE(publications, 1200u);
   EXPECT_GE(devices, 1000u);
 }
 

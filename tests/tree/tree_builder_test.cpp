@@ -10,10 +10,8 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::Dismount;
-using platform::simulated::Mount;
-using testing::HasSubstr;
-using testing::Not;
+using platform::simulated::Dismount, platform::simulated::Mount;
+using testing::HasSubstr, testing::Not;
 
 Change Out(const Text& id) { return Unplug{id}; }
 Change NodeOnly(const Text& serial, const Text& parent = kRootHubId) {
@@ -127,8 +125,7 @@ TEST(Builds, WhatComesAndGoes) {
         {{Gadget(u"M2", 3)}, "M1 K1 M2 | M2 | - | -"},
         {{NodeOnly(u"K2")}, "M1 K1 M2 K2 | K2 | ? | -"}},
        {Gadget(u"M1", 1)},
-       "M1 | M1 | - | -"},
-  };
+       "M1 | M1 | - | -"}};
   for (const Story& story : stories) {
     SCOPED_TRACE(story.what);
     BuildDesk desk(BarePc(story.hubService), story.devices);

@@ -31,14 +31,12 @@ TEST(ConnectionRecord, BeginsAtZeroAndIsCounted) {
 }
 
 TEST(StringDescriptor, TextEndsWithItsLengthOrTheBytes) {
-  const std::pair<std::vector<std::uint8_t>, std::u16string_view> cases[] = {
-      {{}, u""},
-      {{6}, u""},
-      {{3, 3, 'A', 0}, u""},
-      {{5, 3, 'A', 0, 'B', 0}, u"A"},
-      {{6, 3, 0x34, 0x12, 'B', 0}, u"\u1234B"},
-      {{200, 3, 'A', 0, 'B'}, u"A"},
-  };
+  const std::pair<std::vector<std::uint8_t>, std::u16string_view> cases[] = {{{}, u""},
+                                                                             {{6}, u""},
+                                                                             {{3, 3, 'A', 0}, u""},
+                                                                             {{5, 3, 'A', 0, 'B', 0}, u"A"},
+                                                                             {{6, 3, 0x34, 0x12, 'B', 0}, u"\u1234B"},
+                                                                             {{200, 3, 'A', 0, 'B'}, u"A"}};
   for (const auto& [bytes, text] : cases) {
     StringDescriptorNode node;
     node.StringDescriptor = bytes;
