@@ -8,15 +8,9 @@
 
 namespace testing_support {
 
-enum class Kind : std::uint8_t {
-  Mouse,
-  Keyboard,
-  Stick,  // one disk with one volume or two
-  Composite,
-  Unreported,  // its service is one that is never reported
-  Hub,
-  CardReader,  // a disk for each slot, a volume for each card
-};
+// A stick has one disk with one volume or two, a card reader a disk for each slot and a volume for each card; the
+// service of what is unreported is one that is never reported.
+enum class Kind : std::uint8_t { Mouse, Keyboard, Stick, Composite, Unreported, Hub, CardReader };
 inline constexpr std::uint32_t kKinds = 7;
 
 struct Gadget {
