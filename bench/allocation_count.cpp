@@ -2,7 +2,7 @@
 
 #include <new>
 
-#include "tests/support/heap.h"
+#include "platform/heap.h"
 
 namespace {
 

@@ -2,7 +2,7 @@
 
 #include <new>
 
-#include "tests/support/heap.h"
+#include "platform/heap.h"
 
 // Allocations until the one that fails; 0: none fails.
 static thread_local std::uint64_t t_countdown = 0;

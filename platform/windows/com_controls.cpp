@@ -1,12 +1,14 @@
-// Takes the place of entries in the import table of the program that links it: a slot that is defined here is not taken
-// from the system's import library. Calls of the system's DLLs among themselves do not come here.
+// Takes the place of entries in the import table of the program that links it: a slot that is
+// defined here is not taken from the system's import library. Calls of the system's DLLs among
+// themselves do not come here.
 #include "platform/com_controls.h"
 
 #include <atomic>
 #include <optional>
 #include <utility>
 
-// The symbol that calls of an imported function go through; on 32 bits its name ends with the bytes of its parameters.
+// The symbol that calls of an imported function go through; on 32 bits its name ends with the bytes
+// of its parameters.
 #ifdef _WIN64
 #define IMPORT_SLOT(name, bytes) "__imp_" #name
 #else
@@ -15,7 +17,8 @@
 
 namespace {
 
-// The system's own function, looked up at the first call, which may come before anything of this file is constructed.
+// The system's own function, looked up at the first call, which may come before anything of this
+// file is constructed.
 template <class Function>
 class Real {
  public:
@@ -25,7 +28,8 @@ class Real {
   auto operator()(Args... args) noexcept {
     Function* function = m_function;
     if (function == nullptr) {
-      function = reinterpret_cast<Function*>(reinterpret_cast<void*>(GetProcAddress(LoadLibraryW(m_dll), m_name)));
+      function = reinterpret_cast<Function*>(
+          reinterpret_cast<void*>(GetProcAddress(LoadLibraryW(m_dll), m_name)));
       m_function = function;
     }
     return function(args...);
@@ -38,7 +42,8 @@ class Real {
 };
 
 constinit Real<decltype(SysAllocString)> g_sysAllocString(L"oleaut32.dll", "SysAllocString");
-constinit Real<decltype(SysAllocStringLen)> g_sysAllocStringLen(L"oleaut32.dll", "SysAllocStringLen");
+constinit Real<decltype(SysAllocStringLen)> g_sysAllocStringLen(L"oleaut32.dll",
+                                                                "SysAllocStringLen");
 constinit Real<decltype(SysFreeString)> g_sysFreeString(L"oleaut32.dll", "SysFreeString");
 constinit Real<decltype(VariantClear)> g_variantClear(L"oleaut32.dll", "VariantClear");
 constinit Real<decltype(VariantCopy)> g_variantCopy(L"oleaut32.dll", "VariantCopy");
@@ -61,13 +66,17 @@ struct Orders {
 };
 constinit thread_local Orders t_orders;
 
-bool TextFails() noexcept { return t_orders.failingText != 0 && ++t_orders.textsSeen == t_orders.failingText; }
+bool TextFails() noexcept {
+  return t_orders.failingText != 0 && ++t_orders.textsSeen == t_orders.failingText;
+}
 void CountText(bool allocated) noexcept {
   if (!allocated) return;
   ++g_alive;
   ++g_allocated;
 }
-bool HoldsText(const VARIANT& variant) noexcept { return variant.vt == VT_BSTR && variant.bstrVal != nullptr; }
+bool HoldsText(const VARIANT& variant) noexcept {
+  return variant.vt == VT_BSTR && variant.bstrVal != nullptr;
+}
 
 BSTR WINAPI AllocString(const OLECHAR* text) noexcept {
   if (TextFails()) return nullptr;
@@ -127,14 +136,18 @@ BOOL WINAPI InitializeSection(CRITICAL_SECTION* section, DWORD spins) noexcept {
 }  // namespace
 
 extern "C" {
-const void* g_slotAllocString asm(IMPORT_SLOT(SysAllocString, 4)) = reinterpret_cast<const void*>(&AllocString);
-const void* g_slotAllocStringLen asm(IMPORT_SLOT(SysAllocStringLen,
-                                                 8)) = reinterpret_cast<const void*>(&AllocStringLen);
-const void* g_slotFreeString asm(IMPORT_SLOT(SysFreeString, 4)) = reinterpret_cast<const void*>(&FreeString);
+const void* g_slotAllocString asm(IMPORT_SLOT(SysAllocString,
+                                              4)) = reinterpret_cast<const void*>(&AllocString);
+const void* g_slotAllocStringLen asm(IMPORT_SLOT(SysAllocStringLen, 8)) =
+    reinterpret_cast<const void*>(&AllocStringLen);
+const void* g_slotFreeString asm(IMPORT_SLOT(SysFreeString,
+                                             4)) = reinterpret_cast<const void*>(&FreeString);
 const void* g_slotClear asm(IMPORT_SLOT(VariantClear, 4)) = reinterpret_cast<const void*>(&Clear);
 const void* g_slotCopy asm(IMPORT_SLOT(VariantCopy, 8)) = reinterpret_cast<const void*>(&Copy);
-const void* g_slotEnter asm(IMPORT_SLOT(CoInitializeEx, 8)) = reinterpret_cast<const void*>(&EnterApartment);
-const void* g_slotLeave asm(IMPORT_SLOT(CoUninitialize, 0)) = reinterpret_cast<const void*>(&LeaveApartment);
+const void* g_slotEnter asm(IMPORT_SLOT(CoInitializeEx,
+                                        8)) = reinterpret_cast<const void*>(&EnterApartment);
+const void* g_slotLeave asm(IMPORT_SLOT(CoUninitialize,
+                                        0)) = reinterpret_cast<const void*>(&LeaveApartment);
 const void* g_slotSection asm(IMPORT_SLOT(InitializeCriticalSectionAndSpinCount,
                                           8)) = reinterpret_cast<const void*>(&InitializeSection);
 }

@@ -9,8 +9,8 @@
 namespace heap {
 
 #ifdef _WIN32
-// The heap of Wine looks through all its free blocks at each call, which makes minutes of the seconds
-// that large PCs take. Here blocks of one size share a list, and are never given back.
+// The heap of Wine looks through all its free blocks at each call, which makes minutes of the
+// seconds that large PCs take. Here blocks of one size share a list, and are never given back.
 void* Take(std::size_t bytes) noexcept;
 void Give(void* memory) noexcept;
 #else

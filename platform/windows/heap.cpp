@@ -1,4 +1,4 @@
-#include "tests/support/heap.h"
+#include "platform/heap.h"
 
 #include <array>
 #include <new>
@@ -40,7 +40,8 @@ void* Take(std::size_t bytes) noexcept {
   const std::size_t sizeClass = bytes == 0 ? 1 : (bytes + kStep - 1) / kStep;
   Head* head = nullptr;
   if (sizeClass >= kClasses) {
-    head = bytes > SIZE_MAX - sizeof(Head) ? nullptr : static_cast<Head*>(std::malloc(sizeof(Head) + bytes));
+    head = bytes > SIZE_MAX - sizeof(Head) ? nullptr
+                                           : static_cast<Head*>(std::malloc(sizeof(Head) + bytes));
     if (head != nullptr) head->sizeClass = 0;
   } else {
     g_lock.lock();
