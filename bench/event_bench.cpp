@@ -17,6 +17,7 @@
 #include <stdexcept>
 #include <vector>
 
+#include "bench/plugs.h"
 #include "com/com_ptr.h"
 #include "com/private_interfaces.h"
 #include "com/zkusb_monitor.h"
@@ -26,7 +27,6 @@
 #include "platform/simulated/simulated_desktop.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/system.h"
-#include "tests/support/plugs.h"
 
 namespace {
 

@@ -4,10 +4,10 @@
 #include <string>
 
 #include "bench/allocation_count.h"
+#include "bench/object_reader.h"
 #include "com/usb_tree.h"
 #include "platform/com_controls.h"
 #include "platform/system.h"
-#include "tests/support/object_reader.h"
 
 namespace bench {
 

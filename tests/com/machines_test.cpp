@@ -2,12 +2,12 @@
 #include <filesystem>
 #include <set>
 
+#include "bench/object_reader.h"
 #include "devinfo/info_device.h"
 #include "devinfo/interface_device.h"
 #include "platform/simulated/machine_file.h"
 #include "platform/text.h"
 #include "platform/usb_ioctl.h"
-#include "tests/support/object_reader.h"
 #include "tests/support/tree_desk.h"
 #include "tree/port_device.h"
 #include "tree/records.h"

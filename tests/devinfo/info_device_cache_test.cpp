@@ -6,12 +6,12 @@
 #include <array>
 #include <random>
 
+#include "bench/small_pcs.h"
 #include "devinfo/devnode.h"
 #include "devinfo/info_device_linking.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
 #include "platform/wrappers/failing_host.h"
-#include "tests/support/machines.h"
 
 namespace KelvoUHW {
 namespace {

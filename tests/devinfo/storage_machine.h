@@ -1,8 +1,8 @@
 // Parts of a simulated PC that tests of the storage side are built from.
 #pragma once
 
+#include "bench/small_pcs.h"
 #include "platform/setup_api.h"
-#include "tests/support/machines.h"
 
 namespace KelvoUHW {
 

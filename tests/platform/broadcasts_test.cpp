@@ -4,12 +4,12 @@
 
 #include <cstring>
 
+#include "bench/small_pcs.h"
 #include "platform/simulated/machine_file.h"
 #include "platform/simulated/play_step.h"
 #include "platform/simulated/steps.h"
 #include "tests/platform/stick_pc.h"
 #include "tests/support/launch.h"
-#include "tests/support/machines.h"
 
 namespace platform::simulated {
 namespace {

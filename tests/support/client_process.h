@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include "bench/plugs.h"
 #include "com/com_ptr.h"
 #include "com/zkusb_monitor.h"
 #include "module/type_library.h"
@@ -13,7 +14,6 @@
 #include "platform/simulated/simulated_pc.h"
 #include "platform/simulated/type_libraries.h"
 #include "platform/system.h"
-#include "tests/support/plugs.h"
 
 namespace KelvoUHW {
 

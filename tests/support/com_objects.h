@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "bench/object_reader.h"
 #include "com/com_error.h"
 #include "com/com_ptr.h"
 #include "com/module_lock.h"
@@ -20,7 +21,6 @@
 #include "devinfo/interface_device.h"
 #include "platform/com_controls.h"
 #include "platform/text.h"
-#include "tests/support/object_reader.h"
 #include "tree/port_device.h"
 #include "tree/records.h"
 

@@ -3,8 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include "bench/plugs.h"
 #include "platform/simulated/simulated_pc.h"
-#include "tests/support/plugs.h"
 #include "tree/tree_builder.h"
 
 namespace KelvoUHW {

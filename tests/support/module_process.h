@@ -5,11 +5,11 @@
 
 #include <optional>
 
+#include "bench/plugs.h"
 #include "module/module.h"
 #include "platform/simulated/simulated_pc.h"
 #include "tests/support/com_objects.h"
 #include "tests/support/monitor_process.h"
-#include "tests/support/plugs.h"
 
 namespace KelvoUHW {
 

@@ -4,9 +4,9 @@
 #include <stdexcept>
 #include <utility>
 
+#include "bench/plugs.h"
 #include "platform/setup_api.h"
 #include "platform/text.h"
-#include "tests/support/plugs.h"
 
 namespace testing_support {
 namespace {

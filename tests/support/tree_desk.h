@@ -5,13 +5,13 @@
 
 #include <utility>
 
+#include "bench/object_reader.h"
 #include "com/module_lock.h"
 #include "com/usb_tree.h"
 #include "platform/com_controls.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/system.h"
 #include "tests/support/failing_memory.h"
-#include "tests/support/object_reader.h"
 
 namespace KelvoUHW {
 

@@ -4,9 +4,9 @@
 
 #include <sstream>
 
+#include "bench/small_pcs.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/failing_host.h"
-#include "tests/support/machines.h"
 #include "tests/support/outline.h"
 
 namespace KelvoUHW {

@@ -4,10 +4,10 @@
 
 #include <array>
 
+#include "bench/small_pcs.h"
 #include "devinfo/device_set.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/logging_host.h"
-#include "tests/support/machines.h"
 #include "tests/support/scripted_driver.h"
 
 namespace KelvoUHW {

@@ -8,9 +8,9 @@
 #include <map>
 #include <set>
 
+#include "bench/small_pcs.h"
 #include "devinfo/interface_device.h"
 #include "platform/text.h"
-#include "tests/support/machines.h"
 #include "tests/support/random_pc.h"
 #include "tree/records.h"
 #include "tree/tree_builder.h"

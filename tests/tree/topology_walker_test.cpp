@@ -4,10 +4,10 @@
 
 #include <algorithm>
 
+#include "bench/small_pcs.h"
 #include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/logging_host.h"
-#include "tests/support/machines.h"
 #include "tests/support/outline.h"
 #include "tests/support/scripted_driver.h"
 

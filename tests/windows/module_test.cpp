@@ -15,6 +15,7 @@
 #include <nlohmann/json.hpp>
 #include <thread>
 
+#include "bench/object_reader.h"
 #include "com/com_ptr.h"
 #include "com/private_interfaces.h"
 #include "com/zkusb_monitor.h"
@@ -23,7 +24,6 @@
 #include "platform/system.h"
 #include "platform/text.h"
 #include "platform/windows/server_classes.h"
-#include "tests/support/object_reader.h"
 #include "tests/windows/module_files.h"
 #include "tools/zkusb/event_sink.h"
 

@@ -20,7 +20,8 @@ namespace testing_support {
 using KelvoUHW::ComPtr;
 using KelvoUHW::Variant;
 
-// Calls visit(result of GetCurrent, node) for each element of a list; the node is empty where the call failed.
+// Calls visit(result of GetCurrent, node) for each element of a list; the node is empty where the
+// call failed.
 template <class Visit>
 void ForEachNode(IZKUMUsbTreeNodeEnumerator& nodes, Visit visit) {
   VARIANT_BOOL more = VARIANT_FALSE;
@@ -31,10 +32,11 @@ void ForEachNode(IZKUMUsbTreeNodeEnumerator& nodes, Visit visit) {
   }
 }
 
-// Calls visit(name, result, value) for the properties of an object: a name, its getter, the next name, its getter, ...
+// Calls visit(name, result, value) for the properties of an object: a name, its getter, the next
+// name, its getter, ...
 template <class Visit, class Interface, class Value, class... More>
-void ReadAll(Interface& object, Visit& visit, const char* name, HRESULT (STDMETHODCALLTYPE Interface::*get)(Value*),
-             More... more) {
+void ReadAll(Interface& object, Visit& visit, const char* name,
+             HRESULT (STDMETHODCALLTYPE Interface::*get)(Value*), More... more) {
   Value value{};
   const HRESULT result = (object.*get)(&value);
   if constexpr (std::is_same_v<Value, BSTR>) {
@@ -48,34 +50,41 @@ void ReadAll(Interface& object, Visit& visit, const char* name, HRESULT (STDMETH
 
 // Calls visit(element) for each VARIANT of a collection; the result is that of making it.
 template <class Interface, class Visit>
-HRESULT ForEachElement(Interface& object, HRESULT (STDMETHODCALLTYPE Interface::*get)(IEnumVARIANT**), Visit visit) {
+HRESULT ForEachElement(Interface& object,
+                       HRESULT (STDMETHODCALLTYPE Interface::*get)(IEnumVARIANT**), Visit visit) {
   ComPtr<IEnumVARIANT> collection;
   const HRESULT result = (object.*get)(collection.Put());
   if (!collection) return result;
-  for (Variant element; collection->Next(1, &element, nullptr) == S_OK; VariantClear(&element)) visit(element);
+  for (Variant element; collection->Next(1, &element, nullptr) == S_OK; VariantClear(&element))
+    visit(element);
   return result;
 }
 
 template <class Visit>
 void ReadInfo(IZKUMInfoDevice& info, Visit& visit) {
-  ReadAll(info, visit, "Service", &IZKUMInfoDevice::get_Service, "FriendlyName", &IZKUMInfoDevice::get_FriendlyName,
-          "Location", &IZKUMInfoDevice::get_Location, "Manufacturer", &IZKUMInfoDevice::get_Manufacturer, "HardwareId",
-          &IZKUMInfoDevice::get_HardwareId, "PhysicalName", &IZKUMInfoDevice::get_PhysicalName, "DevClass",
-          &IZKUMInfoDevice::get_DevClass, "EnumName", &IZKUMInfoDevice::get_EnumName);
+  ReadAll(info, visit, "Service", &IZKUMInfoDevice::get_Service, "FriendlyName",
+          &IZKUMInfoDevice::get_FriendlyName, "Location", &IZKUMInfoDevice::get_Location,
+          "Manufacturer", &IZKUMInfoDevice::get_Manufacturer, "HardwareId",
+          &IZKUMInfoDevice::get_HardwareId, "PhysicalName", &IZKUMInfoDevice::get_PhysicalName,
+          "DevClass", &IZKUMInfoDevice::get_DevClass, "EnumName", &IZKUMInfoDevice::get_EnumName);
   GUID guid{};
   const HRESULT result = info.get_ClassGuid(&guid);
-  visit("ClassGuid", result, std::u16string_view(platform::GuidText(platform::FromSystemGuid(guid))));
+  visit("ClassGuid", result,
+        std::u16string_view(platform::GuidText(platform::FromSystemGuid(guid))));
 }
 
 template <class Visit>
 void ReadPortDevice(IZKUMPortDevice& device, Visit& visit) {
-  ReadAll(device, visit, "Product", &IZKUMPortDevice::get_Product, "Manufacturer1", &IZKUMPortDevice::get_Manufacturer1,
-          "Speed", &IZKUMPortDevice::get_Speed, "NumberInterfaces", &IZKUMPortDevice::get_NumberInterfaces);
-  const HRESULT result =
-      ForEachElement(device, &IZKUMPortDevice::get_InterfaceDescriptors, [&](const Variant& element) {
-        const auto descriptor = ComPtr<IUnknown>(element.punkVal).template As<IZKUMInterfaceDescr>();
-        ReadAll(*descriptor.Get(), visit, "InterfaceClass", &IZKUMInterfaceDescr::get_InterfaceClass,
-                "InterfaceSubClass", &IZKUMInterfaceDescr::get_InterfaceSubClass, "InterfaceProtocol",
+  ReadAll(device, visit, "Product", &IZKUMPortDevice::get_Product, "Manufacturer1",
+          &IZKUMPortDevice::get_Manufacturer1, "Speed", &IZKUMPortDevice::get_Speed,
+          "NumberInterfaces", &IZKUMPortDevice::get_NumberInterfaces);
+  const HRESULT result = ForEachElement(
+      device, &IZKUMPortDevice::get_InterfaceDescriptors, [&](const Variant& element) {
+        const auto descriptor =
+            ComPtr<IUnknown>(element.punkVal).template As<IZKUMInterfaceDescr>();
+        ReadAll(*descriptor.Get(), visit, "InterfaceClass",
+                &IZKUMInterfaceDescr::get_InterfaceClass, "InterfaceSubClass",
+                &IZKUMInterfaceDescr::get_InterfaceSubClass, "InterfaceProtocol",
                 &IZKUMInterfaceDescr::get_InterfaceProtocol);
       });
   visit("InterfaceDescriptors", result, std::u16string_view());
@@ -84,24 +93,29 @@ void ReadPortDevice(IZKUMPortDevice& device, Visit& visit) {
 template <class Visit>
 void ReadInterfaceDevice(IZKUMInterfaceDevice& device, Visit& visit) {
   ReadAll(device, visit, "VolumeName", &IZKUMInterfaceDevice::get_VolumeName, "VendorId",
-          &IZKUMInterfaceDevice::get_VendorId, "ProductId", &IZKUMInterfaceDevice::get_ProductId, "ProductRev",
-          &IZKUMInterfaceDevice::get_ProductRev, "DevicePath", &IZKUMInterfaceDevice::get_DevicePath, "MountPoint",
+          &IZKUMInterfaceDevice::get_VendorId, "ProductId", &IZKUMInterfaceDevice::get_ProductId,
+          "ProductRev", &IZKUMInterfaceDevice::get_ProductRev, "DevicePath",
+          &IZKUMInterfaceDevice::get_DevicePath, "MountPoint",
           &IZKUMInterfaceDevice::get_MountPoint);
-  const HRESULT result = ForEachElement(device, &IZKUMInterfaceDevice::get_MountPoints, [&](const Variant& element) {
-    visit("one of MountPoints", S_OK, platform::BstrText(element.bstrVal));
-  });
+  const HRESULT result =
+      ForEachElement(device, &IZKUMInterfaceDevice::get_MountPoints, [&](const Variant& element) {
+        visit("one of MountPoints", S_OK, platform::BstrText(element.bstrVal));
+      });
   visit("MountPoints", result, std::u16string_view());
 }
 
-// The same for each interface of the node, but for what leads to other nodes and ToString. A value is text or number.
+// The same for each interface of the node, but for what leads to other nodes and ToString. A value
+// is text or number.
 template <class Visit>
 void ReadProperties(const ComPtr<IZKUMUsbTreeNode>& node, Visit visit) {
-  ReadAll(*node.Get(), visit, "InstanceId", &IZKUMUsbTreeNode::get_InstanceId, "Type", &IZKUMUsbTreeNode::get_Type);
+  ReadAll(*node.Get(), visit, "InstanceId", &IZKUMUsbTreeNode::get_InstanceId, "Type",
+          &IZKUMUsbTreeNode::get_Type);
   if (const auto device = node.As<IZKUMUsbDevice>()) {
     ReadAll(*device.Get(), visit, "Description", &IZKUMUsbDevice::get_Description, "SerialNumber",
-            &IZKUMUsbDevice::get_SerialNumber, "VendorId", &IZKUMUsbDevice::get_VendorId, "ProductId",
-            &IZKUMUsbDevice::get_ProductId, "DriverKeyName", &IZKUMUsbDevice::get_DriverKeyName, "Vendor",
-            &IZKUMUsbDevice::get_Vendor, "Product", &IZKUMUsbDevice::get_Product);
+            &IZKUMUsbDevice::get_SerialNumber, "VendorId", &IZKUMUsbDevice::get_VendorId,
+            "ProductId", &IZKUMUsbDevice::get_ProductId, "DriverKeyName",
+            &IZKUMUsbDevice::get_DriverKeyName, "Vendor", &IZKUMUsbDevice::get_Vendor, "Product",
+            &IZKUMUsbDevice::get_Product);
   }
   if (const auto controller = node.As<IZKUMHostController>()) {
     ReadAll(*controller.Get(), visit, "LeafName", &IZKUMHostController::get_LeafName);
@@ -115,10 +129,12 @@ void ReadProperties(const ComPtr<IZKUMUsbTreeNode>& node, Visit visit) {
   }
   if (const auto device = node.As<IZKUMPortDevice>()) ReadPortDevice(*device.Get(), visit);
   if (const auto info = node.As<IZKUMInfoDevice>()) ReadInfo(*info.Get(), visit);
-  if (const auto device = node.As<IZKUMInterfaceDevice>()) ReadInterfaceDevice(*device.Get(), visit);
+  if (const auto device = node.As<IZKUMInterfaceDevice>())
+    ReadInterfaceDevice(*device.Get(), visit);
 }
 
-// Calls visit(node) for a subtree, parents first; returns the number of nodes. A list that cannot be had ends a branch.
+// Calls visit(node) for a subtree, parents first; returns the number of nodes. A list that cannot
+// be had ends a branch.
 template <class Visit>
 std::size_t WalkChilds(const ComPtr<IZKUMUsbTreeNode>& root, Visit visit) {
   std::vector<ComPtr<IZKUMUsbTreeNode>> waiting{root};

@@ -1,4 +1,4 @@
-// Small PCs for tests.
+// Small PCs, for benchmarks and tests that need one without a file.
 #pragma once
 
 #include <cstdint>
@@ -13,7 +13,8 @@ namespace testing_support {
 using platform::simulated::Machine;
 using platform::simulated::Text;
 
-inline constexpr char16_t kControllerId[] = u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086&REV_05\\3&11583659&0&E8";
+inline constexpr char16_t kControllerId[] =
+    u"PCI\\VEN_8086&DEV_1C26&SUBSYS_1C268086&REV_05\\3&11583659&0&E8";
 inline constexpr char16_t kRootHubId[] = u"USB\\ROOT_HUB20\\4&1";
 
 inline Text HubName(const Text& id) {
@@ -27,7 +28,8 @@ inline platform::simulated::Device BareDevice(Text id, Text parent = {}) {
   return device;
 }
 
-inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceClass, Text driver, Text description) {
+inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceClass, Text driver,
+                                              Text description) {
   platform::simulated::Device device = BareDevice(std::move(id), std::move(parent));
   device.deviceClass = std::move(deviceClass);
   device.classGuid = u"{36fc9e60-c465-11cf-8056-444553540000}";
@@ -36,7 +38,8 @@ inline platform::simulated::Device DeviceNode(Text id, Text parent, Text deviceC
   return device;
 }
 
-inline platform::simulated::Port DevicePort(Text driverKey, std::uint16_t vendor, std::uint16_t product) {
+inline platform::simulated::Port DevicePort(Text driverKey, std::uint16_t vendor,
+                                            std::uint16_t product) {
   platform::simulated::Port port;
   port.status = 1;
   port.configuration = 1;
@@ -56,9 +59,10 @@ inline platform::simulated::Port HubOnPort(Text driverKey, Text name) {
 // One controller, HCD0, with a root hub of `ports` empty ports.
 inline Machine OneController(std::size_t ports) {
   Machine machine;
-  machine.devices = {DeviceNode(u"ACPI\\PNP0A08\\0", u"", u"System", u"{sys}\\0001", u"PCI"),
-                     DeviceNode(kControllerId, u"ACPI\\PNP0A08\\0", u"USB", u"{usb}\\0000", u"EHCI Controller"),
-                     DeviceNode(kRootHubId, kControllerId, u"USB", u"{usb}\\0001", u"USB Root Hub")};
+  machine.devices = {
+      DeviceNode(u"ACPI\\PNP0A08\\0", u"", u"System", u"{sys}\\0001", u"PCI"),
+      DeviceNode(kControllerId, u"ACPI\\PNP0A08\\0", u"USB", u"{usb}\\0000", u"EHCI Controller"),
+      DeviceNode(kRootHubId, kControllerId, u"USB", u"{usb}\\0001", u"USB Root Hub")};
   machine.hostControllers.push_back({{u"\\\\.\\HCD0"}, u"{usb}\\0000", HubName(kRootHubId)});
   machine.hubs.push_back({HubName(kRootHubId), {}, false});
   machine.hubs.back().ports.resize(ports);

@@ -1,12 +1,12 @@
-// What is plugged into a PC, for tests.
+// What is plugged into a small PC, for benchmarks and tests.
 #pragma once
 
 #include <functional>
 
+#include "bench/small_pcs.h"
 #include "platform/host.h"
 #include "platform/setup_api.h"
 #include "platform/simulated/steps.h"
-#include "tests/support/machines.h"
 
 namespace KelvoUHW {
 
@@ -34,13 +34,15 @@ inline Text DriverKey(const Text& id) { return u"{key}\\" + id; }
 // What the parts of a Plug are added with.
 inline void AddNode(Plug& plug, const Text& id, const Text& parent, const char16_t* deviceClass,
                     const char16_t* service) {
-  plug.fragment.devices.push_back(DeviceNode(id, parent, deviceClass, DriverKey(id), u"Node of " + id));
+  plug.fragment.devices.push_back(
+      DeviceNode(id, parent, deviceClass, DriverKey(id), u"Node of " + id));
   plug.fragment.devices.back().service = service;
 }
 inline void AddPort(Plug& plug, const Text& id, const Text& hub, std::uint32_t port) {
   plug.ports.push_back({HubName(hub), port, DevicePort(DriverKey(id), 0x0781, 0x5567)});
 }
-inline void AddStorageInterface(Plug& plug, const platform::Guid& kind, const Text& id, const Text& diskId) {
+inline void AddStorageInterface(Plug& plug, const platform::Guid& kind, const Text& id,
+                                const Text& diskId) {
   const Text path = u"\\\\?\\" + platform::Replaced(id, u'\\', u'#') + u"#" + GuidText(kind);
   plug.fragment.interfaces.push_back({kind, path, id});
   platform::simulated::Storage& storage = plug.fragment.storage.emplace_back();
@@ -59,9 +61,15 @@ inline void AddVolume(Plug& plug, const Text& diskId, char16_t letter, const Tex
   AddNode(plug, id, kVolumeManagerId, u"Volume", u"volsnap");
   AddStorageInterface(plug, platform::GUID_DEVINTERFACE_VOLUME, id, diskId);
   const Text drive = Text(1, letter) + u":";
-  plug.fragment.volumes.push_back(
-      {u"\\\\?\\Volume{of " + drive + u"}\\", id, {drive + u"\\"}, 0x1234, platform::kDRIVE_REMOVABLE, false, {}});
-  plug.fragment.drives.push_back({letter, platform::kDRIVE_REMOVABLE, u"\\Device\\Volume of " + drive, id});
+  plug.fragment.volumes.push_back({u"\\\\?\\Volume{of " + drive + u"}\\",
+                                   id,
+                                   {drive + u"\\"},
+                                   0x1234,
+                                   platform::kDRIVE_REMOVABLE,
+                                   false,
+                                   {}});
+  plug.fragment.drives.push_back(
+      {letter, platform::kDRIVE_REMOVABLE, u"\\Device\\Volume of " + drive, id});
   plug.fragment.storage.push_back(plug.fragment.storage.back());
   plug.fragment.storage.back().path = u"\\\\.\\" + drive;
 }
@@ -74,7 +82,8 @@ inline Plug Gadget(const Text& serial, std::uint32_t port, const Text& hub = kRo
   AddPort(plug, UsbId(serial), hub, port);
   return plug;
 }
-inline Plug Stick(const Text& serial, std::uint32_t port, char16_t letter, const Text& hub = kRootHubId) {
+inline Plug Stick(const Text& serial, std::uint32_t port, char16_t letter,
+                  const Text& hub = kRootHubId) {
   Plug plug = Gadget(serial, port, hub, u"USB");
   AddDisk(plug, DiskId(serial), UsbId(serial));
   AddVolume(plug, DiskId(serial), letter);
@@ -92,11 +101,13 @@ inline Plug Volume(const Text& diskId, char16_t letter, const Text& partition = 
   AddVolume(plug, diskId, letter, partition);
   return plug;
 }
-inline Plug ExternalHub(const Text& serial, std::uint32_t port, const char16_t* service = kOldHubService) {
+inline Plug ExternalHub(const Text& serial, std::uint32_t port,
+                        const char16_t* service = kOldHubService) {
   Plug plug;
   AddNode(plug, UsbId(serial), kRootHubId, u"USB", service);
   plug.fragment.hubs.push_back({HubName(UsbId(serial)), {{}, {}, {}}, false});
-  plug.ports.push_back({HubName(kRootHubId), port, HubOnPort(DriverKey(UsbId(serial)), HubName(UsbId(serial)))});
+  plug.ports.push_back(
+      {HubName(kRootHubId), port, HubOnPort(DriverKey(UsbId(serial)), HubName(UsbId(serial)))});
   return plug;
 }
 
@@ -104,7 +115,8 @@ inline Plug ExternalHub(const Text& serial, std::uint32_t port, const char16_t* 
 inline Machine BarePc(const char16_t* hubService = kOldHubService) {
   Machine machine = OneController(6);
   machine.devices[2].service = hubService;
-  machine.devices.push_back(DeviceNode(kVolumeManagerId, u"", u"System", u"{sys}\\0002", u"Volume manager"));
+  machine.devices.push_back(
+      DeviceNode(kVolumeManagerId, u"", u"System", u"{sys}\\0002", u"Volume manager"));
   return machine;
 }
 // What a PC has below its PCI bus besides: a storage controller with a disk and a fixed volume.
@@ -113,7 +125,8 @@ inline Plug InternalDisk() {
   AddNode(plug, u"PCI\\VEN_8086&DEV_2822\\3&0", u"ACPI\\PNP0A08\\0", u"SCSIAdapter", u"iaStor");
   AddDisk(plug, kInternalDiskId, u"PCI\\VEN_8086&DEV_2822\\3&0");
   AddNode(plug, u"STORAGE\\VOLUME\\{1}#00", kVolumeManagerId, u"Volume", u"volsnap");
-  AddStorageInterface(plug, platform::GUID_DEVINTERFACE_VOLUME, u"STORAGE\\VOLUME\\{1}#00", kInternalDiskId);
+  AddStorageInterface(plug, platform::GUID_DEVINTERFACE_VOLUME, u"STORAGE\\VOLUME\\{1}#00",
+                      kInternalDiskId);
   return plug;
 }
 
