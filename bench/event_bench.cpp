@@ -23,10 +23,10 @@
 #include "com/zkusb_monitor.h"
 #include "module/module.h"
 #include "monitor/process_state.h"
-#include "platform/simulated/broadcasts.h"
-#include "platform/simulated/simulated_desktop.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/system.h"
+#include "simulation/desktop/simulated_desktop.h"
+#include "simulation/pc/broadcasts.h"
+#include "simulation/pc/simulated_pc.h"
 
 namespace {
 

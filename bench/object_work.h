@@ -6,8 +6,8 @@
 
 #include "com/com_ptr.h"
 #include "com/zkusb_monitor.h"
-#include "platform/simulated/generated.h"
-#include "platform/simulated/simulated_pc.h"
+#include "simulation/machine/generated.h"
+#include "simulation/pc/simulated_pc.h"
 
 namespace bench {
 

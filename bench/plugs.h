@@ -6,7 +6,7 @@
 #include "bench/small_pcs.h"
 #include "platform/host.h"
 #include "platform/setup_api.h"
-#include "platform/simulated/steps.h"
+#include "simulation/machine/steps.h"
 
 namespace KelvoUHW {
 

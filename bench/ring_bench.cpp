@@ -8,8 +8,8 @@
 #include <thread>
 #include <vector>
 
-#include "tree/node.h"
-#include "tree/records.h"
+#include "records/node.h"
+#include "records/records.h"
 
 namespace {
 

@@ -5,8 +5,8 @@
 #include <string>
 #include <utility>
 
-#include "platform/simulated/machine.h"
 #include "platform/text.h"
+#include "simulation/machine/machine.h"
 
 namespace testing_support {
 

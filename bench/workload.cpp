@@ -4,9 +4,9 @@
 #include <stdexcept>
 #include <variant>
 
-#include "devinfo/device_set.h"
 #include "platform/text.h"
-#include "tree/records.h"
+#include "records/device_set.h"
+#include "records/records.h"
 
 namespace bench {
 

@@ -7,8 +7,8 @@
 #include <optional>
 #include <string>
 
-#include "platform/simulated/generated.h"
-#include "platform/simulated/simulated_pc.h"
+#include "simulation/machine/generated.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tree/topology_walker.h"
 #include "tree/tree_builder.h"
 

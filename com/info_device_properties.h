@@ -3,7 +3,7 @@
 
 #include "com/text_property.h"
 #include "com/zkusb_monitor.h"
-#include "devinfo/info_device.h"
+#include "records/info_device.h"
 
 namespace KelvoUHW {
 

@@ -3,7 +3,7 @@
 
 #include "com/object.h"
 #include "com/zkusb_monitor.h"
-#include "tree/interface_entry.h"
+#include "records/interface_entry.h"
 
 namespace KelvoUHW {
 

@@ -3,7 +3,7 @@
 
 #include "com/node_object.h"
 #include "com/variant.h"
-#include "devinfo/interface_device.h"
+#include "records/interface_device.h"
 
 namespace KelvoUHW {
 

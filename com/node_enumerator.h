@@ -7,7 +7,7 @@
 #include "com/object.h"
 #include "com/variant.h"
 #include "com/zkusb_monitor.h"
-#include "tree/node.h"
+#include "records/node.h"
 
 namespace KelvoUHW {
 

@@ -9,7 +9,7 @@
 #include "com/text_property.h"
 #include "com/variant_enumerator.h"
 #include "platform/text.h"
-#include "tree/record_lock.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 

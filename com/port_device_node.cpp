@@ -5,7 +5,7 @@
 #include "com/interface_descriptor.h"
 #include "com/text_property.h"
 #include "com/variant_enumerator.h"
-#include "tree/record_lock.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 

@@ -4,7 +4,7 @@
 #include "com/info_device_properties.h"
 #include "com/node_object.h"
 #include "com/variant.h"
-#include "tree/port_device.h"
+#include "records/port_device.h"
 
 namespace KelvoUHW {
 

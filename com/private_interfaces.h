@@ -3,7 +3,7 @@
 #pragma once
 
 #include "platform/com.h"
-#include "tree/device_lists.h"
+#include "records/device_lists.h"
 
 // Implemented by the tree object. Callers serialise all three, and the use of a list, by the
 // notification lock.

@@ -5,7 +5,7 @@
 
 #include "com/com_error.h"
 #include "platform/com.h"
-#include "tree/record_lock.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 

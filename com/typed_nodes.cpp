@@ -1,7 +1,7 @@
 #include "com/typed_nodes.h"
 
 #include "com/text_property.h"
-#include "tree/record_lock.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 

@@ -3,8 +3,8 @@
 
 #include "com/info_device_properties.h"
 #include "com/node_object.h"
-#include "devinfo/info_device.h"
-#include "tree/records.h"
+#include "records/info_device.h"
+#include "records/records.h"
 
 namespace KelvoUHW {
 

@@ -8,7 +8,7 @@
 #include "com/node_object.h"
 #include "platform/host.h"
 #include "platform/system.h"
-#include "tree/record_lock.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 

@@ -13,8 +13,8 @@
 //   S_OK and bring nothing.
 #pragma once
 
-#include "com/device_types.h"
 #include "platform/com.h"
+#include "records/device_types.h"
 
 struct IZKUMUsbTreeNode;
 struct IZKUMUsbTreeNodeEnumerator;

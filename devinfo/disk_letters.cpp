@@ -3,12 +3,12 @@
 #include <cstring>
 #include <optional>
 
-#include "devinfo/device_set.h"
-#include "devinfo/devnode.h"
-#include "devinfo/received_text.h"
 #include "platform/setup_api.h"
 #include "platform/storage_ioctl.h"
 #include "platform/text.h"
+#include "records/device_set.h"
+#include "records/devnode.h"
+#include "records/received_text.h"
 
 namespace KelvoUHW {
 namespace {

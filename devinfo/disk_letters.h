@@ -11,8 +11,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include "devinfo/interface_device.h"
 #include "platform/host.h"
+#include "records/interface_device.h"
 
 namespace KelvoUHW {
 

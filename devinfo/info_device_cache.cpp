@@ -5,13 +5,13 @@
 #include <string>
 #include <utility>
 
-#include "devinfo/device_set.h"
-#include "devinfo/devnode.h"
 #include "devinfo/info_device_linking.h"
 #include "devinfo/property_reader.h"
 #include "platform/flat_index.h"
 #include "platform/text.h"
-#include "tree/record_lock.h"
+#include "records/device_set.h"
+#include "records/devnode.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 

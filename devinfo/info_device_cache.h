@@ -7,7 +7,7 @@
 
 #include "devinfo/info_device_set.h"
 #include "platform/host.h"
-#include "tree/device_node_record.h"
+#include "records/device_node_record.h"
 
 namespace KelvoUHW {
 

@@ -7,8 +7,8 @@
 #include <tuple>
 #include <vector>
 
-#include "devinfo/info_device.h"
 #include "platform/flat_index.h"
+#include "records/info_device.h"
 
 namespace KelvoUHW {
 

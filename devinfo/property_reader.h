@@ -6,8 +6,8 @@
 #include <string_view>
 #include <vector>
 
-#include "devinfo/info_device.h"
 #include "platform/host.h"
+#include "records/info_device.h"
 
 namespace KelvoUHW {
 

@@ -6,11 +6,11 @@
 #include <string>
 #include <vector>
 
-#include "devinfo/device_set.h"
-#include "devinfo/interface_device.h"
 #include "devinfo/storage_pass.h"
 #include "platform/guid.h"
 #include "platform/host.h"
+#include "records/device_set.h"
+#include "records/interface_device.h"
 
 namespace KelvoUHW {
 

@@ -4,8 +4,8 @@
 #include <array>
 #include <string_view>
 
-#include "devinfo/devnode.h"
-#include "devinfo/received_text.h"
+#include "records/devnode.h"
+#include "records/received_text.h"
 
 namespace KelvoUHW {
 namespace {

@@ -4,10 +4,10 @@
 #include <string>
 
 #include "devinfo/disk_letters.h"
-#include "devinfo/interface_device.h"
 #include "devinfo/storage_query.h"
 #include "devinfo/volume_table.h"
 #include "platform/host.h"
+#include "records/interface_device.h"
 
 namespace KelvoUHW {
 

@@ -7,8 +7,8 @@
 #include <cstdint>
 #include <string>
 
-#include "devinfo/interface_device.h"
 #include "platform/host.h"
+#include "records/interface_device.h"
 
 namespace KelvoUHW {
 

@@ -7,10 +7,10 @@
 #include <span>
 #include <string_view>
 
-#include "devinfo/device_set.h"
-#include "devinfo/received_text.h"
 #include "platform/setup_api.h"
 #include "platform/text.h"
+#include "records/device_set.h"
+#include "records/received_text.h"
 
 namespace KelvoUHW {
 namespace {

@@ -10,7 +10,7 @@
 #include <iterator>
 #include <span>
 
-#include "com/descriptor_dump.h"
+#include "records/descriptor_dump.h"
 
 namespace {
 

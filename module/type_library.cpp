@@ -6,7 +6,7 @@ namespace KelvoUHW {
 namespace {
 
 using platform::FromSystemGuid;
-using platform::simulated::LibraryInterface;
+using platform::LibraryInterface;
 
 template <class Interface>
 LibraryInterface Automation(const char16_t* name) {
@@ -15,8 +15,8 @@ LibraryInterface Automation(const char16_t* name) {
 
 }  // namespace
 
-platform::simulated::TypeLibrary ModuleTypeLibrary() {
-  platform::simulated::TypeLibrary library;
+platform::TypeLibrary ModuleTypeLibrary() {
+  platform::TypeLibrary library;
   library.attributes.guid = FromSystemGuid(LIBID_ZKUsbMonitorLib);
   library.attributes.syskind = platform::kSYS_WIN32;
   library.attributes.wMajorVerNum = 1;

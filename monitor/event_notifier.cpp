@@ -7,7 +7,7 @@
 #include "com/node_object.h"
 #include "monitor/process_state.h"
 #include "monitor/thread_lock.h"
-#include "tree/record_lock.h"
+#include "records/record_lock.h"
 
 using KelvoUHW::ComPtr;
 using KelvoUHW::Guarded;

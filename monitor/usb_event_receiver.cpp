@@ -6,12 +6,12 @@
 #include <string>
 
 #include "com/module_lock.h"
-#include "devinfo/identifiers.h"
 #include "monitor/message_window.h"
 #include "monitor/process_state.h"
 #include "platform/com.h"
 #include "platform/system.h"
-#include "tree/node.h"
+#include "records/identifiers.h"
+#include "records/node.h"
 
 namespace KelvoUHW {
 

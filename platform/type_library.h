@@ -4,6 +4,8 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
+#include <vector>
 
 #include "platform/com.h"
 #include "platform/guid.h"
@@ -31,6 +33,23 @@ struct TypeLibraryAttributes {
   std::uint16_t wLibFlags = 0;
 
   friend bool operator==(const TypeLibraryAttributes&, const TypeLibraryAttributes&) = default;
+};
+
+// An interface that registering its library makes known to the system, so that calls to it cross
+// apartments.
+struct LibraryInterface {
+  Guid iid{};
+  std::u16string name;
+  bool dispatch = false;  // a dispinterface; else one marked oleautomation
+};
+
+// What a library says of itself as far as registering it is concerned. On Windows a file carries it
+// as a resource; elsewhere a program tells it to what stands behind the seam.
+struct TypeLibrary {
+  TypeLibraryAttributes attributes;
+  std::u16string helpString;
+  std::u16string helpFile;
+  std::vector<LibraryInterface> interfaces;
 };
 
 class TypeLibraries {

@@ -7,14 +7,14 @@
 #include <string_view>
 #include <utility>
 
-#include "devinfo/device_set.h"
-#include "devinfo/devnode.h"
 #include "devinfo/property_reader.h"
-#include "devinfo/received_text.h"
 #include "platform/flat_index.h"
 #include "platform/text.h"
-#include "tree/port_device.h"
-#include "tree/records.h"
+#include "records/device_set.h"
+#include "records/devnode.h"
+#include "records/port_device.h"
+#include "records/received_text.h"
+#include "records/records.h"
 
 namespace KelvoUHW {
 

@@ -5,8 +5,8 @@
 #include <vector>
 
 #include "platform/host.h"
-#include "tree/device_node_record.h"
-#include "tree/node.h"
+#include "records/device_node_record.h"
+#include "records/node.h"
 
 namespace KelvoUHW {
 

@@ -6,9 +6,9 @@
 #include <cstring>
 #include <memory>
 
-#include "devinfo/devnode.h"
-#include "devinfo/identifiers.h"
 #include "platform/text.h"
+#include "records/devnode.h"
+#include "records/identifiers.h"
 
 namespace KelvoUHW {
 

@@ -10,8 +10,8 @@
 
 #include "platform/host.h"
 #include "platform/usb_ioctl.h"
-#include "tree/records.h"
-#include "tree/usb_port_info.h"
+#include "records/records.h"
+#include "records/usb_port_info.h"
 
 namespace KelvoUHW {
 

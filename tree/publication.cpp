@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <utility>
 
-#include "devinfo/devnode.h"
 #include "devinfo/info_device_linking.h"
+#include "records/devnode.h"
 
 namespace KelvoUHW {
 

@@ -7,9 +7,9 @@
 #include "devinfo/caching_device_manager.h"
 #include "devinfo/info_device_cache.h"
 #include "platform/host.h"
-#include "tree/device_lists.h"
-#include "tree/node.h"
-#include "tree/port_device.h"
+#include "records/device_lists.h"
+#include "records/node.h"
+#include "records/port_device.h"
 #include "tree/tree_index.h"
 
 namespace KelvoUHW {

@@ -2,11 +2,11 @@
 
 #include <utility>
 
-#include "devinfo/device_set.h"
 #include "platform/text.h"
+#include "records/device_set.h"
+#include "records/port_device.h"
 #include "tree/device_forest.h"
 #include "tree/hub_queries.h"
-#include "tree/port_device.h"
 
 namespace KelvoUHW {
 

@@ -8,11 +8,11 @@
 #include <unordered_set>
 #include <vector>
 
-#include "devinfo/devnode.h"
 #include "platform/host.h"
-#include "tree/device_node_record.h"
-#include "tree/node.h"
-#include "tree/records.h"
+#include "records/device_node_record.h"
+#include "records/devnode.h"
+#include "records/node.h"
+#include "records/records.h"
 
 namespace KelvoUHW {
 

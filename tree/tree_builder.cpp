@@ -1,8 +1,8 @@
 #include "tree/tree_builder.h"
 
+#include "records/record_lock.h"
 #include "tree/device_forest.h"
 #include "tree/publication.h"
-#include "tree/record_lock.h"
 
 namespace KelvoUHW {
 

@@ -8,7 +8,7 @@
 #include "devinfo/info_device_cache.h"
 #include "devinfo/storage_cache.h"
 #include "platform/host.h"
-#include "tree/device_lists.h"
+#include "records/device_lists.h"
 #include "tree/topology_walker.h"
 
 namespace KelvoUHW {

@@ -6,7 +6,7 @@
 #include <string_view>
 
 #include "platform/flat_index.h"
-#include "tree/node.h"
+#include "records/node.h"
 
 namespace KelvoUHW {
 

@@ -1,8 +1,8 @@
 // The tree of a real PC, read while each allocation in turn fails: texts are the system's, all else is ours.
 #include <gmock/gmock.h>
 
-#include "platform/simulated/machine_file.h"
-#include "platform/simulated/simulated_pc.h"
+#include "simulation/machine/machine_file.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/com_objects.h"
 #include "tests/support/failing_memory.h"
 #include "tree/tree_builder.h"

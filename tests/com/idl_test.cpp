@@ -15,7 +15,7 @@ std::string Replaced(const std::string& text, const char* pattern, const char* b
 
 // Without comments, on one line.
 std::string Load(const std::string& file) {
-  std::ifstream stream(ZKUSB_SOURCE_DIR "/com/" + file);
+  std::ifstream stream(ZKUSB_SOURCE_DIR "/" + file);
   std::string text;
   for (std::string line; std::getline(stream, line);) text += line.substr(0, line.find("//")) + ' ';
   return Replaced(text, "\\s+", " ");
@@ -42,12 +42,12 @@ TEST(Idl, SaysWhatTheHeaderSays) {
   Lines header, idl;
   const char* const inHeader =
       R"(struct (\w+) : IUnknown \{ static constexpr IID kIid\{([^;]*);|virtual HRESULT STDMETHODCALLTYPE (\w+)\(([^)]*)\) = 0;)";
-  ForEachMatch(Load("zkusb_monitor.h"), inHeader, [&](const std::smatch& m) {
+  ForEachMatch(Load("com/zkusb_monitor.h"), inHeader, [&](const std::smatch& m) {
     header.push_back(m[1].matched ? m.str(1) + " " + Digits(m.str(2)) : m.str(3) + " " + Parameters(m.str(4)));
   });
   const char* const inIdl =
       R"(uuid\(([^)]*)\)[^\]]*\] interface (\w+) : IUnknown|\[([^\]]*)\] HRESULT (\w+)\(([^;]*)\);)";
-  ForEachMatch(Load("zkusb_monitor.idl"), inIdl, [&](const std::smatch& m) {
+  ForEachMatch(Load("com/zkusb_monitor.idl"), inIdl, [&](const std::smatch& m) {
     const bool property = m.str(3).find("propget") != std::string::npos;
     idl.push_back(m[1].matched ? m.str(2) + " " + Digits(m.str(1))
                                : (property ? "get_" : "") + m.str(4) + " " + Parameters(m.str(5)));
@@ -63,10 +63,11 @@ TEST(Idl, SaysWhatTheHeaderSays) {
     std::sort(lines.begin(), lines.end());
     return lines;
   };
-  const Lines ids = idsOf("zkusb_monitor.h", "(?:LIBID|CLSID|DIID)_(\\w+)\\{([^;]*);", 1, 2);
+  const Lines ids = idsOf("com/zkusb_monitor.h", "(?:LIBID|CLSID|DIID)_(\\w+)\\{([^;]*);", 1, 2);
   EXPECT_EQ(ids.size(), 4u);
-  EXPECT_EQ(idsOf("zkusb_monitor.idl", "uuid\\(([^)]*)\\)[^\\]]*\\] (?:library|coclass|dispinterface) (\\w+)", 2, 1),
-            ids);
+  EXPECT_EQ(
+      idsOf("com/zkusb_monitor.idl", "uuid\\(([^)]*)\\)[^\\]]*\\] (?:library|coclass|dispinterface) (\\w+)", 2, 1),
+      ids);
 
   const auto values = [](const char* file) {
     Lines lines;
@@ -77,8 +78,8 @@ TEST(Idl, SaysWhatTheHeaderSays) {
     });
     return lines;
   };
-  EXPECT_EQ(values("zkusb_monitor.idl"), values("device_types.h"));
-  EXPECT_EQ(values("device_types.h").size(), 2u + 12u);
+  EXPECT_EQ(values("com/zkusb_monitor.idl"), values("records/device_types.h"));
+  EXPECT_EQ(values("records/device_types.h").size(), 2u + 12u);
 }
 
 }  // namespace

@@ -3,14 +3,14 @@
 #include <set>
 
 #include "bench/object_reader.h"
-#include "devinfo/info_device.h"
-#include "devinfo/interface_device.h"
-#include "platform/simulated/machine_file.h"
 #include "platform/text.h"
 #include "platform/usb_ioctl.h"
+#include "records/info_device.h"
+#include "records/interface_device.h"
+#include "records/port_device.h"
+#include "records/records.h"
+#include "simulation/machine/machine_file.h"
 #include "tests/support/tree_desk.h"
-#include "tree/port_device.h"
-#include "tree/records.h"
 #include "tree/tree_builder.h"
 
 namespace KelvoUHW {

@@ -4,7 +4,7 @@
 #include <limits>
 #include <set>
 
-#include "platform/simulated/simulated_desktop.h"
+#include "simulation/desktop/simulated_desktop.h"
 #include "tests/support/com_objects.h"
 #include "tests/support/desk_pc.h"
 #include "tests/support/tree_desk.h"

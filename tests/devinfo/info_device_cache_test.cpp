@@ -7,11 +7,11 @@
 #include <random>
 
 #include "bench/small_pcs.h"
-#include "devinfo/devnode.h"
 #include "devinfo/info_device_linking.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
 #include "platform/wrappers/failing_host.h"
+#include "records/devnode.h"
+#include "simulation/pc/simulated_pc.h"
 
 namespace KelvoUHW {
 namespace {

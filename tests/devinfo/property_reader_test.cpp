@@ -6,9 +6,9 @@
 #include <map>
 #include <sstream>
 
-#include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
 #include "platform/wrappers/intercepting_host.h"
+#include "simulation/pc/simulated_pc.h"
 
 namespace KelvoUHW {
 namespace {

@@ -7,10 +7,10 @@
 #include <set>
 
 #include "devinfo/info_device_cache.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/text.h"
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/intercepting_host.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/devinfo/storage_machine.h"
 
 namespace KelvoUHW {

@@ -5,8 +5,8 @@
 
 #include <cstring>
 
-#include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/intercepting_host.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/devinfo/storage_machine.h"
 
 namespace KelvoUHW {

@@ -3,8 +3,8 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/failing_host.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/devinfo/storage_machine.h"
 
 namespace KelvoUHW {

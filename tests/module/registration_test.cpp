@@ -7,9 +7,9 @@
 #include "module/module.h"
 #include "module/scripts.h"
 #include "module/type_library.h"
-#include "platform/simulated/module_environment.h"
-#include "platform/simulated/type_libraries.h"
 #include "platform/wrappers/failing_registry.h"
+#include "simulation/process/module_environment.h"
+#include "simulation/process/type_libraries.h"
 #include "tests/support/failing_memory.h"
 #include "tests/support/golden.h"
 #include "tests/support/registry_lines.h"
@@ -17,9 +17,9 @@
 namespace KelvoUHW {
 namespace {
 
+using platform::TypeLibrary;
 using platform::simulated::SimulatedModuleEnvironment;
 using platform::simulated::SimulatedRegistry;
-using platform::simulated::TypeLibrary;
 using platform::wrappers::FailingRegistry;
 using testing_support::ExpectAllClosed;
 using testing_support::Lines;

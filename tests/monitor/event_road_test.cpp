@@ -1,6 +1,6 @@
 // The road of one event, from registration to the last sink, over COM alone: this program knows the component as any
 // client does, and loads it from where it was registered.
-#include "platform/simulated/play_step.h"
+#include "simulation/desktop/play_on_desktop.h"
 #include "tests/support/client_process.h"
 #include "tests/support/test_sink.h"
 

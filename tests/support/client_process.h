@@ -8,12 +8,12 @@
 #include "com/zkusb_monitor.h"
 #include "module/type_library.h"
 #include "platform/server_module.h"
-#include "platform/simulated/module_environment.h"
-#include "platform/simulated/registry.h"
-#include "platform/simulated/simulated_desktop.h"
-#include "platform/simulated/simulated_pc.h"
-#include "platform/simulated/type_libraries.h"
 #include "platform/system.h"
+#include "simulation/desktop/simulated_desktop.h"
+#include "simulation/pc/simulated_pc.h"
+#include "simulation/process/module_environment.h"
+#include "simulation/process/registry.h"
+#include "simulation/process/type_libraries.h"
 
 namespace KelvoUHW {
 

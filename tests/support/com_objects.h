@@ -17,12 +17,12 @@
 #include "com/module_lock.h"
 #include "com/node_object.h"
 #include "com/zkusb_monitor.h"
-#include "devinfo/info_device.h"
-#include "devinfo/interface_device.h"
 #include "platform/com_controls.h"
 #include "platform/text.h"
-#include "tree/port_device.h"
-#include "tree/records.h"
+#include "records/info_device.h"
+#include "records/interface_device.h"
+#include "records/port_device.h"
+#include "records/records.h"
 
 namespace KelvoUHW {
 

@@ -4,7 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "bench/plugs.h"
-#include "platform/simulated/simulated_pc.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tree/tree_builder.h"
 
 namespace KelvoUHW {

@@ -7,7 +7,7 @@
 
 #include "bench/plugs.h"
 #include "module/module.h"
-#include "platform/simulated/simulated_pc.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/com_objects.h"
 #include "tests/support/monitor_process.h"
 

@@ -9,9 +9,9 @@
 #include "com/module_lock.h"
 #include "monitor/process_state.h"
 #include "platform/device_broadcast.h"
-#include "platform/simulated/simulated_desktop.h"
 #include "platform/system.h"
 #include "platform/text.h"
+#include "simulation/desktop/simulated_desktop.h"
 #include "tests/support/launch.h"
 
 namespace KelvoUHW {

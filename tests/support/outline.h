@@ -6,8 +6,8 @@
 #include <fstream>
 
 #include "platform/text.h"
-#include "tree/port_device.h"
-#include "tree/records.h"
+#include "records/port_device.h"
+#include "records/records.h"
 
 namespace KelvoUHW {
 

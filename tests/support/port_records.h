@@ -3,7 +3,7 @@
 
 #include <utility>
 
-#include "tree/usb_port_info.h"
+#include "records/usb_port_info.h"
 
 namespace KelvoUHW {
 

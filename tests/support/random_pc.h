@@ -4,7 +4,7 @@
 #include <optional>
 #include <random>
 
-#include "platform/simulated/simulated_pc.h"
+#include "simulation/pc/simulated_pc.h"
 
 namespace testing_support {
 

@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "platform/registry_key.h"
-#include "platform/simulated/registry.h"
 #include "platform/text.h"
+#include "simulation/process/registry.h"
 
 namespace testing_support {
 

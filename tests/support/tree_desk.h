@@ -9,8 +9,8 @@
 #include "com/module_lock.h"
 #include "com/usb_tree.h"
 #include "platform/com_controls.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/system.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/failing_memory.h"
 
 namespace KelvoUHW {

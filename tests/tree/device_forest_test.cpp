@@ -5,8 +5,8 @@
 #include <sstream>
 
 #include "bench/small_pcs.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/failing_host.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/outline.h"
 
 namespace KelvoUHW {

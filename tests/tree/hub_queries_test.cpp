@@ -5,9 +5,9 @@
 #include <array>
 
 #include "bench/small_pcs.h"
-#include "devinfo/device_set.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/logging_host.h"
+#include "records/device_set.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/scripted_driver.h"
 
 namespace KelvoUHW {

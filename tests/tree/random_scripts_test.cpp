@@ -9,10 +9,10 @@
 #include <set>
 
 #include "bench/small_pcs.h"
-#include "devinfo/interface_device.h"
 #include "platform/text.h"
+#include "records/interface_device.h"
+#include "records/records.h"
 #include "tests/support/random_pc.h"
-#include "tree/records.h"
 #include "tree/tree_builder.h"
 
 namespace KelvoUHW {

@@ -5,9 +5,9 @@
 #include <algorithm>
 
 #include "bench/small_pcs.h"
-#include "platform/simulated/simulated_pc.h"
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/logging_host.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/outline.h"
 #include "tests/support/scripted_driver.h"
 

@@ -3,11 +3,11 @@
 
 #include <array>
 
-#include "devinfo/device_set.h"
-#include "devinfo/devnode.h"
 #include "devinfo/property_reader.h"
 #include "platform/text.h"
 #include "platform/windows/windows_host.h"
+#include "records/device_set.h"
+#include "records/devnode.h"
 #include "tests/windows/registered_device.h"
 #include "tree/tree_builder.h"
 

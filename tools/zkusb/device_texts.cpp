@@ -2,8 +2,8 @@
 
 #include <utility>
 
-#include "com/usb_names.h"
 #include "platform/text.h"
+#include "records/usb_names.h"
 #include "tools/zkusb/writer.h"
 
 namespace zkusb {

@@ -2,8 +2,8 @@
 
 #include <array>
 
-#include "com/usb_names.h"
 #include "platform/text.h"
+#include "records/usb_names.h"
 
 namespace zkusb {
 

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "com/device_types.h"
+#include "records/device_types.h"
 
 namespace zkusb {
 

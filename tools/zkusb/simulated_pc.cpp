@@ -3,16 +3,16 @@
 
 #include "module/type_library.h"
 #include "platform/server_module.h"
-#include "platform/simulated/machine_file.h"
-#include "platform/simulated/module_environment.h"
-#include "platform/simulated/play_step.h"
-#include "platform/simulated/registry.h"
-#include "platform/simulated/simulated_desktop.h"
-#include "platform/simulated/simulated_pc.h"
-#include "platform/simulated/type_libraries.h"
 #include "platform/system.h"
 #include "platform/text.h"
-#include "tools/zkusb/built_in_machine.h"
+#include "simulation/desktop/play_on_desktop.h"
+#include "simulation/desktop/simulated_desktop.h"
+#include "simulation/machine/built_in_machine.h"
+#include "simulation/machine/machine_file.h"
+#include "simulation/pc/simulated_pc.h"
+#include "simulation/process/module_environment.h"
+#include "simulation/process/registry.h"
+#include "simulation/process/type_libraries.h"
 #include "tools/zkusb/component.h"
 #include "tools/zkusb/pc.h"
 
@@ -25,7 +25,8 @@ using platform::simulated::MachineFileError;
 using platform::simulated::Script;
 
 Machine ReadMachine(const std::string& file) {
-  return file.empty() ? platform::simulated::ParseMachine(BuiltInMachine(), kBuiltInMachineName)
+  return file.empty() ? platform::simulated::ParseMachine(platform::simulated::BuiltInMachine(),
+                                                          platform::simulated::kBuiltInMachineName)
                       : platform::simulated::LoadMachine(file);
 }
 

@@ -8,11 +8,11 @@
 #include "module/type_library.h"
 #include "platform/registry_key.h"
 #include "platform/server_module.h"
-#include "platform/simulated/machine_file.h"
 #include "platform/system.h"
 #include "platform/text.h"
 #include "platform/windows/server_classes.h"
-#include "tools/zkusb/built_in_machine.h"
+#include "simulation/machine/built_in_machine.h"
+#include "simulation/machine/machine_file.h"
 #include "tools/zkusb/component.h"
 #include "tools/zkusb/pc.h"
 
@@ -88,7 +88,8 @@ Pc::Pc(const std::string& machineFile, const std::string& scriptFile)
     // Read here as well: what is wrong with them is said before anything starts.
     const platform::simulated::Machine machine =
         machineFile.empty()
-            ? platform::simulated::ParseMachine(BuiltInMachine(), kBuiltInMachineName)
+            ? platform::simulated::ParseMachine(platform::simulated::BuiltInMachine(),
+                                                platform::simulated::kBuiltInMachineName)
             : platform::simulated::LoadMachine(machineFile);
     if (!scriptFile.empty()) {
       for (const auto& step : platform::simulated::LoadScript(scriptFile, machine)) {

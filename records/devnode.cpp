@@ -1,0 +1,150 @@
+#include "records/devnode.h"
+
+#include <algorithm>
+#include <array>
+#include <optional>
+#include <string_view>
+
+#include "platform/flat_index.h"
+#include "platform/text.h"
+#include "records/received_text.h"
+
+namespace KelvoUHW {
+
+namespace {
+
+constexpr std::size_t kTextChars = 200;
+using TextBuffer = std::array<char16_t, kTextChars>;
+
+// A text property of a node; nothing when the call fails.
+std::optional<std::u16string> ReadTextProperty(platform::DeviceManager& manager,
+                                               platform::DevInst node, std::uint32_t property) {
+  TextBuffer buffer{};
+  static_assert(sizeof buffer == 400);
+  std::uint32_t bytes = sizeof buffer;
+  std::uint32_t type = 0;
+  if (!manager.GetDevNodeRegistryProperty(node, property, &type, buffer.data(), bytes)) {
+    return std::nullopt;
+  }
+  const std::size_t received = std::min<std::size_t>(bytes / sizeof(char16_t), buffer.size());
+  std::fill(buffer.begin() + static_cast<std::ptrdiff_t>(received), buffer.end(), u'\0');
+  return ReceivedText(buffer);
+}
+
+// The part of a driver key before its last backslash; all of it where it has none.
+std::u16string_view ClassOf(std::u16string_view key) noexcept {
+  return key.substr(0, key.rfind(u'\\'));
+}
+
+// Calls `visit` with each node, depth first from the root, until it returns true. The way up asks
+// the system for the parent: a node without one ends the walk, as the root does. No two nodes are
+// visited or climbed to twice, so the walk ends on a system that answers in circles.
+template <class Visit>
+void WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
+  platform::FlatNumberSet visited;
+  platform::FlatNumberSet climbedTo;
+  platform::DevInst node = 0;
+  if (!manager.LocateRootDevNode(node) || node == 0) return;
+  while (visited.Insert(node)) {
+    if (visit(node)) return;
+    platform::DevInst next = 0;
+    // A handle of 0 is no node, whatever the result code says.
+    if (manager.GetChild(node, next) && next != 0) {
+      node = next;
+      continue;
+    }
+    while (next = 0, !manager.GetSibling(node, next) || next == 0) {
+      platform::DevInst parent = 0;
+      if (!manager.GetParent(node, parent) || parent == 0) return;
+      if (!climbedTo.Insert(parent)) return;
+      node = parent;
+    }
+    node = next;
+  }
+}
+
+}  // namespace
+
+std::u16string GetDeviceDescription(platform::DeviceManager& manager, platform::DevInst node) {
+  if (node == 0) return {};
+  return ReadTextProperty(manager, node, platform::kCM_DRP_DEVICEDESC).value_or(std::u16string());
+}
+
+std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst node) {
+  if (node == 0 || node == kUnknownDevInst) return {};
+  TextBuffer buffer{};
+  if (!manager.GetDeviceId(node, buffer.data(), static_cast<std::uint32_t>(buffer.size())))
+    return {};
+  return platform::Replaced(ReceivedText(buffer).value_or(std::u16string()), u'/', u'\\');
+}
+
+void ResolveParentInstanceId(platform::DeviceManager& manager, NodeIdentity& node) {
+  manager.GetParent(node.m_devInstHandle, node.m_devInstHandleParent);
+  node.m_strDevInstIdParent = GetDeviceId(manager, node.m_devInstHandleParent);
+  if (!node.m_strDevInstIdParent.starts_with(u"ROOT\\VOLMGR\\")) return;
+  if (auto diskId = DiskIdOfVolumeId(node.m_strDevInstId)) {
+    node.m_strDevInstIdParent = *std::move(diskId);
+  }
+}
+
+platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
+                                         const std::u16string& driverKey) {
+  platform::DevInst found = 0;
+  WalkDevNodes(manager, [&](platform::DevInst node) {
+    const auto key = ReadTextProperty(manager, node, platform::kCM_DRP_DRIVER);
+    if (!key || !platform::EqualIgnoringCase(*key, driverKey)) return false;
+    found = node;
+    return true;
+  });
+  return found;
+}
+
+platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
+  if (!m_filled) Fill();
+  const std::u16string key = platform::ToLower(driverKey);
+  const auto found =
+      m_index.First(platform::HashOf(key), [&](auto entry) { return IsKeyOf(entry, key); });
+  return found == platform::FlatIndex::kNone ? 0 : m_nodes[found].handle;
+}
+
+void DriverKeyIndex::Fill() {
+  WalkDevNodes(m_manager, [this](platform::DevInst node) {
+    if (const auto key = ReadTextProperty(m_manager, node, platform::kCM_DRP_DRIVER)) {
+      Add(platform::ToLower(*key), node);
+    }
+    return false;
+  });
+  m_filled = true;
+}
+
+// A key that an earlier node has is entered behind that one, and never found.
+void DriverKeyIndex::Add(std::u16string_view key, platform::DevInst node) {
+  const std::u16string_view keyClass = ClassOf(key);
+  m_nodes.push_back({m_rests.size(), PlaceOfClass(keyClass), node});
+  m_rests += key.substr(keyClass.size());
+  m_index.Add(platform::HashOf(key), static_cast<platform::FlatIndex::Entry>(m_nodes.size() - 1),
+              [&](auto entry) { return IsKeyOf(entry, key); });
+}
+
+std::uint32_t DriverKeyIndex::PlaceOfClass(std::u16string_view keyClass) {
+  const std::size_t hash = platform::HashOf(keyClass);
+  const auto same = [&](auto entry) { return m_classes[entry] == keyClass; };
+  const auto known = m_classIndex.First(hash, same);
+  if (known != platform::FlatIndex::kNone) return known;
+  const auto place = static_cast<std::uint32_t>(m_classes.size());
+  m_classes.emplace_back(keyClass);
+  m_classIndex.Add(hash, place, same);
+  return place;
+}
+
+bool DriverKeyIndex::IsKeyOf(platform::FlatIndex::Entry entry,
+                             std::u16string_view key) const noexcept {
+  const std::size_t begin = m_nodes[entry].restBegin;
+  const std::size_t end =
+      entry + 1 < m_nodes.size() ? m_nodes[entry + 1].restBegin : m_rests.size();
+  const std::u16string_view keyClass = m_classes[m_nodes[entry].keyClass];
+  return key.starts_with(keyClass) &&
+         key.substr(keyClass.size()) == std::u16string_view(m_rests).substr(begin, end - begin);
+}
+
+}  // namespace KelvoUHW

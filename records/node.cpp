@@ -1,0 +1,139 @@
+#include "records/node.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "platform/text.h"
+#include "records/devnode.h"
+#include "records/record_lock.h"
+
+namespace KelvoUHW {
+
+namespace {
+
+// The records of one thread that wait to be deleted, linked through their parent links, which a
+// record without owner has no other use for.
+struct Deletions {
+  CZKUMUsbTreeNodeImpl* waiting = nullptr;
+  bool running = false;
+};
+thread_local Deletions t_deletions;
+
+}  // namespace
+
+void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
+  record->m_pParent = t_deletions.waiting;
+  t_deletions.waiting = record;
+  if (t_deletions.running) return;
+  // A build follows parent links while it joins records: none may die under it on another thread.
+  const RecordReadLock lock;
+  t_deletions.running = true;
+  while (CZKUMUsbTreeNodeImpl* next = t_deletions.waiting) {
+    t_deletions.waiting = next->m_pParent;
+    next->m_pParent = nullptr;
+    delete next;
+  }
+  t_deletions.running = false;
+}
+
+CZKUMUsbTreeNodeImpl::~CZKUMUsbTreeNodeImpl() {
+  for (const NodePtr& child : m_childs) child->m_pParent.ClearIfNaming(this);
+}
+
+bool CZKUMUsbTreeNodeImpl::AcceptNode(NodePtr) { return true; }
+
+void CZKUMUsbTreeNodeImpl::ToString(std::u16string& out, std::u16string indent) const {
+  struct Level {
+    const CZKUMUsbTreeNodeImpl* node;
+    std::size_t nextChild;
+  };
+  std::vector<Level> path;
+  const auto enter = [&](const CZKUMUsbTreeNodeImpl& node) {
+    node.OwnLines(out, indent);
+    // The number is the constant 0 and not the count of children. This is meant: readers of dumps
+    // depend on the line as it is.
+    out += u"childvector size0\r\n";
+    path.push_back({&node, 0});
+  };
+  enter(*this);
+  while (!path.empty()) {
+    Level& level = path.back();
+    if (level.nextChild == level.node->m_childs.size()) {
+      out += u"ChildsToString End\r\n";
+      path.pop_back();
+      if (!path.empty()) indent.resize(indent.size() - kChildIndent.size());
+      continue;
+    }
+    const CZKUMUsbTreeNodeImpl& child = *level.node->m_childs[level.nextChild];
+    out.append(u"child ");
+    out.append(platform::Decimal(static_cast<std::int32_t>(level.nextChild++))).append(u"\r\n");
+    indent += kChildIndent;
+    enter(child);
+  }
+}
+
+void CZKUMUsbTreeNodeImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
+  BaseToString(out, indent);
+}
+
+void CZKUMUsbTreeNodeImpl::BaseToString(std::u16string& out, const std::u16string& indent) const {
+  const auto lineUnlessEmpty = [&](std::u16string_view label, const std::u16string& value) {
+    if (!value.empty()) AppendLine(out, indent, label, value);
+  };
+  lineUnlessEmpty(u"DevInstId            : ", m_strDevInstId);
+  lineUnlessEmpty(u"driverKeyName : ", m_strDriverKeyName);
+  lineUnlessEmpty(u"m_strDevInstIdParent : ", m_strDevInstIdParent);
+  lineUnlessEmpty(u"deviceDescr : ", m_strDeviceDescr);
+  lineUnlessEmpty(u"serial number        : ", m_strSerialNumber);
+  if (m_nVendorId != kUnknownId || m_nProductId != kUnknownId) {
+    AppendLine(out, indent, u"VendorId; productId: ",
+               u"0x" + platform::Hex(m_nVendorId) + u"; 0x" + platform::Hex(m_nProductId));
+  } else if (!m_strVendor.empty() || !m_strProduct.empty()) {
+    AppendLine(out, indent, u"Vendor; product: ", m_strVendor + u";" + m_strProduct);
+  }
+  const auto lineUnlessZero = [&](std::u16string_view label, platform::DevInst handle) {
+    if (handle == 0) return;
+    AppendLine(out, indent, label, platform::Decimal(static_cast<std::int32_t>(handle)));
+  };
+  lineUnlessZero(u"devInstHandle        : ", m_devInstHandle);
+  lineUnlessZero(u"devInstHandleParent  : ", m_devInstHandleParent);
+}
+
+bool CZKUMUsbTreeNodeImpl::HasChildWithDriverKey(const std::u16string& driverKey) const {
+  return std::any_of(m_childs.begin(), m_childs.end(), [&](const NodePtr& child) {
+    return platform::EqualIgnoringCase(child->m_strDriverKeyName, driverKey);
+  });
+}
+
+bool CZKUMUsbTreeNodeImpl::IsSameNode(const CZKUMUsbTreeNodeImpl& other) const noexcept {
+  if (this == &other) return true;
+  return m_strDevInstId == other.m_strDevInstId && m_nProductId == other.m_nProductId &&
+         m_strProduct == other.m_strProduct && m_strSerialNumber == other.m_strSerialNumber &&
+         m_strDeviceDescr == other.m_strDeviceDescr;
+}
+
+void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent) {
+  if (parent == nullptr) return;
+  for (const NodePtr& present : parent->m_childs) {
+    if (present->IsSameNode(*child)) return;
+  }
+  parent->m_childs.push_back(child);
+  child->m_pParent = parent;
+}
+
+NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId) {
+  NodePtr found;
+  VisitPreOrder(root, [&](const NodePtr& node) {
+    if (node->m_strDevInstId != instanceId) return true;
+    found = node;
+    return false;
+  });
+  return found;
+}
+
+void AppendLine(std::u16string& out, std::u16string_view indent, std::u16string_view label,
+                std::u16string_view value) {
+  out.append(indent).append(label).append(value).append(u"\r\n");
+}
+
+}  // namespace KelvoUHW

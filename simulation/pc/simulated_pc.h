@@ -1,0 +1,116 @@
+// A PC in memory that answers the platform calls byte for byte as Windows would.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/host.h"
+#include "simulation/machine/machine.h"
+#include "simulation/machine/script.h"
+
+namespace platform::simulated {
+
+// Handles, sets and searches that are open now.
+struct OpenCounts {
+  std::size_t files = 0;
+  std::size_t sets = 0;
+  std::size_t imageLists = 0;
+  std::size_t searches = 0;
+
+  friend bool operator==(const OpenCounts&, const OpenCounts&) = default;
+};
+
+// Thread-safe: one lock guards the whole PC, so that a step is seen whole or not at all by each
+// call. Refuses what Windows refuses (a wrong handle, a buffer that is too small, a second close)
+// with the code Windows gives, and remembers each refused close as a misuse.
+class SimulatedPc final : public Host {
+ public:
+  explicit SimulatedPc(Machine machine);
+  ~SimulatedPc() override;
+
+  // Carries out one change. A step that names what is not there changes nothing and returns the
+  // reason; otherwise the result is empty.
+  std::u16string Apply(const Step& step);
+
+  Machine Snapshot() const;
+  OpenCounts Open() const;
+  // What is open and who opened it, one text each ("file \\.\HCD0"), and each misuse ("second
+  // close").
+  std::vector<std::u16string> OpenNames() const;
+  std::vector<std::u16string> Misuses() const;
+  std::u16string DebugText() const;
+
+  // DeviceIo
+  Status OpenDevice(const char16_t* path, std::uint32_t access, std::uint32_t share,
+                    FileHandle& handle) noexcept override;
+  Status DeviceControl(FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
+                       void* out, std::uint32_t outBytes,
+                       std::uint32_t& returnedBytes) noexcept override;
+  Status CloseDevice(FileHandle handle) noexcept override;
+
+  // DeviceSets
+  Status GetClassDevs(const Guid* guid, std::uint32_t flags,
+                      DeviceSetHandle& set) noexcept override;
+  Status EnumDeviceInfo(DeviceSetHandle set, std::uint32_t index,
+                        SP_DEVINFO_DATA& data) noexcept override;
+  Status EnumDeviceInterfaces(DeviceSetHandle set, const Guid& interfaceClass, std::uint32_t index,
+                              SP_DEVICE_INTERFACE_DATA& data) noexcept override;
+  Status GetDeviceInterfaceDetail(DeviceSetHandle set, const SP_DEVICE_INTERFACE_DATA& data,
+                                  void* detail, std::uint32_t detailBytes, std::uint32_t* required,
+                                  SP_DEVINFO_DATA* device) noexcept override;
+  Status GetDeviceInstanceId(DeviceSetHandle set, const SP_DEVINFO_DATA& data, char16_t* buffer,
+                             std::uint32_t bufferChars, std::uint32_t* required) noexcept override;
+  Status GetDeviceRegistryProperty(DeviceSetHandle set, const SP_DEVINFO_DATA& data,
+                                   std::uint32_t property, std::uint32_t* type, void* buffer,
+                                   std::uint32_t bufferBytes,
+                                   std::uint32_t* required) noexcept override;
+  Status DestroyDeviceInfoList(DeviceSetHandle set) noexcept override;
+  Status GetClassImageList(DeviceSetHandle& imageList) noexcept override;
+  Status GetClassImageIndex(DeviceSetHandle imageList, const Guid& classGuid,
+                            std::int32_t& index) noexcept override;
+  Status DestroyClassImageList(DeviceSetHandle imageList) noexcept override;
+  Status GetClassDescription(const Guid& classGuid, char16_t* buffer, std::uint32_t bufferChars,
+                             std::uint32_t* required) noexcept override;
+
+  // DeviceManager
+  Status LocateRootDevNode(DevInst& node) noexcept override;
+  Status GetParent(DevInst node, DevInst& parent) noexcept override;
+  Status GetChild(DevInst node, DevInst& child) noexcept override;
+  Status GetSibling(DevInst node, DevInst& sibling) noexcept override;
+  Status GetDeviceId(DevInst node, char16_t* buffer, std::uint32_t bufferChars) noexcept override;
+  Status GetDevNodeRegistryProperty(DevInst node, std::uint32_t property, std::uint32_t* type,
+                                    void* buffer, std::uint32_t& bytes) noexcept override;
+
+  // VolumeManager
+  Status FirstVolume(char16_t* name, std::uint32_t nameChars, FindHandle& search) noexcept override;
+  Status NextVolume(FindHandle search, char16_t* name, std::uint32_t nameChars) noexcept override;
+  Status CloseVolumeSearch(FindHandle search) noexcept override;
+  Status VolumePathNames(const char16_t* volumeName, char16_t* names, std::uint32_t namesChars,
+                         std::uint32_t& required) noexcept override;
+  Status VolumeNameForMountPoint(const char16_t* mountPoint, char16_t* name,
+                                 std::uint32_t nameChars) noexcept override;
+  std::uint32_t LogicalDriveStrings(std::uint32_t bufferChars, char16_t* buffer) noexcept override;
+  std::uint32_t DriveType(const char16_t* path) noexcept override;
+  Status VolumeInformation(const char16_t* path, char16_t* label, std::uint32_t labelChars,
+                           std::uint32_t& serial, std::uint32_t& fileSystemFlags,
+                           char16_t* fileSystem, std::uint32_t fileSystemChars) noexcept override;
+  Status FirstMountPoint(const char16_t* volumeName, char16_t* mountPoint,
+                         std::uint32_t mountPointChars, FindHandle& search) noexcept override;
+  Status NextMountPoint(FindHandle search, char16_t* mountPoint,
+                        std::uint32_t mountPointChars) noexcept override;
+  Status CloseMountPointSearch(FindHandle search) noexcept override;
+  Status DosDeviceTarget(const char16_t* name, char16_t* target,
+                         std::uint32_t targetChars) noexcept override;
+
+  // DebugOutput
+  void WriteDebugText(const char16_t* text) noexcept override;
+
+ private:
+  struct State;
+  std::unique_ptr<State> m_state;
+};
+
+}  // namespace platform::simulated
