@@ -21,7 +21,9 @@ function(zkusb_windows_module name)
   add_dependencies(${name} zkusb_type_library_file)
 
   # 32-bit names of the calling convention carry the bytes of their parameters; the exported ones do not.
-  target_link_options(${name} PRIVATE -s -Wl,--enable-stdcall-fixup -Wl,--kill-at)
+  target_link_options(${name} PRIVATE -s -Wl,--enable-stdcall-fixup -Wl,--kill-at
+                      -Wl,-Map=${CMAKE_BINARY_DIR}/symbols/${name}.map)
+  file(MAKE_DIRECTORY ${CMAKE_BINARY_DIR}/symbols)
   set_target_properties(${name} PROPERTIES
     PREFIX ""
     RUNTIME_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}

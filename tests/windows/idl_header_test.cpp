@@ -1,5 +1,6 @@
-// The header that clients include, against the one that the IDL compiler makes of the IDL: every slot, type and value,
-// as the machine has them. What has a name in only one of the two does not compile here.
+// The headers that programs include, against the one that the IDL compiler makes of the IDL: every slot, type and
+// value, as the machine has them. What has a name in only one of the two does not compile here. This file is compiled
+// twice: for the component's own header, and, with ZKUSB_HANDED_OUT, for those that other programs include.
 #include <windows.h>
 
 // What the made header includes has to be there before it stands in a namespace.
@@ -13,7 +14,13 @@
 #include <cstddef>
 #include <type_traits>
 
+#ifdef ZKUSB_HANDED_OUT
+#include <zkusb_monitor.h>
+#define ID_OF(name) __uuidof(::name)
+#else
 #include "com/zkusb_monitor.h"
+#define ID_OF(name) ::name::kIid
+#endif
 
 // clang-format off
 #define INTERFACES(X) \
@@ -64,8 +71,23 @@ namespace made {
 #define DECLARE(name) struct name;
 INTERFACES(DECLARE)
 #undef DECLARE
+struct IZKDeviceEventCallBack;
+class ZKUMEventNotifier;
+class ZKUMUsbTree;
 #include <zkusb_monitor_made.h>
 }  // namespace made
+
+#ifdef ZKUSB_HANDED_OUT
+// Here its constants are the namespace's own.
+#undef DECLSPEC_SELECTANY
+#define DECLSPEC_SELECTANY
+namespace in_c {
+#define DECLARE(name) struct name;
+INTERFACES(DECLARE)
+#undef DECLARE
+#include <zkusb_monitor_c.h>
+}  // namespace in_c
+#endif
 
 namespace {
 
@@ -86,6 +108,16 @@ struct Ours<T*> {
 INTERFACES(SAME_NAME)
 SAME_NAME(TDeviceEventType)
 SAME_NAME(_TUsbDeviceType)
+#ifdef ZKUSB_HANDED_OUT
+#define SAME_NAME_IN_C(name) \
+  template <>                \
+  struct Ours<in_c::name> {  \
+    using Type = ::name;     \
+  };
+INTERFACES(SAME_NAME_IN_C)
+SAME_NAME_IN_C(TDeviceEventType)
+SAME_NAME_IN_C(TUsbDeviceType)
+#endif
 
 // A method of the header as the entry of a table: the object comes first. Only the calling convention of COM fits.
 template <class Method>
@@ -123,7 +155,7 @@ constexpr std::size_t kIUnknownSlots = 3;
 TEST(IdlHeader, HasTheInterfacesOfTheHeader) {
   std::size_t methods = 0;
 #define COMPARE(name)                                                                                \
-  EXPECT_TRUE(made::IID_##name == ::name::kIid) << #name;                                            \
+  EXPECT_TRUE(made::IID_##name == ID_OF(name)) << #name;                                             \
   EXPECT_TRUE((std::is_base_of_v<IUnknown, ::name>)) << #name;                                       \
   EXPECT_EQ(offsetof(made::name##Vtbl, AddRef) / sizeof(void*), SlotOf(&::name::AddRef)) << #name;   \
   EXPECT_EQ(offsetof(made::name##Vtbl, Release) / sizeof(void*), SlotOf(&::name::Release)) << #name; \
@@ -160,5 +192,41 @@ TEST(IdlHeader, HasTheValuesOfTheHeader) {
   EXPECT_TRUE(made::CLSID_ZKUMUsbTree == ::CLSID_ZKUMUsbTree);
   EXPECT_TRUE(made::DIID_IZKDeviceEventCallBack == ::DIID_IZKDeviceEventCallBack);
 }
+
+#ifdef ZKUSB_HANDED_OUT
+TEST(IdlHeader, HasWhatTheHeaderForCHas) {
+#define COMPARE(name)                                                                           \
+  EXPECT_TRUE(made::IID_##name == in_c::IID_##name) << #name;                                   \
+  EXPECT_EQ(kSlots<made::name##Vtbl>, kSlots<in_c::name##Vtbl>) << #name;                       \
+  EXPECT_EQ(offsetof(made::name##Vtbl, Release), offsetof(in_c::name##Vtbl, Release)) << #name; \
+  EXPECT_EQ(sizeof(in_c::name), sizeof(void*)) << #name;
+  INTERFACES(COMPARE)
+#undef COMPARE
+#define COMPARE(name, method)                                                                              \
+  EXPECT_EQ(offsetof(made::name##Vtbl, method), offsetof(in_c::name##Vtbl, method)) << #name "::" #method; \
+  EXPECT_TRUE((std::is_same_v<OurEntry<decltype(made::name##Vtbl::method)>::Type,                          \
+                              OurEntry<decltype(in_c::name##Vtbl::method)>::Type>))                        \
+      << #name "::" #method;
+  METHODS(COMPARE)
+#undef COMPARE
+#define COMPARE(value) EXPECT_EQ(static_cast<int>(made::value), static_cast<int>(in_c::value)) << #value;
+  VALUES(COMPARE)
+#undef COMPARE
+  EXPECT_TRUE(made::LIBID_ZKUsbMonitorLib == in_c::LIBID_ZKUsbMonitorLib);
+  EXPECT_TRUE(made::CLSID_ZKUMEventNotifier == in_c::CLSID_ZKUMEventNotifier);
+  EXPECT_TRUE(made::CLSID_ZKUMUsbTree == in_c::CLSID_ZKUMUsbTree);
+  EXPECT_TRUE(made::DIID_IZKDeviceEventCallBack == in_c::DIID_IZKDeviceEventCallBack);
+}
+
+// The other ways to the identifiers: those of C++ itself, and constants.
+TEST(IdlHeader, GivesEachTypeItsIdentifier) {
+#define COMPARE(name) EXPECT_TRUE(made::IID_##name == ::IID_##name) << #name;
+  INTERFACES(COMPARE)
+#undef COMPARE
+  EXPECT_TRUE(made::CLSID_ZKUMEventNotifier == __uuidof(ZKUMEventNotifier));
+  EXPECT_TRUE(made::CLSID_ZKUMUsbTree == __uuidof(ZKUMUsbTree));
+  EXPECT_TRUE(made::DIID_IZKDeviceEventCallBack == __uuidof(IZKDeviceEventCallBack));
+}
+#endif
 
 }  // namespace
