@@ -7,6 +7,7 @@
 
 #include "platform/flat_index.h"
 #include "platform/text.h"
+#include "records/device_set.h"
 #include "records/received_text.h"
 
 namespace KelvoUHW {
@@ -14,6 +15,11 @@ namespace KelvoUHW {
 namespace {
 
 constexpr std::size_t kTextChars = 200;
+
+// Walks for one key before it is answered from one that broke off, and for all keys of a build.
+constexpr int kWalksInARow = 3;
+constexpr int kMostWalks = 300;
+
 using TextBuffer = std::array<char16_t, kTextChars>;
 
 // A text property of a node; nothing when the call fails.
@@ -38,15 +44,21 @@ std::u16string_view ClassOf(std::u16string_view key) noexcept {
 
 // Calls `visit` with each node, depth first from the root, until it returns true. The way up asks
 // the system for the parent: a node without one ends the walk, as the root does. No two nodes are
-// visited or climbed to twice, so the walk ends on a system that answers in circles.
+// visited or climbed to twice, so the walk ends on a system that answers in circles, and one on
+// which new nodes never end is left at kMostElements.
+//
+// False where a walk ended anywhere but at the root: a device that went while it was looked at has
+// neither sibling nor parent any more, and what comes behind it was not seen.
 template <class Visit>
-void WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
+bool WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
   platform::FlatNumberSet visited;
   platform::FlatNumberSet climbedTo;
-  platform::DevInst node = 0;
-  if (!manager.LocateRootDevNode(node) || node == 0) return;
-  while (visited.Insert(node)) {
-    if (visit(node)) return;
+  platform::DevInst root = 0;
+  if (!manager.LocateRootDevNode(root) || root == 0) return false;
+  platform::DevInst node = root;
+  for (std::uint32_t seen = 0; seen < kMostElements; ++seen) {
+    if (!visited.Insert(node)) return false;
+    if (visit(node)) return true;
     platform::DevInst next = 0;
     // A handle of 0 is no node, whatever the result code says.
     if (manager.GetChild(node, next) && next != 0) {
@@ -55,12 +67,13 @@ void WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
     }
     while (next = 0, !manager.GetSibling(node, next) || next == 0) {
       platform::DevInst parent = 0;
-      if (!manager.GetParent(node, parent) || parent == 0) return;
-      if (!climbedTo.Insert(parent)) return;
+      if (!manager.GetParent(node, parent) || parent == 0) return node == root;
+      if (!climbedTo.Insert(parent)) return false;
       node = parent;
     }
     node = next;
   }
+  return true;
 }
 
 }  // namespace
@@ -100,7 +113,7 @@ platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
 }
 
 platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
-  if (!m_filled) Fill();
+  for (int walks = 0; !m_complete && walks < kWalksInARow && m_walks < kMostWalks; ++walks) Fill();
   const std::u16string key = platform::ToLower(driverKey);
   const auto found =
       m_index.First(platform::HashOf(key), [&](auto entry) { return IsKeyOf(entry, key); });
@@ -108,13 +121,16 @@ platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
 }
 
 void DriverKeyIndex::Fill() {
-  WalkDevNodes(m_manager, [this](platform::DevInst node) {
+  m_nodes.clear();
+  m_rests.clear();
+  m_index.Clear();
+  ++m_walks;
+  m_complete = WalkDevNodes(m_manager, [this](platform::DevInst node) {
     if (const auto key = ReadTextProperty(m_manager, node, platform::kCM_DRP_DRIVER)) {
       Add(platform::ToLower(*key), node);
     }
     return false;
   });
-  m_filled = true;
 }
 
 // A key that an earlier node has is entered behind that one, and never found.

@@ -36,7 +36,9 @@ platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
                                          const std::u16string& driverKey);
 
 // The same answers from one walk over all nodes, made at the first question. One object serves one
-// build: it does not notice what changes afterwards.
+// build: it does not notice what changes afterwards. A walk that broke off at a device that went
+// meanwhile is no answer for the devices behind it: it is made again, and once more for each
+// further key until one comes to its end, as if every key were searched on its own.
 class DriverKeyIndex {
  public:
   explicit DriverKeyIndex(platform::DeviceManager& manager) noexcept : m_manager(manager) {}
@@ -61,7 +63,8 @@ class DriverKeyIndex {
   std::vector<std::u16string> m_classes;  // lower-cased
   platform::FlatIndex m_classIndex;
   platform::FlatIndex m_index;
-  bool m_filled = false;
+  bool m_complete = false;  // the walk that filled this came to its end
+  int m_walks = 0;
 };
 
 }  // namespace KelvoUHW

@@ -5,6 +5,10 @@
 #include <cstring>
 #include <map>
 #include <optional>
+#include <vector>
+
+#include "platform/wrappers/intercepting_host.h"
+#include "simulation/pc/simulated_pc.h"
 
 namespace KelvoUHW {
 namespace {
@@ -23,11 +27,16 @@ struct ScriptedManager final : platform::DeviceManager {
   };
   std::map<DevInst, Node> nodes;
   Link root = 1;
-  int calls = 0;
-  Status LocateRootDevNode(DevInst& out) noexcept override { return Give(root, out); }
-  Status GetParent(DevInst n, DevInst& out) noexcept override { return Give(nodes[n].parent, out); }
+  int calls = 0, walks = 0;
+  int brokenWalks = 0;  // so many walks end at node 4, which is gone as soon as its sibling is asked for
+  Status LocateRootDevNode(DevInst& out) noexcept override { return ++walks, Give(root, out); }
+  Status GetParent(DevInst n, DevInst& out) noexcept override {
+    return Give(n == 4 && walks <= brokenWalks ? Link() : nodes[n].parent, out);
+  }
   Status GetChild(DevInst n, DevInst& out) noexcept override { return Give(nodes[n].child, out); }
-  Status GetSibling(DevInst n, DevInst& out) noexcept override { return Give(nodes[n].sibling, out); }
+  Status GetSibling(DevInst n, DevInst& out) noexcept override {
+    return Give(n == 4 && walks <= brokenWalks ? Link() : nodes[n].sibling, out);
+  }
   Status GetDeviceId(DevInst n, char16_t* buffer, std::uint32_t chars) noexcept override {
     std::uint32_t bytes = chars * 2;
     return GiveText(nodes[n], nodes[n].id, buffer, bytes);
@@ -159,6 +168,44 @@ TEST(DriverKey, WalksEndOnEverySystem) {
     EXPECT_EQ(FindDevNodeByDriverKey(manager, u""), 0u) << what;
     EXPECT_EQ(DriverKeyIndex(manager).Find(u""), 0u) << what;
   }
+}
+
+// A walk that broke off tells nothing of the nodes behind the break, and is made again.
+TEST(DriverKey, AWalkThatBreaksOffIsNotKept) {
+  const std::tuple<int, std::vector<DevInst>, int> cases[] = {
+      // broken walks, answers for node 5, walks
+      {0, {5, 5}, 1}, {1, {5, 5}, 2}, {2, {5, 5}, 3}, {3, {0, 5, 5}, 4}, {5, {0, 5, 5}, 6}, {6, {0, 0, 5, 5}, 7}};
+  for (const auto& [broken, answers, walks] : cases) {
+    ScriptedManager manager;
+    manager.nodes = kSmallTree;
+    manager.brokenWalks = broken;
+    DriverKeyIndex index(manager);
+    for (const DevInst answer : answers) EXPECT_EQ(index.Find(u"twice"), answer) << broken;
+    EXPECT_EQ(manager.walks, walks);
+  }
+  // Where none ever comes to its end, what is before the break is found, and the walks are counted.
+  ScriptedManager manager;
+  manager.nodes = kSmallTree;
+  manager.brokenWalks = 1 << 30;
+  DriverKeyIndex index(manager);
+  for (int i = 0; i < 1000; ++i) EXPECT_EQ(index.Find(u"\u00C4\\4") * 10 + index.Find(u"twice"), 40u);
+  EXPECT_EQ(manager.walks, 300);
+}
+
+// Each node has a child that nobody has seen.
+TEST(DriverKey, NodesWithoutEndAreLeft) {
+  struct Endless final : platform::wrappers::InterceptingHost {
+    explicit Endless(platform::Host& base) : InterceptingHost(base) {}
+    Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
+    Status LocateRootDevNode(DevInst& out) noexcept override { return out = 1, Status::Success(); }
+    Status GetChild(DevInst node, DevInst& out) noexcept override { return out = node + 1, ++calls, Status::Success(); }
+    std::uint32_t calls = 0;
+  };
+  platform::simulated::SimulatedPc pc{platform::simulated::Machine()};
+  Endless endless(pc);
+  DriverKeyIndex index(endless);
+  EXPECT_EQ(index.Find(u"a") + index.Find(u"b"), 0u);
+  EXPECT_LE(endless.calls, 200'000u);
 }
 
 }  // namespace
