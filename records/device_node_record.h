@@ -8,7 +8,21 @@
 
 namespace KelvoUHW {
 
+// Copying and destroying are loops: how deep devices hang below each other is up to the PC.
+// Destroying allocates nothing.
 struct DeviceNodeRecord {
+  DeviceNodeRecord() = default;
+  DeviceNodeRecord(const DeviceNodeRecord& other);
+  DeviceNodeRecord(DeviceNodeRecord&&) noexcept = default;
+  DeviceNodeRecord& operator=(const DeviceNodeRecord& other) {
+    return *this = DeviceNodeRecord(other);
+  }
+  DeviceNodeRecord& operator=(DeviceNodeRecord&&) noexcept = default;
+  ~DeviceNodeRecord();
+
+  // A copy without the children.
+  DeviceNodeRecord OwnFields() const;
+
   platform::DevInst DevInst = 0;
   platform::DevInst ParentDevInst = 0;
   std::u16string InstanceId;

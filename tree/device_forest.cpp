@@ -144,7 +144,8 @@ class Forest {
     std::vector<DeviceNodeRecord> top;
     for (Index index = 0; index < m_records.size(); ++index) {
       if (m_places[index].parent == kNone && m_places[index].leadsToDisk) {
-        top.push_back(Take(index));
+        top.push_back(std::move(m_records[index]));
+        TakeWhatIsBelow(index, top.back());
       }
     }
     return top;
@@ -155,6 +156,7 @@ class Forest {
   static constexpr Index kNone = platform::FlatIndex::kNone;
   struct Place {
     Index parent = kNone;
+    Index above = kNone;  // the parent, or a record further up
     Index firstChild = kNone;
     Index lastChild = kNone;
     Index nextSibling = kNone;
@@ -178,7 +180,8 @@ class Forest {
     }
     const std::size_t parentHash = platform::HashOf(record.ParentDevInst);
     const Index parent = m_byHandle.First(parentHash, HasHandle(record.ParentDevInst));
-    if (parent != kNone && !IsBelow(parent, index)) {
+    // Parents that form a circle leave the record that closes it at the top.
+    if (parent != kNone && TopOf(parent) != index) {
       Adopt(parent, index);
     } else {
       m_waiting.Add(parentHash, index, WaitsFor(record.ParentDevInst));
@@ -190,13 +193,16 @@ class Forest {
     Place& place = m_places[parent];
     (place.lastChild == kNone ? place.firstChild : m_places[place.lastChild].nextSibling) = child;
     place.lastChild = child;
-    m_places[child].parent = parent;
+    m_places[child].parent = m_places[child].above = parent;
   }
 
-  // Parents that form a circle leave the record that closes it at the top.
-  bool IsBelow(Index index, Index above) const {
-    while (index != kNone && index != above) index = m_places[index].parent;
-    return index == above;
+  // The top-level record above a record, or itself. Shortens the way for the next one that asks: a
+  // chain of devices would take its length at each device.
+  Index TopOf(Index index) {
+    Index top = index;
+    while (m_places[top].above != kNone) top = m_places[top].above;
+    while (index != top) index = std::exchange(m_places[index].above, top);
+    return top;
   }
 
   void MarkWayTo(Index index) {
@@ -206,15 +212,25 @@ class Forest {
     }
   }
 
-  DeviceNodeRecord Take(Index index) {
-    DeviceNodeRecord record = std::move(m_records[index]);
-    for (Index child = m_places[index].firstChild; child != kNone;
-         child = m_places[child].nextSibling) {
-      if (m_places[child].leadsToDisk && !IsClass(m_records[child], u"USB")) {
-        record.Children.push_back(Take(child));
+  void TakeWhatIsBelow(Index top, DeviceNodeRecord& taken) {
+    struct Step {
+      Index index;
+      DeviceNodeRecord* record;
+    };
+    std::vector<Step> waiting{{top, &taken}};
+    while (!waiting.empty()) {
+      const auto [index, record] = waiting.back();
+      waiting.pop_back();
+      // All children first: a record stays where it is once its siblings are there.
+      std::size_t place = waiting.size();
+      for (Index child = m_places[index].firstChild; child != kNone;
+           child = m_places[child].nextSibling) {
+        if (!m_places[child].leadsToDisk || IsClass(m_records[child], u"USB")) continue;
+        record->Children.push_back(std::move(m_records[child]));
+        waiting.push_back({child, nullptr});
       }
+      for (DeviceNodeRecord& child : record->Children) waiting[place++].record = &child;
     }
-    return record;
   }
 
   std::vector<DeviceNodeRecord>& m_records;
@@ -222,6 +238,24 @@ class Forest {
   platform::FlatIndex m_byHandle;
   platform::FlatIndex m_waiting;  // top-level records, by the parent they wait for
 };
+
+// Calls `visit` with the records, a record before its children and both in their order; it returns
+// whether the children are wanted.
+template <class Visit>
+void VisitForest(const std::vector<DeviceNodeRecord>& forest, Visit visit) {
+  std::vector<const DeviceNodeRecord*> waiting;
+  const auto wait = [&waiting](const std::vector<DeviceNodeRecord>& level) {
+    for (auto record = level.rbegin(); record != level.rend(); ++record) {
+      waiting.push_back(&*record);
+    }
+  };
+  wait(forest);
+  while (!waiting.empty()) {
+    const DeviceNodeRecord& record = *waiting.back();
+    waiting.pop_back();
+    if (visit(record)) wait(record.Children);
+  }
+}
 
 // A node of the tree with the two ids of a record.
 template <class Node>
@@ -258,30 +292,22 @@ std::vector<DeviceNodeRecord> LinkDeviceForest(std::vector<DeviceNodeRecord> rec
 }
 
 void AddForestNodes(const std::vector<DeviceNodeRecord>& forest, CZKUMUsbTreeNodeImpl& root) {
-  for (const DeviceNodeRecord& record : forest) {
+  VisitForest(forest, [&root](const DeviceNodeRecord& record) {
     // Anywhere in the id and exact in case; whatever the class, it becomes a controller. This is
     // meant.
-    if (record.InstanceId.find(u"PCI\\") != std::u16string::npos) {
-      AddController(record, root);
-    } else {
-      AddForestNodes(record.Children, root);
-    }
-  }
+    if (record.InstanceId.find(u"PCI\\") == std::u16string::npos) return true;
+    AddController(record, root);
+    return false;
+  });
 }
 
 std::vector<DeviceNodeRecord> DiskDriveRecords(const std::vector<DeviceNodeRecord>& forest) {
   std::vector<DeviceNodeRecord> disks;
-  const auto collect = [&disks](const auto& self,
-                                const std::vector<DeviceNodeRecord>& level) -> void {
-    for (const DeviceNodeRecord& record : level) {
-      if (IsClass(record, u"DiskDrive")) {
-        disks.push_back(record);
-      } else {
-        self(self, record.Children);
-      }
-    }
-  };
-  collect(collect, forest);
+  VisitForest(forest, [&disks](const DeviceNodeRecord& record) {
+    if (!IsClass(record, u"DiskDrive")) return true;
+    disks.push_back(record);
+    return false;
+  });
   return disks;
 }
 

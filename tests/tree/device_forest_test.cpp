@@ -189,5 +189,30 @@ TEST(ForestNodes, DiskDriveRecordsAreCopiedAsFoundFirst) {
   EXPECT_EQ(ToText(forest), "a(d(e(f)) b(g)) h");
 }
 
+// A recursion anywhere would end in a stack overflow, a climb at each device in minutes.
+TEST(DeviceForest, ChainsAreLoopsHoweverLong) {
+  constexpr platform::DevInst kLength = 50'000;
+  for (const bool parentsFirst : {true, false}) {
+    for (const bool disksOnly : {true, false}) {
+      Records records(kLength);
+      for (platform::DevInst i = 0; i < kLength; ++i) {
+        DeviceNodeRecord& record = records[parentsFirst ? i : kLength - 1 - i];
+        record.DevInst = i + 1;
+        record.ParentDevInst = i;
+        record.ClassName = disksOnly || i + 1 == kLength ? u"DiskDrive" : u"System";
+      }
+      Records forest = LinkDeviceForest(std::move(records));
+      const auto root = MakeRecord<CZKUMUsbTreeRootImpl>();
+      AddForestNodes(forest, *root);
+      const Records disks = DiskDriveRecords(forest);
+      forest = disks;
+      std::size_t depth = 0;
+      for (const Records* level = &forest; !level->empty(); level = &level->front().Children) ++depth;
+      EXPECT_EQ(depth, disksOnly ? kLength : 1);
+      EXPECT_EQ(root->m_childs.size() + disks.size(), 1u);
+    }
+  }
+}
+
 }  // namespace
 }  // namespace KelvoUHW
