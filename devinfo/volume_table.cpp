@@ -25,6 +25,8 @@ constexpr std::uint32_t kPathNamesChars = 7800;
 constexpr std::uint32_t kPathNamesCharsLimit = 1U << 20;
 constexpr int kPathNamesCallsLimit = 8;
 constexpr std::uint32_t kDriveStringsCharsLimit = 1U << 16;
+// Of all lists together. A table is filled with a lock held that the whole process waits for.
+constexpr std::size_t kTableCharsLimit = std::size_t{1} << 24;
 
 // Texts one behind the other; an empty one or one without its zero ends the list.
 std::vector<std::u16string> SplitTexts(std::span<const char16_t> buffer) {
@@ -52,7 +54,7 @@ class VolumeTableBuilder {
   VolumeTable Build() {
     NameBuffer name{};
     VolumeSearch search(m_volumes);
-    for (Status found = search.First(name.data(), kNameChars); found;
+    for (Status found = search.First(name.data(), kNameChars); found && TakeStep();
          found = search.Next(name.data(), kNameChars)) {
       const auto text = ReceivedText(name);
       if (!text) break;
@@ -63,9 +65,21 @@ class VolumeTableBuilder {
   }
 
  private:
+  // A volume or a path more: those of a system that always has another are left at kMostElements.
+  bool TakeStep() noexcept { return m_steps++ < kMostElements && m_chars < kTableCharsLimit; }
+
+  bool Enter(const std::u16string& path, const std::u16string& volumeName) {
+    m_chars += path.size() + volumeName.size();
+    if (!TakeStep()) return false;
+    m_table.Enter(path, volumeName);
+    return true;
+  }
+
   void EnterVolume(const std::u16string& volumeName) {
     if (const auto paths = ReadPathNames(volumeName)) {
-      for (const std::u16string& path : *paths) m_table.Enter(path, volumeName);
+      for (const std::u16string& path : *paths) {
+        if (!Enter(path, volumeName)) return;
+      }
     } else {
       EnterFolders(volumeName);
     }
@@ -104,7 +118,7 @@ class VolumeTableBuilder {
       const auto mounted = VolumeNameOf(m_volumes, path);
       // This is meant: a folder whose volume is not known ends the search of this volume.
       if (!mounted) return;
-      m_table.Enter(path, *mounted);
+      if (!Enter(path, *mounted)) return;
       folder.fill(u'\0');
     }
   }
@@ -136,6 +150,8 @@ class VolumeTableBuilder {
   std::vector<char16_t> m_pathNames = std::vector<char16_t>(kPathNamesChars);
   std::unordered_map<std::u16string, std::u16string> m_rootOfVolume;  // lower-cased key
   bool m_rootsRead = false;
+  std::uint32_t m_steps = 0;
+  std::size_t m_chars = 0;
 };
 
 }  // namespace

@@ -14,13 +14,17 @@ namespace KelvoUHW {
 
 namespace {
 
+// Twice the longest name there is, in bytes.
+constexpr std::uint32_t kMostNameBytes = 1U << 17;
+
 // A second buffer for a name, zeroed, of the size the driver asked for. The size is the driver's
-// word alone: the system zeroes a large buffer page by page as it is used, and no memory at all is
-// an empty name rather than an error.
+// word alone: beyond what any name can have, and where there is no memory, there is no buffer and
+// the name is empty.
 class NameBuffer {
  public:
   explicit NameBuffer(std::uint32_t size) noexcept
-      : m_bytes(static_cast<std::uint8_t*>(std::calloc(size, 1))), m_size(size) {}
+      : m_bytes(size > kMostNameBytes ? nullptr : static_cast<std::uint8_t*>(std::calloc(size, 1))),
+        m_size(size) {}
 
   explicit operator bool() const noexcept { return m_bytes != nullptr; }
   std::uint8_t* Data() noexcept { return m_bytes.get(); }

@@ -13,6 +13,8 @@ namespace KelvoUHW {
 namespace {
 
 constexpr std::int32_t kLegacyNames = 10;
+// Far beyond any PC: hubs that a driver makes up for ever are left there.
+constexpr std::size_t kMostHubs = 20'000;
 
 }  // namespace
 
@@ -41,6 +43,7 @@ void CZKUMTopologyWalker::StartWalk() {
   m_previous = m_current;
   m_nConnectedDevices = 0;
   m_nConnectedHubs = 0;
+  m_nPorts = 0;
   m_building = MakeRecord<CZKUMUsbTreeRootImpl>();
   m_driverKeys.reset();
   m_hubPaths.clear();
@@ -147,7 +150,7 @@ bool CZKUMTopologyWalker::OpenHub(HubPath& path, const std::u16string& symbolicN
   // A hub hangs in one place. A driver that names it in several, or below itself, would make the
   // walk as long as it likes.
   std::u16string loweredPath = platform::ToLower(hub.m_strPathName);
-  if (m_hubPaths.contains(loweredPath)) return false;
+  if (m_hubPaths.size() >= kMostHubs || m_hubPaths.contains(loweredPath)) return false;
   if (!entry->file.Open(hub.m_strPathName, platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE) ||
       !GetNodeInformation(m_host, entry->file.Get(), hub.m_nodeInformation)) {
     return false;
@@ -162,7 +165,8 @@ bool CZKUMTopologyWalker::OpenHub(HubPath& path, const std::u16string& symbolicN
 NodePtr CZKUMTopologyWalker::EnumeratePorts(HubPath& path) {
   for (;;) {
     HubOnTheWay& here = *path.back();
-    if (here.nextPort <= here.hub->NumberOfPorts()) {
+    if (here.nextPort <= here.hub->NumberOfPorts() && m_nPorts < kMostElements) {
+      ++m_nPorts;
       BuildPort(path, here.nextPort++);
       continue;
     }

@@ -69,6 +69,7 @@ class CZKUMTopologyWalker {
   DriverKeyIndex& DriverKeys();
 
   std::optional<DriverKeyIndex> m_driverKeys;  // of the running walk
+  std::uint32_t m_nPorts = 0;                  // of the running walk
   // Paths of the hubs met in the running walk, lower-cased.
   std::unordered_set<std::u16string> m_hubPaths;
 };

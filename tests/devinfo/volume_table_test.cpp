@@ -124,5 +124,57 @@ TEST(VolumeTable, ListsThatDoNotFit) {
   EXPECT_EQ(ReadDriveRoots(greedy), Texts{});
 }
 
+// Has another volume after each, or another folder, or path names without end.
+struct EndlessVolumes final : platform::wrappers::InterceptingHost {
+  using InterceptingHost::InterceptingHost;
+  enum Kind { kVolumes, kFolders, kNames } kind = kVolumes;
+  int calls = 0;
+  Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
+  Status FirstVolume(char16_t* name, std::uint32_t chars, platform::FindHandle& search) noexcept override {
+    return search = 1, NextVolume(search, name, chars);
+  }
+  Status NextVolume(platform::FindHandle, char16_t* name, std::uint32_t) noexcept override {
+    if (++calls > 1 && kind == kFolders) return Status::Failure(18);
+    return name[0] = u'V', Status::Success();
+  }
+  Status CloseVolumeSearch(platform::FindHandle) noexcept override { return Status::Success(); }
+  Status VolumePathNames(const char16_t*, char16_t* names, std::uint32_t chars,
+                         std::uint32_t& required) noexcept override {
+    if (kind == kFolders) return Status::Failure(1);
+    required = kind == kNames ? 1U << 20 : chars;
+    if (required > chars) return Status::Failure(platform::kERROR_MORE_DATA);
+    for (std::uint32_t i = 0; i < required; ++i) names[i] = i % 4 != 3 && i + 4 < required ? u'x' : u'\0';
+    return Status::Success();
+  }
+  std::uint32_t DriveType(const char16_t*) noexcept override { return platform::kDRIVE_FIXED; }
+  Status VolumeInformation(const char16_t*, char16_t*, std::uint32_t, std::uint32_t&, std::uint32_t& flags, char16_t*,
+                           std::uint32_t) noexcept override {
+    return flags = platform::kFILE_SUPPORTS_REPARSE_POINTS, Status::Success();
+  }
+  Status FirstMountPoint(const char16_t*, char16_t* folder, std::uint32_t chars,
+                         platform::FindHandle& search) noexcept override {
+    return search = 1, NextMountPoint(search, folder, chars);
+  }
+  Status NextMountPoint(platform::FindHandle, char16_t* folder, std::uint32_t) noexcept override {
+    return ++calls, folder[0] = u'F', Status::Success();
+  }
+  Status CloseMountPointSearch(platform::FindHandle) noexcept override { return Status::Success(); }
+  Status VolumeNameForMountPoint(const char16_t*, char16_t* name, std::uint32_t) noexcept override {
+    return name[0] = u'V', Status::Success();
+  }
+};
+
+TEST(VolumeTable, ListsWithoutEndAreLeft) {
+  SimulatedPc pc(EmptyPc());
+  for (const auto kind : {EndlessVolumes::kVolumes, EndlessVolumes::kFolders, EndlessVolumes::kNames}) {
+    EndlessVolumes endless(pc);
+    endless.kind = kind;
+    const VolumeTable table = BuildVolumeTable(endless);
+    EXPECT_LE(endless.calls, 200'002) << kind;
+    EXPECT_LE(table.Paths.size(), 200'000u);
+    EXPECT_GT(table.Paths.size(), 100'000u);
+  }
+}
+
 }  // namespace
 }  // namespace KelvoUHW

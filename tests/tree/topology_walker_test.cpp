@@ -236,8 +236,8 @@ TEST(Walk, PortsThatFailCostThemselvesAlone) {
   }
 }
 
-// Chains of hubs have no limit. A driver that names its hubs on every port would otherwise make the
-// walk grow with each of them.
+// Chains of hubs have no limit that a PC could reach. A driver that names its hubs on every port would otherwise make
+// the walk grow with each of them.
 TEST(Walk, AHubIsWalkedOnce) {
   for (const auto& [hubs, ports] : {std::pair(12u, 12u), std::pair(3000u, 1u)}) {
     Machine machine = OneController(0);
@@ -258,6 +258,46 @@ TEST(Walk, AHubIsWalkedOnce) {
     EXPECT_EQ(Count(walker.m_building, IsHub), hubs + 1);
     EXPECT_EQ(host.Count(Operation::OpenDevice), 10 + hubs + 1);
   }
+}
+
+// Every port of every hub has a hub that nobody has seen. Opened hubs have numbers from kHub on.
+struct EndlessHubs final : ScriptedDriver {
+  static constexpr platform::FileHandle kHub = 1 << 20;
+  using ScriptedDriver::ScriptedDriver;
+  platform::Status OpenDevice(const char16_t* path, std::uint32_t access, std::uint32_t share,
+                              platform::FileHandle& handle) noexcept override {
+    if (Text(path).starts_with(u"\\\\.\\HCD")) return ScriptedDriver::OpenDevice(path, access, share, handle);
+    return handle = kHub + ++hubs, platform::Status::Success();
+  }
+  platform::Status CloseDevice(platform::FileHandle handle) noexcept override {
+    closed += handle >= kHub ? 1 : 0;
+    return handle >= kHub ? platform::Status::Success() : ScriptedDriver::CloseDevice(handle);
+  }
+  platform::Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
+                                 void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
+    if (handle < kHub) return ScriptedDriver::DeviceControl(handle, code, in, inBytes, out, outBytes, returned);
+    if (code == platform::kIOCTL_USB_GET_NODE_INFORMATION) {
+      static_cast<platform::USB_NODE_INFORMATION*>(out)->HubDescriptor.bNumberOfPorts = 255;
+    } else if (code == platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION) {
+      static_cast<platform::LegacyConnectionInformation*>(out)->Info.DeviceIsHub = 1;
+    } else if (code == platform::kIOCTL_USB_GET_NODE_CONNECTION_NAME) {
+      const Text name = platform::Decimal(++names);
+      return NameAnswer(8, 100, name, static_cast<std::uint32_t>(8 + name.size() * 2))(in, out, outBytes, returned);
+    }
+    return platform::Status::Success();
+  }
+  platform::FileHandle hubs = 0, closed = 0;
+  std::int32_t names = 0;
+};
+
+TEST(Walk, HubsWithoutEndAreLeft) {
+  SimulatedPc pc(OneController(0));
+  EndlessHubs endless(pc);
+  CZKUMTopologyWalker walker(endless);
+  walker.StartWalk();
+  EXPECT_EQ(endless.hubs, 20'000);
+  EXPECT_EQ(endless.closed, 20'000);
+  EXPECT_EQ(Count(walker.m_building, [](const auto& node) { return node.m_nType == KUDTHubPort; }), 200'000u);
 }
 
 }  // namespace
