@@ -8,6 +8,7 @@
 #include <fstream>
 #include <functional>
 #include <nlohmann/json.hpp>
+#include <random>
 #include <sstream>
 
 #include "platform/text.h"
@@ -63,13 +64,19 @@ inline Json LoadJson(const std::filesystem::path& path) {
   return Json::parse(stream);
 }
 
+// A path that no other run of the tests uses at the same time; what stands there is the caller's to remove.
+inline std::string UniquePath(const std::u8string& tail) {
+  static const std::string run = std::to_string(std::random_device()()) + std::to_string(std::random_device()());
+  static int count = 0;
+  const std::filesystem::path folder(testing::TempDir());
+  return (folder / ("zkusb-" + run + "-" + std::to_string(++count))).string() + std::string(tail.begin(), tail.end());
+}
+
 // A file that is gone with its owner.
 class TemporaryFile {
  public:
   explicit TemporaryFile(const std::string& text) {
-    static int count = 0;
-    const auto* test = testing::UnitTest::GetInstance()->current_test_info();
-    m_path = testing::TempDir() + "zkusb-" + test->test_suite_name() + test->name() + std::to_string(++count);
+    m_path = UniquePath(u8"");
     std::ofstream(m_path, std::ios::binary) << text;
   }
   ~TemporaryFile() { std::filesystem::remove(m_path); }

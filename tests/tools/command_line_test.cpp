@@ -29,6 +29,10 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
       {{"find", "--vendor", "0x0x1"}, usage, "hexadecimal"},
       {{"find", "--vendor", "781", "--product", "zz"}, usage, "--product: \"zz\""},
       {{"watch"}, usage, "watch needs --script FILE"},
+      {{"watch", "--for", "nan"}, usage, "nan is not a number"},
+      {{"watch", "--for", "-NAN"}, usage, "-NAN is not a number"},
+      {{"watch", "--for", "inf"}, usage, "--for"},
+      {{"watch", "--for", "86401"}, usage, "--for"},
       {{"tree", "--machine", "/no/such/file"}, "/no/such/file: ", "cannot be read"},
       {{"tree", "--machine", noJson.Path()}, noJson.Path() + ": ", "line 1, column 16"},
       {{"watch", "--machine", bogus, "--script", noSteps.Path()},
@@ -52,6 +56,13 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
 TEST(CommandLine, SaysWhatWasNotFound) {
   const TemporaryFile storageOnly(ChangedMachine([](Json& machine) { machine.erase("hostControllers"); }));
   const TemporaryFile controllersOnly(ChangedMachine([](Json& machine) { machine.erase("hubs"); }));
+  // A controller and its root hub, with nothing plugged in.
+  const TemporaryFile nothingPlugged(R"({
+    "devices": [{"id": "ACPI\\A"},
+                {"id": "PCI\\VEN_8086&DEV_1C26&SUBSYS_0&REV_05\\1", "parent": "ACPI\\A", "driver": "K", "description": "EHCI"},
+                {"id": "USB\\ROOT_HUB20\\1", "parent": "PCI\\VEN_8086&DEV_1C26&SUBSYS_0&REV_05\\1", "service": "usbhub"}],
+    "hostControllers": [{"names": ["\\\\.\\HCD0"], "driverKey": "K", "rootHub": "HUB"}],
+    "hubs": [{"name": "HUB", "ports": [{}, {}]}]})");
   const TemporaryFile noStick(
       R"({"steps": [{"wait": true}, {"unplug": "USB\\VID_0781&PID_5580\\AA010603160707470215"}]})");
   const std::string noController = "zkusb: no USB host controller found\n";
@@ -59,7 +70,9 @@ TEST(CommandLine, SaysWhatWasNotFound) {
       {{"dump", "--machine", storageOnly.Path()}, noController, ""},
       {{"tree", "--machine", storageOnly.Path()}, noController, ""},
       {{"volumes", "--machine", storageOnly.Path(), "--json"}, noController, ""},
-      {{"find", "--vendor", "781", "--machine", controllersOnly.Path()}, noController, ""},
+      {{"find", "--vendor", "781", "--machine", controllersOnly.Path()}, "zkusb: no USB hub found\n", ""},
+      {{"tree", "--machine", nothingPlugged.Path()}, "zkusb: no USB device found\n", ""},
+      {{"volumes", "--machine", nothingPlugged.Path(), "--json"}, "zkusb: no USB device found\n", ""},
       {{"find", "--vendor", "0781", "--product", "5581"}, "zkusb: no device 0781:5581\n", ""},
       {{"find", "--vendor", "1", "--json"}, "zkusb: no device of vendor 0001\n", "[]\n"},
 #ifndef _WIN32  // where scripts play in real time, for watch alone
@@ -90,9 +103,10 @@ TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
   EXPECT_THAT(Output({"find", "--help"}), HasSubstr("--product HEX"));
 
   // File names are UTF-8.
-  const std::filesystem::path copy = std::filesystem::path(testing::TempDir()) / u8"zkusb-\u00E9\u4E2D.json";
+  const std::string copyName = UniquePath(u8"\u00E9\u4E2D.json");
+  const std::filesystem::path copy(std::u8string(copyName.begin(), copyName.end()));
   std::filesystem::copy_file(file, copy, std::filesystem::copy_options::overwrite_existing);
-  EXPECT_EQ(Output({"tree", "--json", "--machine", copy.string()}), expected);
+  EXPECT_EQ(Output({"tree", "--json", "--machine", copyName}), expected);
   std::filesystem::remove(copy);
 }
 

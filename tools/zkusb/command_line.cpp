@@ -64,7 +64,11 @@ CommandLine ParseCommandLine(const std::vector<std::string>& args) {
   command("watch", "Play a script and tell what comes and goes", Command::kWatch)
       ->add_option("--for", seconds, "Watch so long behind the script's end")
       ->type_name("SECONDS")
-      ->check(CLI::Range(0.0, 86400.0));
+      ->check(CLI::Range(0.0, 86400.0))
+      // "nan" is neither below nor above it.
+      ->check([](const std::string& text) {
+        return text.find_first_of("nN") == text.npos ? "" : text + " is not a number";
+      });
   command("register", "Register the component and show what that writes", Command::kRegister);
   command("unregister", "Take the registration back and show what goes", Command::kUnregister);
 

@@ -1,5 +1,6 @@
 #include "tools/zkusb/run.h"
 
+#include <algorithm>
 #include <exception>
 #include <optional>
 
@@ -24,8 +25,14 @@ int LookOnce(const Options& options, Pc& pc, Writer& out, Writer& errors) {
   pc.ApplyAll();
   const Component component([](TDeviceEventType, IZKUMUsbTreeNode&) {});
   const std::optional<NodeView> root = component.Root();
-  if (!root || !HasUsbController(*root)) {
-    Complain(errors, u"no USB host controller found");
+  // Before something was found the component shows no tree at all, not even the controllers.
+  if (!root) {
+    Complain(errors, u"no USB device found");
+    return kNothingFound;
+  }
+  if (!HasUsbController(*root)) {
+    const bool any = std::ranges::any_of(root->Childs, IsUsbController);
+    Complain(errors, any ? u"no USB hub found" : u"no USB host controller found");
     return kNothingFound;
   }
   switch (options.command) {
