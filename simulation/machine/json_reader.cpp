@@ -1,6 +1,7 @@
 #include "simulation/machine/json_reader.h"
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <charconv>
 #include <filesystem>
@@ -15,6 +16,8 @@ namespace {
 
 constexpr std::size_t kMostBytes = std::size_t{64} << 20;
 constexpr std::size_t kMostLevels = 16;
+// A document takes many times the memory of its bytes where these are all small values.
+constexpr std::size_t kMostValues = 2'000'000;
 constexpr std::size_t kMostShown = 250;
 
 bool IsContinuation(char byte) { return (static_cast<unsigned char>(byte) & 0xC0) == 0x80; }
@@ -50,6 +53,28 @@ std::string LineAndColumn(std::string_view bytes, std::size_t offset) {
   return "line " + std::to_string(lines + 1) + ", column " + std::to_string(characters + 1);
 }
 
+// "; expected WHAT" at the end of the parser's message, where it is the parser's: the text last
+// read stands before it and may look the same.
+std::string ExpectedPart(std::string_view reason) {
+  static constexpr std::array<std::string_view, 11> kNames = {"'['",
+                                                              "'{'",
+                                                              "']'",
+                                                              "'}'",
+                                                              "':'",
+                                                              "','",
+                                                              "end of input",
+                                                              "string literal",
+                                                              "number literal",
+                                                              "'[', '{', or a literal",
+                                                              "object key"};
+  for (const std::string_view name : kNames) {
+    std::string part("; expected ");
+    part += name;
+    if (reason.ends_with("'" + part)) return part;
+  }
+  return {};
+}
+
 // What is left of the parser's message without its number, its position and the text it last read,
 // which may be a whole malformed string.
 std::string ParserReason(std::string_view what) {
@@ -58,9 +83,9 @@ std::string ParserReason(std::string_view what) {
       position == std::string_view::npos ? what.find("] ") : what.find(": ", position);
   std::string reason(start == std::string_view::npos ? what : what.substr(start + 2));
   if (const std::size_t last = reason.find("; last read: "); last != std::string::npos) {
-    const std::size_t expected = reason.rfind("; expected ");
-    reason.erase(last, expected == std::string::npos || expected < last ? std::string::npos
-                                                                        : expected - last);
+    const std::string expected = ExpectedPart(reason);
+    reason.resize(last);
+    reason += expected;
   }
   return ToUtf8(FromUtf8(reason));
 }
@@ -102,6 +127,8 @@ class DocumentBuilder final : public nlohmann::json_sax<Json> {
 
  private:
   Json* Add(Json&& value) {
+    if (++m_values > kMostValues)
+      FailAt(m_file, PlaceOfOpen(), "the file has more than 2000000 values");
     if (m_open.empty()) {
       m_root = std::move(value);
       return &m_root;
@@ -149,6 +176,7 @@ class DocumentBuilder final : public nlohmann::json_sax<Json> {
   std::string_view m_bytes;
   const std::string& m_file;
   Json m_root;
+  std::size_t m_values = 0;
   std::vector<Json*> m_open;  // stays valid: only the innermost container grows
   std::vector<std::string> m_keys;
 };

@@ -24,41 +24,49 @@ std::u16string_view HandleTable::KindName(std::size_t kind) {
 std::intptr_t HandleTable::Open(OpenObject object, const Text& name) {
   const auto known = m_nameNumbers.try_emplace(name, static_cast<std::uint32_t>(m_names.size()));
   if (known.second) m_names.push_back(name);
+  const std::uint32_t number = known.first->second;
   const std::intptr_t handle =
-      kFirstHandle + kHandleStep * static_cast<std::intptr_t>(m_slots.size());
-  m_slots.push_back({static_cast<std::uint32_t>(object.index()), known.first->second});
-  m_open.emplace(handle, std::move(object));
+      kFirstHandle + kHandleStep * static_cast<std::intptr_t>(m_handedOut++);
+  m_slots.push_back({static_cast<std::uint32_t>(object.index()), number});
+  if (m_slots.size() > kRemembered) m_slots.pop_front();
+  m_open.emplace(handle, OpenEntry{std::move(object), number});
   return handle;
 }
 
-const HandleTable::Slot* HandleTable::SlotOf(std::intptr_t handle) const {
-  if (handle < kFirstHandle || (handle - kFirstHandle) % kHandleStep != 0) return nullptr;
-  const auto number = static_cast<std::size_t>((handle - kFirstHandle) / kHandleStep);
-  return number < m_slots.size() ? &m_slots[number] : nullptr;
+bool HandleTable::WasHandedOut(std::intptr_t handle) const {
+  if (handle < kFirstHandle || (handle - kFirstHandle) % kHandleStep != 0) return false;
+  return static_cast<std::uint64_t>((handle - kFirstHandle) / kHandleStep) < m_handedOut;
 }
 
-Text HandleTable::Describe(std::intptr_t handle) const {
-  const Slot& slot = *SlotOf(handle);
-  Text text(KindName(slot.kind));
-  const Text& name = m_names[slot.name];
-  return name.empty() ? text : text + u" " + name;
+Text HandleTable::Describe(std::size_t kind, std::uint32_t name) const {
+  Text text(KindName(kind));
+  return m_names[name].empty() ? text : text + u" " + m_names[name];
+}
+
+Text HandleTable::DescribeClosed(std::intptr_t handle) const {
+  const auto number = static_cast<std::uint64_t>((handle - kFirstHandle) / kHandleStep);
+  const std::uint64_t first = m_handedOut - m_slots.size();
+  if (number < first) return u"what was closed long ago";
+  const Slot& slot = m_slots[static_cast<std::size_t>(number - first)];
+  return Describe(slot.kind, slot.name);
 }
 
 Status HandleTable::Refuse(std::intptr_t handle, std::u16string_view closedAs) {
-  const Slot* slot = SlotOf(handle);
-  if (slot == nullptr) {
-    m_misuses.push_back(u"close of what never was a handle, as " + Text(closedAs));
-  } else if (!m_open.contains(handle)) {
-    m_misuses.push_back(u"second close of " + Describe(handle));
+  if (const auto open = m_open.find(handle); open != m_open.end()) {
+    const auto& [object, name] = open->second;
+    m_misuses.push_back(u"close of " + Describe(object.index(), name) + u" as " + Text(closedAs));
+  } else if (WasHandedOut(handle)) {
+    m_misuses.push_back(u"second close of " + DescribeClosed(handle));
   } else {
-    m_misuses.push_back(u"close of " + Describe(handle) + u" as " + Text(closedAs));
+    m_misuses.push_back(u"close of what never was a handle, as " + Text(closedAs));
   }
   return Status::Failure(kERROR_INVALID_HANDLE);
 }
 
 OpenCounts HandleTable::Counts() const {
   OpenCounts counts;
-  for (const auto& [handle, object] : m_open) {
+  for (const auto& [handle, open] : m_open) {
+    const OpenObject& object = open.object;
     if (std::holds_alternative<OpenFile>(object)) {
       ++counts.files;
     } else if (std::holds_alternative<OpenSet>(object)) {
@@ -74,7 +82,9 @@ OpenCounts HandleTable::Counts() const {
 
 std::vector<Text> HandleTable::OpenNames() const {
   std::vector<Text> names;
-  for (const auto& [handle, object] : m_open) names.push_back(Describe(handle));
+  for (const auto& [handle, open] : m_open) {
+    names.push_back(Describe(open.object.index(), open.name));
+  }
   return names;
 }
 

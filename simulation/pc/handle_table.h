@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <deque>
 #include <map>
 #include <memory>
 #include <string>
@@ -40,7 +41,8 @@ struct MountPointSearch {
 using OpenObject = std::variant<OpenFile, OpenSet, OpenImageList, VolumeSearch, MountPointSearch>;
 
 // Handles are handed out once and never again, whatever their kind, so that a late use of a closed
-// one is always found out. Not thread-safe: the PC's lock guards it.
+// one is always found out; what it was is remembered of the latest handles only, or a long run
+// would fill the memory. Not thread-safe: the PC's lock guards it.
 class HandleTable {
  public:
   // `name` says what was opened; it outlives the object, for the report of a second close.
@@ -50,7 +52,7 @@ class HandleTable {
   template <class Object>
   Object* Find(std::intptr_t handle) {
     const auto found = m_open.find(handle);
-    return found == m_open.end() ? nullptr : std::get_if<Object>(&found->second);
+    return found == m_open.end() ? nullptr : std::get_if<Object>(&found->second.object);
   }
 
   // Refuses, and remembers, a handle that is not open or is of another kind.
@@ -64,8 +66,8 @@ class HandleTable {
 
   template <class Visitor>
   void ForEachFile(Visitor visit) {
-    for (auto& [handle, object] : m_open) {
-      if (auto* file = std::get_if<OpenFile>(&object)) visit(*file);
+    for (auto& [handle, open] : m_open) {
+      if (auto* file = std::get_if<OpenFile>(&open.object)) visit(*file);
     }
   }
 
@@ -81,13 +83,21 @@ class HandleTable {
     std::uint32_t kind;  // index into OpenObject
     std::uint32_t name;  // index into m_names
   };
-  const Slot* SlotOf(std::intptr_t handle) const;
-  Text Describe(std::intptr_t handle) const;
+  struct OpenEntry {
+    OpenObject object;
+    std::uint32_t name;
+  };
+  static constexpr std::size_t kRemembered = 4096;
 
-  std::vector<Slot> m_slots;  // of every handle ever handed out, closed ones too
+  bool WasHandedOut(std::intptr_t handle) const;
+  Text Describe(std::size_t kind, std::uint32_t name) const;
+  Text DescribeClosed(std::intptr_t handle) const;
+
+  std::uint64_t m_handedOut = 0;
+  std::deque<Slot> m_slots;   // of the latest handles, closed ones too
   std::vector<Text> m_names;  // each name once: a long run opens the same few over and over
   std::unordered_map<Text, std::uint32_t> m_nameNumbers;
-  std::map<std::intptr_t, OpenObject> m_open;
+  std::map<std::intptr_t, OpenEntry> m_open;
   std::vector<Text> m_misuses;
 };
 

@@ -33,6 +33,13 @@ TEST(MachineFile, RefusesEachMistakeWithItsPlace) {
        "line 2, column 16: syntax error while parsing object - invalid literal; expected '}'"},
       {"{\"name\": \"\xC3\x28\"}",
        "line 1, column 12: syntax error while parsing value - invalid string: ill-formed UTF-8 byte"},
+      // What was read last may look like a part of the reason, and is no part of it.
+      {"{\"name\": \"a; expected secret\x01\"}",
+       "line 1, column 29: syntax error while parsing value - invalid string: control character U+0001 (SOH) must be "
+       "escaped to \\u0001"},
+      {"{\"name\": \"'; expected secret\" \"'; expected secret\"}",
+       "line 1, column 50: syntax error while parsing object - unexpected string literal; expected '}'"},
+      {R"({"notes": [)" + Repeated("\"\",", 2'000'000) + "]}", "notes: the file has more than 2000000 values"},
       {std::string("{}\0{}", 5), "line 1, column 3: unexpected zero byte"},
       {Repeated("[", 100000), Repeated("[0]", 15) + ": is nested too deeply (at most 16 levels)"},
       {R"({"devices": [{"id": ")" + std::string(200, 'A') + R"("}]})", "devices[0].id: is longer than 199 characters"},
