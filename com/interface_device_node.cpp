@@ -16,33 +16,42 @@ void CZKUMInterfaceDevice::SetImpl(const NodePtr& node) noexcept {
 }
 
 HRESULT CZKUMInterfaceDevice::get_VolumeName(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_device->VolumeName); });
+  return ReadTextOf(m_device, E_POINTER, pVal,
+                    [](const auto& record) { return std::u16string_view(record.VolumeName); });
 }
 
 HRESULT CZKUMInterfaceDevice::get_VendorId(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_device->StorageVendorId); });
+  return ReadTextOf(m_device, E_POINTER, pVal,
+                    [](const auto& record) { return std::u16string_view(record.StorageVendorId); });
 }
 
 HRESULT CZKUMInterfaceDevice::get_ProductId(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_device->StorageProductId); });
+  return ReadTextOf(m_device, E_POINTER, pVal, [](const auto& record) {
+    return std::u16string_view(record.StorageProductId);
+  });
 }
 
 HRESULT CZKUMInterfaceDevice::get_ProductRev(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_device->ProductRev); });
+  return ReadTextOf(m_device, E_POINTER, pVal,
+                    [](const auto& record) { return std::u16string_view(record.ProductRev); });
 }
 
 HRESULT CZKUMInterfaceDevice::get_DevicePath(BSTR* pVal) {
-  return ReadText(pVal, [&] { return m_device->DevicePath(); });
+  return ReadTextOf(m_device, E_POINTER, pVal,
+                    [](const auto& record) { return record.DevicePath(); });
 }
 
 HRESULT CZKUMInterfaceDevice::get_MountPoint(BSTR* pVal) {
-  return ReadText(pVal, [&] { return m_device->MountPoint(); });
+  return ReadTextOf(m_device, E_POINTER, pVal,
+                    [](const auto& record) { return record.MountPoint(); });
 }
 
 HRESULT CZKUMInterfaceDevice::get_MountPoints(IEnumVARIANT** ppIUsbTreeNode) {
-  return GuardedRaising([&] {
+  return GuardedRaising([&]() -> HRESULT {
     if (ppIUsbTreeNode) *ppIUsbTreeNode = nullptr;
     m_mountPoints.clear();
+    const RecordReadLock lock;
+    if (!m_device) return E_POINTER;
     for (const std::u16string& mountPoint : m_device->MountPoints) {
       const BSTR copy = platform::MakeBstr(platform::UpToZero(mountPoint));
       if (copy == nullptr) throw ComError(E_OUTOFMEMORY);

@@ -7,7 +7,7 @@
 
 namespace KelvoUHW {
 
-// Reads of the typed record are not tested, see typed_nodes.h.
+// Without its record it answers as those of typed_nodes.h do.
 class CZKUMInterfaceDevice : public CZKUMUsbTreeNode, public IZKUMInterfaceDevice {
  public:
   using Interfaces = InterfaceMap<IZKUMUsbTreeNode, IZKUMUsbDevice, IZKUMInterfaceDevice>;

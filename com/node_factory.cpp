@@ -2,6 +2,7 @@
 #include "com/node_object.h"
 #include "com/port_device_node.h"
 #include "com/typed_nodes.h"
+#include "records/record_lock.h"
 
 namespace KelvoUHW {
 
@@ -21,6 +22,7 @@ HRESULT Wrap(const NodePtr& node, IZKUMUsbTreeNode** out) noexcept {
 
 HRESULT CreateNodeObject(const NodePtr& node, IZKUMUsbTreeNode** out) noexcept {
   if (out) *out = nullptr;
+  const RecordReadLock lock;  // the record may be destroyed at any other moment
   if (!node || out == nullptr) return E_POINTER;
   switch (node->m_nType) {
     case KUDTHostController:

@@ -22,22 +22,6 @@ HRESULT CopyUntested(const std::u16string& text, BSTR* out) noexcept {
   return S_OK;
 }
 
-// A record found through a bare pointer: a ring of its own, not the one in which the tree holds the
-// record. Lets go without destroying the record unless it was told that somebody shares it.
-class BorrowedRecord {
- public:
-  explicit BorrowedRecord(CZKUMUsbTreeNodeImpl* record) noexcept : m_node(record) {}
-  ~BorrowedRecord() {
-    if (m_node.RingSize() == 1) m_node.Abandon();
-  }
-  BorrowedRecord(const BorrowedRecord&) = delete;
-  BorrowedRecord& operator=(const BorrowedRecord&) = delete;
-  const NodePtr& Get() const noexcept { return m_node; }
-
- private:
-  NodePtr m_node;
-};
-
 }  // namespace
 
 CZKUMUsbTreeNode::~CZKUMUsbTreeNode() = default;
@@ -45,12 +29,12 @@ CZKUMUsbTreeNode::~CZKUMUsbTreeNode() = default;
 void CZKUMUsbTreeNode::SetImpl(const NodePtr& node) noexcept { m_node = node; }
 
 HRESULT CZKUMUsbTreeNode::get_InstanceId(BSTR* pVal) {
-  if (pVal) *pVal = nullptr;
-  if (!m_node) return E_FAIL;
-  return ReadText(pVal, [&] { return std::u16string_view(m_node->m_strDevInstId); });
+  return ReadTextOf(m_node, E_FAIL, pVal,
+                    [](const auto& node) { return std::u16string_view(node.m_strDevInstId); });
 }
 
 HRESULT CZKUMUsbTreeNode::get_Type(TUsbDeviceType* pType) noexcept {
+  const RecordReadLock lock;
   if (!m_node) return E_INVALIDARG;
   if (pType == nullptr) return E_POINTER;
   *pType = m_node->m_nType;
@@ -58,17 +42,22 @@ HRESULT CZKUMUsbTreeNode::get_Type(TUsbDeviceType* pType) noexcept {
 }
 
 // The object made here owns the parent record together with nobody: when the caller releases it,
-// the record is destroyed while the tree still refers to it. This is meant; callers keep the parent
-// for as long as they use the tree.
+// the record is destroyed while the tree still refers to it. This is meant. What refers to it holds
+// nothing from then on. Nothing is destroyed between the look at the link and the handle, since
+// whoever destroys waits for readers.
 HRESULT CZKUMUsbTreeNode::get_Parent(IZKUMUsbTreeNode** ppIUsbTreeNode) noexcept {
-  if (ppIUsbTreeNode == nullptr) return E_POINTER;
-  *ppIUsbTreeNode = nullptr;
-  if (!m_node) return E_POINTER;
-  const RecordReadLock lock;
-  CZKUMUsbTreeNodeImpl* parent = m_node->m_pParent;
-  if (parent == nullptr) return E_POINTER;
-  const BorrowedRecord borrowed(parent);
-  return CreateNodeObject(borrowed.Get(), ppIUsbTreeNode);
+  return Guarded([&] {
+    if (ppIUsbTreeNode == nullptr) return E_POINTER;
+    *ppIUsbTreeNode = nullptr;
+    const RecordReadLock lock;
+    if (!m_node) return E_POINTER;
+    CZKUMUsbTreeNodeImpl* parent = m_node->m_pParent;
+    if (parent == nullptr) return E_POINTER;
+    NodePtr node = NodePtr::InARingOfItsOwn(parent);
+    const HRESULT result = CreateNodeObject(node, ppIUsbTreeNode);
+    if (FAILED(result)) node.Abandon();  // nobody has it, so nobody destroys it
+    return result;
+  });
 }
 
 HRESULT CZKUMUsbTreeNode::get_Childs(IZKUMUsbTreeNodeEnumerator** ppNodeEnum) noexcept {
@@ -76,10 +65,11 @@ HRESULT CZKUMUsbTreeNode::get_Childs(IZKUMUsbTreeNodeEnumerator** ppNodeEnum) no
     if (ppNodeEnum == nullptr) return E_POINTER;
     *ppNodeEnum = nullptr;
     std::unique_ptr<VariantVector> items(new (std::nothrow) VariantVector);
-    if (!items || !m_node) return E_POINTER;
+    if (!items) return E_POINTER;
     std::vector<NodePtr> childs;
     {
       const RecordReadLock lock;
+      if (!m_node) return E_POINTER;
       childs = m_node->m_childs;
     }
     const HRESULT wrapped = AppendNodeObjects(childs, *items);
@@ -92,10 +82,10 @@ HRESULT CZKUMUsbTreeNode::get_InSubtreeDevicesOfType(
   return Guarded([&] {
     if (ppDevicesOfTypeEnum == nullptr) return E_POINTER;
     *ppDevicesOfTypeEnum = nullptr;
-    if (!m_node) return E_POINTER;
     std::vector<NodePtr> found;
     {
       const RecordReadLock lock;
+      if (!m_node) return E_POINTER;
       VisitPreOrder(m_node, [&](const NodePtr& node) {
         if (node->m_nType == nType) found.push_back(node);
         return true;
@@ -109,60 +99,55 @@ HRESULT CZKUMUsbTreeNode::get_InSubtreeDevicesOfType(
 }
 
 HRESULT CZKUMUsbTreeNode::get_Description(BSTR* pVal) {
-  if (pVal) *pVal = nullptr;
-  if (!m_node) return E_FAIL;
-  return ReadText(pVal, [&] { return std::u16string_view(m_node->m_strDeviceDescr); });
+  return ReadTextOf(m_node, E_FAIL, pVal,
+                    [](const auto& node) { return std::u16string_view(node.m_strDeviceDescr); });
 }
 
 // The one text that is not read when nobody asks for it.
 HRESULT CZKUMUsbTreeNode::get_SerialNumber(BSTR* pVal) {
   if (pVal == nullptr) return E_POINTER;
-  *pVal = nullptr;
-  if (!m_node) return E_FAIL;
-  return ReadText(pVal, [&] { return std::u16string_view(m_node->m_strSerialNumber); });
+  return ReadTextOf(m_node, E_FAIL, pVal,
+                    [](const auto& node) { return std::u16string_view(node.m_strSerialNumber); });
 }
 
 HRESULT CZKUMUsbTreeNode::get_VendorId(LONG* pVal) noexcept {
-  if (pVal == nullptr || !m_node) return E_POINTER;
   const RecordReadLock lock;
+  if (pVal == nullptr || !m_node) return E_POINTER;
   *pVal = static_cast<LONG>(m_node->m_nVendorId);
   return S_OK;
 }
 
 HRESULT CZKUMUsbTreeNode::get_ProductId(LONG* pVal) noexcept {
-  if (pVal == nullptr || !m_node) return E_POINTER;
   const RecordReadLock lock;
+  if (pVal == nullptr || !m_node) return E_POINTER;
   *pVal = static_cast<LONG>(m_node->m_nProductId);
   return S_OK;
 }
 
 HRESULT CZKUMUsbTreeNode::get_DriverKeyName(BSTR* pVal) {
-  if (pVal) *pVal = nullptr;
-  if (!m_node) return E_FAIL;
-  return ReadText(pVal, [&] { return std::u16string_view(m_node->m_strDriverKeyName); });
+  return ReadTextOf(m_node, E_FAIL, pVal,
+                    [](const auto& node) { return std::u16string_view(node.m_strDriverKeyName); });
 }
 
 HRESULT CZKUMUsbTreeNode::get_ToString(BSTR* pVal) {
-  if (pVal) *pVal = nullptr;
-  if (!m_node) return E_FAIL;
-  return ReadText(pVal, [&] {
+  return ReadTextOf(m_node, E_FAIL, pVal, [](const auto& node) {
     std::u16string text;
-    m_node->ToString(text, {});
+    node.ToString(text, {});
     return text;
   });
 }
 
 HRESULT CZKUMUsbTreeNode::get_Vendor(BSTR* pVal) noexcept {
   if (pVal) *pVal = nullptr;
-  if (pVal == nullptr || !m_node) return E_POINTER;
   const RecordReadLock lock;
+  if (pVal == nullptr || !m_node) return E_POINTER;
   return CopyUntested(m_node->m_strVendor, pVal);
 }
 
 HRESULT CZKUMUsbTreeNode::get_Product(BSTR* pVal) {
   if (pVal) *pVal = nullptr;
-  if (pVal == nullptr || !m_node) return E_POINTER;
   const RecordReadLock lock;
+  if (pVal == nullptr || !m_node) return E_POINTER;
   return CopyUntested(m_node->m_strProduct, pVal);
 }
 

@@ -17,33 +17,43 @@ void CZKUMPortDevice::SetImpl(const NodePtr& node) noexcept {
 }
 
 const CZKUMInfoDeviceImpl* CZKUMPortDevice::InfoRecord() const noexcept {
+  if (!m_device) return nullptr;
   return static_cast<const CZKUMInfoDeviceImpl*>(m_device->m_infoDevice.Get());
 }
 
 HRESULT CZKUMPortDevice::get_Product(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_device->m_strUsbProduct); });
+  return ReadTextOf(m_device, E_POINTER, pVal,
+                    [](const auto& record) { return std::u16string_view(record.m_strUsbProduct); });
 }
 
 HRESULT CZKUMPortDevice::get_Manufacturer1(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_device->m_strUsbManufacturer); });
+  return ReadTextOf(m_device, E_POINTER, pVal, [](const auto& record) {
+    return std::u16string_view(record.m_strUsbManufacturer);
+  });
 }
 
 HRESULT CZKUMPortDevice::get_Speed(ULONG* pVal) noexcept {
   if (pVal == nullptr) return E_INVALIDARG;
+  const RecordReadLock lock;
+  if (!m_device) return E_POINTER;
   *pVal = m_device->Speed();
   return S_OK;
 }
 
 HRESULT CZKUMPortDevice::get_NumberInterfaces(BYTE* pVal) noexcept {
   if (pVal == nullptr) return E_INVALIDARG;
+  const RecordReadLock lock;
+  if (!m_device) return E_POINTER;
   *pVal = m_device->NumberInterfaces();
   return S_OK;
 }
 
 HRESULT CZKUMPortDevice::get_InterfaceDescriptors(IEnumVARIANT** ppIIiterfaceDescr) noexcept {
-  return Guarded([&] {
+  return Guarded([&]() -> HRESULT {
     if (ppIIiterfaceDescr) *ppIIiterfaceDescr = nullptr;
     m_interfaceDescriptors.clear();
+    const RecordReadLock lock;
+    if (!m_device) return E_POINTER;
     for (const InterfaceEntryPtr& entry : m_device->m_interfaceDescrs) {
       ComObject<CZKUMInterfaceDescr>* created = nullptr;
       const HRESULT result = ComObject<CZKUMInterfaceDescr>::Create(created);

@@ -8,7 +8,7 @@
 
 namespace KelvoUHW {
 
-// Reads of the typed record are not tested, see typed_nodes.h.
+// Without its record it answers as those of typed_nodes.h do.
 class CZKUMPortDevice
     : public InfoDeviceProperties<CZKUMPortDevice, CZKUMUsbTreeNode, IZKUMPortDevice> {
  public:

@@ -6,6 +6,7 @@
 #include "com/com_error.h"
 #include "platform/com.h"
 #include "records/record_lock.h"
+#include "records/ring_ptr.h"
 
 namespace KelvoUHW {
 
@@ -34,6 +35,16 @@ HRESULT ReadText(BSTR* out, Read read) {
     const RecordReadLock lock;
     return IntermediateBstr(read()).CopyTo(out);
   });
+}
+
+// The text of a record. `empty` is the answer where the object holds none any more, which comes
+// before everything else.
+template <class Record, class Read>
+HRESULT ReadTextOf(const RingPtr<Record>& record, HRESULT empty, BSTR* out, Read read) {
+  if (out) *out = nullptr;
+  const RecordReadLock lock;
+  if (!record) return empty;
+  return ReadText(out, [&] { return read(*record); });
 }
 
 }  // namespace KelvoUHW

@@ -16,7 +16,8 @@ void CZKUMHostController::SetImpl(const NodePtr& node) noexcept {
 }
 
 HRESULT CZKUMHostController::get_LeafName(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_controller->m_strLeafName); });
+  return ReadTextOf(m_controller, E_POINTER, pVal,
+                    [](const auto& record) { return std::u16string_view(record.m_strLeafName); });
 }
 
 void CZKUMHubDevice::SetImpl(const NodePtr& node) noexcept {
@@ -25,11 +26,14 @@ void CZKUMHubDevice::SetImpl(const NodePtr& node) noexcept {
 }
 
 HRESULT CZKUMHubDevice::get_PathName(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_hub->m_strPathName); });
+  return ReadTextOf(m_hub, E_POINTER, pVal,
+                    [](const auto& record) { return std::u16string_view(record.m_strPathName); });
 }
 
 HRESULT CZKUMHubDevice::get_ConnectionName(BSTR* pVal) {
-  return ReadText(pVal, [&] { return std::u16string_view(m_hub->m_strConnectionName); });
+  return ReadTextOf(m_hub, E_POINTER, pVal, [](const auto& record) {
+    return std::u16string_view(record.m_strConnectionName);
+  });
 }
 
 void CZKUMHubPort::SetImpl(const NodePtr& node) noexcept {
@@ -39,6 +43,8 @@ void CZKUMHubPort::SetImpl(const NodePtr& node) noexcept {
 
 HRESULT CZKUMHubPort::get_PortIndex(LONG* pVal) noexcept {
   if (pVal == nullptr) return E_INVALIDARG;
+  const RecordReadLock lock;
+  if (!m_port) return E_POINTER;
   *pVal = static_cast<LONG>(m_port->m_nPortIndex);
   return S_OK;
 }

@@ -8,8 +8,8 @@
 
 namespace KelvoUHW {
 
-// Properties of the class's own interface read the typed record without a test for its presence:
-// every object that CreateNodeObject makes has one. This is meant.
+// Every object that CreateNodeObject makes has its typed record. Where that was destroyed later, by
+// the object of a `Parent`, the properties of the class's own interface answer E_POINTER.
 
 class CZKUMHostController : public CZKUMUsbTreeNode, public IZKUMHostController {
  public:

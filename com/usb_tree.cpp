@@ -14,8 +14,12 @@ namespace KelvoUHW {
 
 namespace {
 
-// The devices on hub ports, in the order of the tree. What lies below one is not looked at.
-std::vector<NodePtr> PortDevices(const NodePtr& root) {
+bool PassesAll(const CZKUMUsbTreeNodeImpl&) noexcept { return true; }
+
+// The devices on hub ports that pass, in the order of the tree. What lies below one is not looked
+// at.
+template <class Passes>
+std::vector<NodePtr> PortDevices(const NodePtr& root, Passes passes) {
   std::vector<NodePtr> devices;
   std::vector<const NodePtr*> waiting;
   const RecordReadLock lock;
@@ -24,11 +28,11 @@ std::vector<NodePtr> PortDevices(const NodePtr& root) {
     const NodePtr& node = *waiting.back();
     waiting.pop_back();
     if (node->m_nType == KUDTPortDevice) {
-      devices.push_back(node);
+      if (passes(*node)) devices.push_back(node);
       continue;
     }
     for (auto child = node->m_childs.rbegin(); child != node->m_childs.rend(); ++child) {
-      waiting.push_back(&*child);
+      if (*child) waiting.push_back(&*child);
     }
   }
   return devices;
@@ -38,8 +42,7 @@ std::vector<NodePtr> PortDevices(const NodePtr& root) {
 // same, as a null pointer: this is meant, the list tells how many there are.
 template <class Passes>
 void AppendDevices(const NodePtr& root, VariantVector& items, Passes passes) {
-  for (const NodePtr& device : PortDevices(root)) {
-    if (!passes(*device)) continue;
+  for (const NodePtr& device : PortDevices(root, passes)) {
     ComPtr<IZKUMUsbTreeNode> object;
     CreateNodeObject(device, object.Put());
     items.push_back(Variant::OfUnknown(object.Detach()));
@@ -114,7 +117,7 @@ HRESULT CZKUMUsbTree::get_VendorProductDevices(
 HRESULT CZKUMUsbTree::get_PortDevicesWithVolume(
     IZKUMUsbTreeNodeEnumerator** ppPortDevicesEnum) noexcept {
   return Query(ppPortDevicesEnum, [](const NodePtr& root, VariantVector& items) {
-    for (const NodePtr& device : PortDevices(root)) {
+    for (const NodePtr& device : PortDevices(root, PassesAll)) {
       if (!HasVolume(device)) continue;
       ComPtr<IZKUMUsbTreeNode> object;
       CreateNodeObject(device, object.Put());

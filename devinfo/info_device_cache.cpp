@@ -87,6 +87,12 @@ void InfoDeviceCache::SetDiskDrives(std::vector<DeviceNodeRecord> diskDrives) {
   m_diskDrives = std::move(diskDrives);
 }
 
+void InfoDeviceCache::DropDestroyed() noexcept {
+  for (InfoDeviceSet* set : {&m_previous, &m_current, &m_removed, &m_added, &m_held, &m_pending}) {
+    set->DropDestroyed();
+  }
+}
+
 bool InfoDeviceCache::Collect(const NodePtr& treeRoot) {
   m_nAddedCount = 0;
   m_nRemovedCount = 0;

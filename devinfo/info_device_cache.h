@@ -33,6 +33,10 @@ class InfoDeviceCache {
   // The records of disk drives found by the builder, for the next passes.
   void SetDiskDrives(std::vector<DeviceNodeRecord> diskDrives);
 
+  // Forgets the records that a client has destroyed: their devices are new to the next pass. Comes
+  // first in a pass, and nothing is destroyed until the pass has ended.
+  void DropDestroyed() noexcept;
+
   // Reads all present device nodes and compares them with the last committed pass. `treeRoot` is
   // the topology tree just walked: a new device that it does not show yet is not reported before it
   // does. True when something was added or removed; false when the system gives no list of devices,

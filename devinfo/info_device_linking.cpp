@@ -66,7 +66,9 @@ class ChildAdder {
   void Add(const NodePtr& child, CZKUMUsbTreeNodeImpl& parent, Entry place) {
     if (!m_known[place]) {
       m_known[place] = true;
-      for (const NodePtr& present : parent.m_childs) Remember(*present, place);
+      for (const NodePtr& present : parent.m_childs) {
+        if (present) Remember(*present, place);
+      }
     }
     const auto same = [&](Entry entry) { return IsOf(entry, place, child->m_strDevInstId); };
     for (Entry entry = m_byId.First(HashOf(place, child->m_strDevInstId), same);

@@ -1,5 +1,6 @@
 #include "devinfo/info_device_set.h"
 
+#include <algorithm>
 #include <cstdint>
 
 namespace KelvoUHW {
@@ -104,6 +105,14 @@ void InfoDeviceSet::Clear() noexcept {
   m_indexes = {};
   m_places.clear();
   m_records.clear();
+}
+
+void InfoDeviceSet::DropDestroyed() noexcept {
+  const auto holdsNothing = [](const InfoDevicePtr& record) { return !record; };
+  if (std::ranges::none_of(m_records, holdsNothing)) return;
+  m_indexes = {};
+  std::erase_if(m_places, [](const Place& place) { return place.erased || !*place.record; });
+  m_records.remove_if(holdsNothing);
 }
 
 bool InfoDeviceSet::HasRecord(const CZKUMUsbTreeNodeImpl* record) const {

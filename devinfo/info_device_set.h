@@ -31,6 +31,9 @@ class InfoDeviceSet {
   // False when that object is not in the set. `record` may be the one that the set itself holds.
   bool Erase(const CZKUMUsbTreeNodeImpl* record);
   void Clear() noexcept;
+  // Drops the pointers that hold nothing any more: their records were destroyed though they were in
+  // the set. To be called before anything else where that may have happened.
+  void DropDestroyed() noexcept;
 
   // Membership by identity: this very object.
   bool HasRecord(const CZKUMUsbTreeNodeImpl* record) const;

@@ -1,8 +1,10 @@
 #include "records/node.h"
 
 #include <algorithm>
+#include <mutex>
 #include <utility>
 
+#include "platform/process_lock.h"
 #include "platform/text.h"
 #include "records/devnode.h"
 #include "records/record_lock.h"
@@ -11,33 +13,66 @@ namespace KelvoUHW {
 
 namespace {
 
-// The records of one thread that wait to be deleted, linked through their parent links, which a
-// record without owner has no other use for.
+// The records of one thread that wait to be deleted.
 struct Deletions {
   CZKUMUsbTreeNodeImpl* waiting = nullptr;
   bool running = false;
 };
 thread_local Deletions t_deletions;
 
+// The records of all threads that are deleted when nobody uses records any more.
+constinit platform::ProcessLock g_usesLock;
+int g_nUses = 0;
+CZKUMUsbTreeNodeImpl* g_keptForUses = nullptr;
+
 }  // namespace
 
+RecordsInUse::RecordsInUse() noexcept {
+  const std::lock_guard lock(g_usesLock);
+  ++g_nUses;
+}
+
+RecordsInUse::~RecordsInUse() {
+  CZKUMUsbTreeNodeImpl* kept = nullptr;
+  {
+    const std::lock_guard lock(g_usesLock);
+    if (--g_nUses == 0) kept = std::exchange(g_keptForUses, nullptr);
+  }
+  while (kept) {
+    CZKUMUsbTreeNodeImpl* const next = std::exchange(kept->m_pNextToDelete, nullptr);
+    CZKUMUsbTreeNodeImpl::Destroy(kept);
+    kept = next;
+  }
+}
+
+void CZKUMUsbTreeNodeImpl::DeleteLater(CZKUMUsbTreeNodeImpl* record,
+                                       CZKUMUsbTreeNodeImpl*& list) noexcept {
+  record->m_pNextToDelete = std::exchange(list, record);
+}
+
 void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
-  record->m_pParent = t_deletions.waiting;
-  t_deletions.waiting = record;
+  {
+    const std::lock_guard lock(g_usesLock);
+    if (g_nUses > 0 && record->IsHeld()) return DeleteLater(record, g_keptForUses);
+  }
+  DeleteLater(record, t_deletions.waiting);
   if (t_deletions.running) return;
-  // A build follows parent links while it joins records: none may die under it on another thread.
-  const RecordReadLock lock;
+  // Whoever reads follows links to records that it does not hold, a build while it joins them and a
+  // client on the way to a parent: none may die under it.
+  const RecordWriteLock lock;
   t_deletions.running = true;
   while (CZKUMUsbTreeNodeImpl* next = t_deletions.waiting) {
-    t_deletions.waiting = next->m_pParent;
-    next->m_pParent = nullptr;
+    t_deletions.waiting = next->m_pNextToDelete;
+    next->LetAllGo();
     delete next;
   }
   t_deletions.running = false;
 }
 
 CZKUMUsbTreeNodeImpl::~CZKUMUsbTreeNodeImpl() {
-  for (const NodePtr& child : m_childs) child->m_pParent.ClearIfNaming(this);
+  for (const NodePtr& child : m_childs) {
+    if (child) child->m_pParent.ClearIfNaming(this);
+  }
 }
 
 bool CZKUMUsbTreeNodeImpl::AcceptNode(NodePtr) { return true; }
@@ -64,11 +99,12 @@ void CZKUMUsbTreeNodeImpl::ToString(std::u16string& out, std::u16string indent) 
       if (!path.empty()) indent.resize(indent.size() - kChildIndent.size());
       continue;
     }
-    const CZKUMUsbTreeNodeImpl& child = *level.node->m_childs[level.nextChild];
+    const NodePtr& child = level.node->m_childs[level.nextChild];
     out.append(u"child ");
     out.append(platform::Decimal(static_cast<std::int32_t>(level.nextChild++))).append(u"\r\n");
+    if (!child) continue;
     indent += kChildIndent;
-    enter(child);
+    enter(*child);
   }
 }
 
@@ -101,7 +137,7 @@ void CZKUMUsbTreeNodeImpl::BaseToString(std::u16string& out, const std::u16strin
 
 bool CZKUMUsbTreeNodeImpl::HasChildWithDriverKey(const std::u16string& driverKey) const {
   return std::any_of(m_childs.begin(), m_childs.end(), [&](const NodePtr& child) {
-    return platform::EqualIgnoringCase(child->m_strDriverKeyName, driverKey);
+    return child && platform::EqualIgnoringCase(child->m_strDriverKeyName, driverKey);
   });
 }
 
@@ -113,9 +149,9 @@ bool CZKUMUsbTreeNodeImpl::IsSameNode(const CZKUMUsbTreeNodeImpl& other) const n
 }
 
 void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent) {
-  if (parent == nullptr) return;
+  if (parent == nullptr || !child) return;
   for (const NodePtr& present : parent->m_childs) {
-    if (present->IsSameNode(*child)) return;
+    if (present && present->IsSameNode(*child)) return;
   }
   parent->m_childs.push_back(child);
   child->m_pParent = parent;

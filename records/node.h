@@ -46,7 +46,20 @@ class ParentLink {
 // What is added to the indent of a child's dump.
 inline constexpr std::u16string_view kChildIndent = u"- ";
 
-class CZKUMUsbTreeNodeImpl : public NodeIdentity {
+// While one lives, no record is destroyed that anybody holds: what the object of a `Parent` gives
+// up stays until the last of these has ended. A build reads records between its calls to the
+// system, where it holds no lock.
+class RecordsInUse {
+ public:
+  RecordsInUse() noexcept;
+  ~RecordsInUse();
+  RecordsInUse(const RecordsInUse&) = delete;
+  RecordsInUse& operator=(const RecordsInUse&) = delete;
+};
+
+// A list of children, and whatever else holds records, may have empty pointers: those to records
+// that the object of a `Parent` has destroyed.
+class CZKUMUsbTreeNodeImpl : public NodeIdentity, public RecordRings {
  public:
   CZKUMUsbTreeNodeImpl() = default;
   CZKUMUsbTreeNodeImpl(const CZKUMUsbTreeNodeImpl&) = delete;
@@ -63,9 +76,10 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
   // "\r\n". A loop over the tree, however deep: what differs between kinds of node is OwnLines.
   virtual void ToString(std::u16string& out, std::u16string indent) const;
 
-  // Deletes a record that no RingPtr holds any more. Records that die with it are deleted one after
-  // the other and not inside each other, so a chain of any depth needs no more stack than one
-  // record.
+  // Deletes a record of which a ring has lost its last pointer; pointers of other rings hold
+  // nothing from then on. Records that die with it are deleted one after the other and not inside
+  // each other, so a chain of any depth needs no more stack than one record. Waits for readers: the
+  // calling thread must not be one (see RecordReadLock).
   static void Destroy(CZKUMUsbTreeNodeImpl* record) noexcept;
 
   // Whether a child has this driver key, ignoring case.
@@ -81,6 +95,12 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
   std::u16string m_strDeviceDescr;
   std::u16string m_strDriverKeyName;
 
+ private:
+  friend class RecordsInUse;
+  static void DeleteLater(CZKUMUsbTreeNodeImpl* record, CZKUMUsbTreeNodeImpl*& list) noexcept;
+
+  CZKUMUsbTreeNodeImpl* m_pNextToDelete = nullptr;
+
  protected:
   explicit CZKUMUsbTreeNodeImpl(TUsbDeviceType type) noexcept : m_nType(type) {}
 
@@ -91,15 +111,16 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity {
 };
 
 // Hangs a node below a parent, unless one of the parent's children is the same node: then nothing
-// changes. Without a parent nothing happens.
+// changes. Without a parent or a child nothing happens.
 void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent);
 
 // The first node with this instance id (compared exactly), a node before its children and children
 // in their order; empty when there is none.
 NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId);
 
-// Calls `visit` with every NodePtr of a tree, a node before its children and children in their
-// order. `visit` returns whether to go on. Nodes must not be added or removed meanwhile.
+// Calls `visit` with every NodePtr of a tree that holds a record, a node before its children and
+// children in their order. `visit` returns whether to go on. Nodes must not be added or removed
+// meanwhile.
 template <class Visit>
 void VisitPreOrder(const NodePtr& root, Visit visit) {
   // Kept on the heap: how deep a tree goes is up to the hardware.
@@ -110,7 +131,7 @@ void VisitPreOrder(const NodePtr& root, Visit visit) {
     waiting.pop_back();
     if (!visit(node)) return;
     for (auto child = node->m_childs.rbegin(); child != node->m_childs.rend(); ++child) {
-      waiting.push_back(&*child);
+      if (*child) waiting.push_back(&*child);
     }
   }
 }

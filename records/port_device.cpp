@@ -49,7 +49,10 @@ CZKUMPortDeviceImpl::CZKUMPortDeviceImpl(platform::DevInst node,
 }
 
 CZKUMPortDeviceImpl::~CZKUMPortDeviceImpl() {
-  if (m_infoDevice) m_infoDevice->m_pParent.ClearIfNaming(this);
+  if (!m_infoDevice) return;
+  m_infoDevice->m_pParent.ClearIfNaming(this);
+  // The port knows the device-manager node through this record alone.
+  if (m_pParent) m_infoDevice->m_pParent.ClearIfNaming(m_pParent);
 }
 
 bool CZKUMPortDeviceImpl::AcceptNode(NodePtr) { return true; }

@@ -2,7 +2,8 @@
 //
 // Device records live on from tree to tree: a build joins them anew while clients may be reading
 // them through node objects, and clients cannot serialise against the event threads. So readers
-// share the lock for the length of one property read, and a build holds it alone while it joins.
+// share the lock for the length of one property read, a build holds it alone while it joins, and so
+// does who deletes records. A reader must not let go of the last pointer to a record.
 #pragma once
 
 namespace KelvoUHW {

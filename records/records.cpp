@@ -64,7 +64,7 @@ std::u16string CZKUMHubDeviceImpl::LeafName() const {
 
 CZKUMHubPortImpl::~CZKUMHubPortImpl() {
   for (const NodePtr& child : m_childs) {
-    if (child->m_nType != KUDTPortDevice) continue;
+    if (!child || child->m_nType != KUDTPortDevice) continue;
     const auto& device = static_cast<const CZKUMPortDeviceImpl&>(*child);
     if (device.m_infoDevice) device.m_infoDevice->m_pParent.ClearIfNaming(this);
   }

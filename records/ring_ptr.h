@@ -4,7 +4,9 @@
 // when it lets go deletes the record. Copies, moves and releases take constant time.
 #pragma once
 
+#include <concepts>
 #include <cstddef>
+#include <memory>
 #include <type_traits>
 #include <utility>
 
@@ -35,10 +37,53 @@ class RingLink {
   static void SwapPlaces(const RingLink& a, const RingLink& b) noexcept;  // of two rings
   static std::size_t CountMembers(const RingLink& member) noexcept;
 
+  // What the member points at. A record that is destroyed takes it from pointers that it knows.
+  mutable void* m_pHeld = nullptr;
+
  private:
+  friend class RecordRings;
+
   // Copying a pointer links the copy behind its source, which is const to the one who copies.
   mutable const RingLink* m_pPrevious = this;
   mutable const RingLink* m_pNext = this;
+};
+
+// The base of records that several rings may hold: that of the pointers which share it, and rings
+// made with RingPtr::InARingOfItsOwn. Whichever ring loses its last pointer first destroys the
+// record. Each ring begins with a link of the record's, by which the others are found then.
+class RecordRings {
+ public:
+  RecordRings(const RecordRings&) = delete;
+  RecordRings& operator=(const RecordRings&) = delete;
+
+  // Before the record is deleted: takes it from every pointer that still holds it. Nobody may use
+  // such a pointer on another thread meanwhile, but for copying, moving and letting go.
+  void LetAllGo() noexcept;
+  // Whether any pointer holds the record.
+  bool IsHeld() const noexcept;
+
+ protected:
+  RecordRings() noexcept = default;
+  ~RecordRings() = default;
+
+ private:
+  template <class T>
+  friend class RingPtr;
+
+  struct Ring : RingLink {
+    Ring* next = nullptr;
+  };
+
+  // The caller holds the lock.
+  void Begin(const RingLink& member) const noexcept { RingLink::LinkAfter(m_shared, member); }
+  bool Leave(const RingLink& member) noexcept;             // true when it was alone
+  bool LeaveForDeletion(const RingLink& member) noexcept;  // true once, for who has to delete
+  bool AreOneRing(const RingLink& a, const RingLink& b) const noexcept;
+  // False where the record is about to be deleted; then `ring` stays the caller's.
+  bool BeginRing(Ring* ring, const RingLink& member) noexcept;
+
+  Ring m_shared;
+  bool m_bDying = false;
 };
 
 // One RingPtr object belongs to one thread at a time, except that several threads may copy from it
@@ -50,7 +95,28 @@ class RingPtr : private RingLink {
   RingPtr() noexcept = default;
   RingPtr(std::nullptr_t) noexcept {}
   // Takes over a new record that no RingPtr owns yet.
-  explicit RingPtr(T* record) noexcept : m_pRecord(record) {}
+  explicit RingPtr(T* record) noexcept {
+    m_pHeld = record;
+    if constexpr (KnowsItsRings()) {
+      const Lock lock;
+      if (record) record->Begin(*this);
+    }
+  }
+
+  // A pointer that shares the record with nobody: when its last copy lets go, the record is
+  // destroyed though others hold it, and they hold nothing from then on. Empty for a record that is
+  // about to be deleted; the caller sees to it that it is not deleted before. Throws
+  // std::bad_alloc.
+  static RingPtr InARingOfItsOwn(T* record) requires std::derived_from<T, RecordRings> {
+    RingPtr result;
+    auto ring = std::make_unique<RecordRings::Ring>();
+    const Lock lock;
+    if (record->BeginRing(ring.get(), result)) {
+      ring.release();
+      result.m_pHeld = record;
+    }
+    return result;
+  }
 
   RingPtr(const RingPtr& other) noexcept { Join(other); }
   template <class U>
@@ -73,9 +139,9 @@ class RingPtr : private RingLink {
 
   void Swap(RingPtr& other) noexcept {
     const Lock lock;
-    if (m_pRecord == other.m_pRecord) return;  // one ring: nothing would differ
+    if (m_pHeld == other.m_pHeld && AreOneRing(other)) return;  // nothing would differ
     SwapPlaces(*this, other);
-    std::swap(m_pRecord, other.m_pRecord);
+    std::swap(m_pHeld, other.m_pHeld);
   }
 
   // Lets go; deletes the record when this was the last pointer to it.
@@ -90,17 +156,25 @@ class RingPtr : private RingLink {
   }
 
   // Lets go and never deletes the record.
-  void Abandon() noexcept { Leave(); }
+  void Abandon() noexcept {
+    const Lock lock;
+    if constexpr (KnowsItsRings()) {
+      if (T* record = Taken()) record->RecordRings::Leave(*this);
+    } else {
+      Taken();
+      Unlink(*this);
+    }
+  }
 
-  T* Get() const noexcept { return m_pRecord; }
-  T* operator->() const noexcept { return m_pRecord; }
-  T& operator*() const noexcept { return *m_pRecord; }
-  explicit operator bool() const noexcept { return m_pRecord != nullptr; }
+  T* Get() const noexcept { return static_cast<T*>(m_pHeld); }
+  T* operator->() const noexcept { return Get(); }
+  T& operator*() const noexcept { return *Get(); }
+  explicit operator bool() const noexcept { return m_pHeld != nullptr; }
 
-  // The number of pointers to the record, 0 for an empty one. Walks the ring.
+  // The number of pointers in the ring, 0 for an empty one. Walks it.
   std::size_t RingSize() const noexcept {
     const Lock lock;
-    return m_pRecord ? CountMembers(*this) : 0;
+    return m_pHeld ? CountMembers(*this) - (KnowsItsRings() ? 1 : 0) : 0;
   }
 
   // The same record under a derived type, in the same ring. The caller knows the type.
@@ -108,8 +182,8 @@ class RingPtr : private RingLink {
   RingPtr<U> StaticCast() const noexcept {
     RingPtr<U> result;
     const Lock lock;
-    result.m_pRecord = static_cast<U*>(m_pRecord);
-    if (m_pRecord) LinkAfter(*this, result);
+    result.m_pHeld = static_cast<U*>(Get());
+    if (m_pHeld) LinkAfter(*this, result);
     return result;
   }
 
@@ -117,32 +191,46 @@ class RingPtr : private RingLink {
   friend bool operator==(const RingPtr& a, const RingPtr<U>& b) noexcept {
     return a.Get() == b.Get();
   }
-  friend bool operator==(const RingPtr& a, std::nullptr_t) noexcept { return !a.m_pRecord; }
+  friend bool operator==(const RingPtr& a, std::nullptr_t) noexcept { return !a; }
 
  private:
   template <class U>
   friend class RingPtr;
 
+  // Asked inside functions: a record may hold pointers to records of its own kind.
+  static constexpr bool KnowsItsRings() noexcept { return std::is_base_of_v<RecordRings, T>; }
+
+  bool AreOneRing(const RingPtr& other) const noexcept {
+    if constexpr (KnowsItsRings()) {
+      return Get() == nullptr || Get()->RecordRings::AreOneRing(*this, other);
+    } else {
+      return true;
+    }
+  }
+
   // The source's address is read under the lock: another thread may be assigning to the source.
   template <class U>
   void Join(const RingPtr<U>& other) noexcept {
     const Lock lock;
-    m_pRecord = other.m_pRecord;
-    if (m_pRecord) LinkAfter(other, *this);
+    m_pHeld = static_cast<T*>(other.Get());
+    if (m_pHeld) LinkAfter(other, *this);
   }
   template <class U>
   void Take(RingPtr<U>& other) noexcept {
     const Lock lock;
-    m_pRecord = std::exchange(other.m_pRecord, nullptr);
+    m_pHeld = static_cast<T*>(other.Taken());
     TakePlace(other, *this);
   }
+  T* Taken() noexcept { return static_cast<T*>(std::exchange(m_pHeld, nullptr)); }
   T* Leave() noexcept {
     const Lock lock;
-    T* record = std::exchange(m_pRecord, nullptr);
-    return Unlink(*this) ? record : nullptr;
+    T* record = Taken();
+    if constexpr (KnowsItsRings()) {
+      return record && record->LeaveForDeletion(*this) ? record : nullptr;
+    } else {
+      return Unlink(*this) ? record : nullptr;
+    }
   }
-
-  T* m_pRecord = nullptr;
 };
 
 template <class T, class... Args>

@@ -67,6 +67,7 @@ bool Publication::ForgetWhatLeft() {
   bool forgotten = false;
   for (const InfoDevicePtr& record : current) {
     const std::size_t gone = std::erase_if(record->m_childs, [&](const NodePtr& child) {
+      if (!child) return true;
       const bool leaves = child->m_nType == KUDTInterfaceDevice ||
                           (child->m_nType == KUDTInfoDevice && !current.HasRecord(child.Get()));
       if (leaves) child->m_pParent.ClearIfNaming(record.Get());
@@ -100,7 +101,7 @@ void Publication::Merge(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& device,
   // The entry's parent is the hub port and not the device it belongs to. This is meant.
   entry->m_pParent = static_cast<CZKUMUsbTreeNodeImpl*>(device.m_pParent);
   for (const NodePtr& child : entry->m_childs) {
-    const std::size_t before = device.m_childs.size();
+    const std::size_t before = device.m_childs.size();  // nothing comes of an empty pointer
     AddChild(child, &device);
     if (device.m_childs.size() != before) index.Added(child);
   }
@@ -203,7 +204,9 @@ bool PruneTree(const NodePtr& root) {
       continue;
     }
     const NodePtr& child = node->m_childs[next];
-    if (child->AcceptNode(child)) {
+    if (!child) {
+      ++next;
+    } else if (child->AcceptNode(child)) {
       CZKUMUsbTreeNodeImpl* below = child.Get();
       ++next;
       path.push_back({below, 0});

@@ -10,6 +10,8 @@ CZKUMUsbTreeBuilder::CZKUMUsbTreeBuilder(platform::Host& host)
     : m_walker(host), m_deviceInfo(host, host), m_storage(host), m_host(host) {}
 
 bool CZKUMUsbTreeBuilder::Build() {
+  const RecordsInUse inUse;
+  m_deviceInfo.DropDestroyed();
   m_walker.StartWalk();
   m_deviceInfo.SetDiskDrives(DiskDriveRecords(m_walker.m_deviceRecords));
   // Both caches are asked in every build: each compares with its own last pass, and reports a

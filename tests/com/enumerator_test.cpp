@@ -139,7 +139,10 @@ TEST_F(Collection, NextSkipResetAndCloneInTurn) {
       {"n0 n1 n5 n1", "S_OK 0:, S_OK 1: a, S_FALSE 2: b c, S_FALSE 0:"},
       {"s0 s1 r n3", "S_OK, S_FALSE, S_OK, S_OK 3: a b c"},
       {"r s1 n1 c n1", "S_OK, S_OK, S_OK 1: b, S_OK, S_OK 1: c"},
-      {"c n1 r s4294967295 n1", "S_OK, S_FALSE 0:, S_OK, S_FALSE, S_FALSE 0:"}};
+      {"c n1 r s4294967295 n1", "S_OK, S_FALSE 0:, S_OK, S_FALSE, S_FALSE 0:"},
+      // Exactly what is left is no shortage.
+      {"r s3 n1 s0 s1", "S_OK, S_OK, S_FALSE 0:, S_OK, S_FALSE"},
+      {"r n1 s2 n1 r n3", "S_OK, S_OK 1: a, S_OK, S_FALSE 0:, S_OK, S_OK 3: a b c"}};
   auto list = Make(&items);
   const auto next = [](IEnumVARIANT* from, ULONG count, bool) { return Next(from, count); };
   for (const auto& [steps, expected] : rows) EXPECT_EQ(Play(list, steps, next), expected) << steps;

@@ -1,8 +1,11 @@
 // The way from node to node: Parent, Childs, InSubtreeDevicesOfType.
 #include <algorithm>
 
+#include <gmock/gmock.h>
+
 #include "platform/com_controls.h"
 #include "tests/support/com_objects.h"
+#include "tests/support/outline.h"
 
 namespace KelvoUHW {
 namespace {
@@ -41,6 +44,64 @@ TEST_F(NodeLinks, ParentOwnsItsRecordAndTakesItAlong) {
   EXPECT_EQ(child->m_pParent, nullptr);
   EXPECT_EQ(child.RingSize(), ring - 1);
   EXPECT_EQ(object->get_Parent(&out), E_POINTER);
+}
+
+// A record that the object of a Parent destroyed is held by nobody: not by the tree, not by other objects.
+TEST_F(NodeLinks, WhatAParentDestroyedIsNobodysAnyMore) {
+  for (const bool bySecond : {false, true}) {
+    SampleTree tree;
+    const auto root = Wrap(tree.root), controller = Wrap(tree.controller), hub = Wrap(tree.hub), port = Wrap(tree.port);
+    ComPtr<IZKUMUsbTreeNode> first, second;
+    ASSERT_EQ(port->get_Parent(first.Put()), S_OK);
+    ASSERT_EQ(port->get_Parent(second.Put()), S_OK);
+    EXPECT_EQ(tree.hub.RingSize(), 1u + 1 + 2);  // its own, the tree's, the object's two: none of the two parents'
+    (bySecond ? second : first).Reset();
+    EXPECT_FALSE(tree.hub);
+    EXPECT_EQ(tree.port->m_pParent, nullptr);
+    for (const auto& node : {hub, bySecond ? first : second}) {
+      const auto typed = ComPtr<IUnknown>(node.Get()).As<IZKUMHubDevice>();
+      EXPECT_EQ(InstanceId(node.Get()), "E_FAIL null");
+      EXPECT_EQ(TextOf(&Read<&IZKUMHubDevice::get_PathName>, typed.Get()), "E_POINTER null");
+      EXPECT_EQ(TextOf(&Read<&IZKUMUsbDevice::get_Vendor>, typed.Get()), "E_POINTER null");
+      EXPECT_EQ(NumberOf<&IZKUMUsbTreeNode::get_Type>(node.Get()), "E_INVALIDARG 1515870810");
+      ComPtr<IZKUMUsbTreeNode> parent;
+      EXPECT_EQ(node->get_Parent(parent.Put()), E_POINTER);
+    }
+    // The tree goes on without it, and what hung below lives as long as it is held.
+    ComPtr<IZKUMUsbTreeNodeEnumerator> list;
+    EXPECT_EQ(controller->get_Childs(list.Put()), E_POINTER);
+    EXPECT_EQ(root->get_InSubtreeDevicesOfType(KUDTHub, list.Put()), S_OK);
+    EXPECT_EQ(InstanceId(port.Get()), "S_OK port.InstanceId");
+    EXPECT_THAT(DumpOf(*tree.root), testing::HasSubstr("child 0"));
+    const NodePtr added = MakeRecord<CZKUMUsbTreeNodeImpl>();
+    AddChild(added, tree.controller.Get());
+    EXPECT_EQ(tree.controller->m_childs.back(), added);
+  }
+}
+
+// The tree of a parent's object goes first: the object holds no record then.
+TEST_F(NodeLinks, AParentWhoseTreeIsGoneHoldsNothing) {
+  ComPtr<IZKUMUsbTreeNode> device, port, info;
+  {
+    SampleTree tree;
+    ASSERT_EQ(Wrap(tree.disk)->get_Parent(info.Put()), S_OK);
+    ASSERT_EQ(Wrap(tree.info)->get_Parent(device.Put()), S_OK);
+    ASSERT_EQ(Wrap(tree.device)->get_Parent(port.Put()), S_OK);
+    EXPECT_EQ(InstanceId(port.Get()), "S_OK port.InstanceId");
+  }
+  for (const auto& [node, what] : {std::pair(device, "device"), {port, "port"}, {info, "info"}}) {
+    EXPECT_EQ(InstanceId(node.Get()), "E_FAIL null") << what;
+    ComPtr<IZKUMUsbTreeNodeEnumerator> list;
+    EXPECT_EQ(node->get_Childs(list.Put()), E_POINTER);
+  }
+  const std::string noRecord = " 1515870810";
+  EXPECT_EQ(NumberOf<&IZKUMHubPort::get_PortIndex>(port.Get()), "E_POINTER" + noRecord);
+  EXPECT_EQ(NumberOf<&IZKUMPortDevice::get_Speed>(device.Get()), "E_POINTER" + noRecord);
+  EXPECT_EQ(NumberOf<&IZKUMPortDevice::get_NumberInterfaces>(device.Get()), "E_POINTER 90");
+  EXPECT_EQ(TextOf(&Read<&IZKUMInfoDevice::get_Service>, device.Get()), "E_FAIL null");
+  EXPECT_EQ(TextOf(&Read<&IZKUMInfoDevice::get_Service>, info.Get()), "E_FAIL null");
+  ComPtr<IEnumVARIANT> list;
+  EXPECT_EQ(device.As<IZKUMPortDevice>()->get_InterfaceDescriptors(list.Put()), E_POINTER);
 }
 
 TEST_F(NodeLinks, WhatIsAnsweredInTheirPlace) {

@@ -1,5 +1,6 @@
 // Clients on threads of their own read and release while builds replace the tree. Made for the thread sanitizer.
 #include <array>
+#include <atomic>
 #include <cstddef>
 #include <thread>
 
@@ -101,6 +102,78 @@ TEST(TreeThreads, ClientsReadAndReleaseWhileBuildsReplaceTheTree) {
     EXPECT_EQ(seen.failures, 0u);
     EXPECT_GE(seen.nodes, 1000u);
     EXPECT_GE(seen.texts, seen.nodes);
+  }
+}
+
+// A client that asks each node for its parent, keeps some of the answers and lets go of the others, each of which
+// destroys a record of the tree that is current.
+void AskForParents(IZKUMUsbTree& tree, std::array<Node, 16>& kept, std::size_t& parents) {
+  Node root;
+  if (FAILED(tree.get_RootNode(root.Put()))) return;
+  testing_support::WalkChilds(root, [&](const Node& node) {
+    Node parent;
+    if (FAILED(node->get_Parent(parent.Put()))) return;
+    testing_support::ReadProperties(parent, [](const char*, HRESULT, auto) {});
+    if (++parents % 3 != 0) kept[parents % kept.size()] = parent;
+  });
+}
+
+TEST(TreeThreads, ClientsDestroyParentsWhileBuildsReplaceTheTree) {
+  TreeDesk desk(Desk<WellFedHost>(BarePc(), {ExternalHub(u"HUB", 1), Gadget(u"M1", 1, UsbId(u"HUB")),
+                                             Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)})
+                    .pc.Snapshot());
+  ASSERT_EQ(desk.Rebuild(), S_OK);
+  std::array<std::array<Node, 16>, 3> kept;
+  std::array<std::size_t, 3> parents{};
+  {
+    std::atomic<bool> done = false;
+    std::vector<std::jthread> threads;
+    for (std::size_t i = 0; i < kept.size(); ++i) {
+      threads.emplace_back([&, i] {
+        while (!done) AskForParents(*desk.tree.Get(), kept[i], parents[i]);
+      });
+    }
+    for (int build = 0; build < 150 && !HasFailure(); ++build) {
+      desk.Do(build % 2 == 0 ? Change(Stick(u"S2", 4, u'F')) : Change(Unplug{UsbId(u"S2")}));
+      EXPECT_EQ(desk.Rebuild(), S_OK);
+    }
+    done = true;
+  }
+  for (const std::size_t asked : parents) EXPECT_GE(asked, 100u);
+  kept = {};
+  // Devices whose data was destroyed come anew: two builds later all is there again.
+  for (const Change& change :
+       {Change(Stick(u"S2", 4, u'F')), Change(Unplug{UsbId(u"S2")}), Change(Stick(u"S2", 4, u'F'))}) {
+    desk.Do(change);
+    EXPECT_EQ(desk.Rebuild(), S_OK);
+  }
+  Nodes list;
+  EXPECT_EQ(desk.tree->get_PortDevicesWithVolume(list.Put()), S_OK);
+  VARIANT_BOOL more = VARIANT_TRUE;
+  int withVolume = -1;
+  for (; more != VARIANT_FALSE; ++withVolume) list->MoveNext(&more);
+  EXPECT_EQ(withVolume, 3);
+}
+
+// Kept until nobody else holds the tree, the last list of what left among them: the record is gone and the object says
+// so.
+TEST(TreeThreads, AParentThatIsKeptOverBuildsHoldsNothing) {
+  TreeDesk desk(Desk<WellFedHost>(BarePc(), {Stick(u"S1", 2, u'E')}).pc.Snapshot());
+  ASSERT_EQ(desk.Rebuild(), S_OK);
+  std::vector<Node> parents;
+  testing_support::WalkChilds(desk.Root(), [&](const Node& node) {
+    Node parent;
+    if (node->get_Parent(parent.Put()) == S_OK) parents.push_back(parent);
+  });
+  ASSERT_GE(parents.size(), 5u);
+  for (const Change& change : {Change(Gadget(u"M1", 1)), Change(Unplug{UsbId(u"S1")}), Change(Gadget(u"M2", 2))}) {
+    desk.Do(change);
+    EXPECT_EQ(desk.Rebuild(), S_OK);
+  }
+  for (const Node& parent : parents) {
+    BSTR id = nullptr;
+    EXPECT_EQ(parent->get_InstanceId(&id), E_FAIL);
+    EXPECT_EQ(id, nullptr);
   }
 }
 

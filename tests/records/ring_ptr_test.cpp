@@ -99,5 +99,68 @@ TEST(Ring, ThreadsCopyWhileOneAssigns) {
   EXPECT_EQ(g_nDerived, 1);
 }
 
+struct Shared : RecordRings {
+  ~Shared() { --alive; }
+  static void Destroy(Shared* record) noexcept {
+    record->LetAllGo();
+    delete record;
+  }
+  const int number = ++made;
+  static inline int made = 0, alive = 0;
+};
+
+// Pointers at random in rings of their own or not, against a model that says for each which record it holds and in
+// which ring. The first ring of a record that is left takes the record from all others.
+TEST(Ring, TheFirstOfSeveralRingsThatIsLeftDestroysTheRecord) {
+  std::mt19937 random(5);
+  std::array<RingPtr<Shared>, 8> pointers;
+  struct Place {
+    int record = 0, ring = 0;  // 0: none
+    bool operator==(const Place&) const = default;
+  };
+  std::array<Place, 8> model{};
+  int rings = 0, destroyedByOthers = 0;
+  for (int step = 0; step < 20'000; ++step) {
+    const std::size_t to = random() % 8, from = random() % 8, what = random() % 7;
+    RingPtr<Shared>&target = pointers[to], &source = pointers[from];
+    Place set = model[from];
+    const Place before = model[to];
+    if (what == 0) ++Shared::alive, target = MakeRecord<Shared>(), set = {Shared::made, ++rings};
+    if (what == 1) target = source;
+    if (what == 2) target = std::move(source);
+    if (what == 3) target.Swap(source);
+    if (what == 4) target.Reset(), set = {};
+    if (what == 5 && source) {
+      target = RingPtr<Shared>::InARingOfItsOwn(source.Get());
+      set.ring = ++rings;
+    }
+    if (what == 5 && model[from].record == 0) set = before;
+    if (what == 6) target = RingPtr<Shared>(source), target.Swap(target);
+    model[to] = set;
+    if (what == 2 && to != from) model[from] = {};
+    if (what == 3) model[from] = before;
+    // What the overwritten pointer let go of last takes the others along.
+    if (before.record != 0 && std::ranges::count(model, before) == 0) {
+      for (Place& place : model) {
+        if (place.record == before.record) place = {}, ++destroyedByOthers;
+      }
+    }
+    for (std::size_t i = 0; i < pointers.size(); ++i) {
+      ASSERT_EQ(pointers[i] ? pointers[i]->number : 0, model[i].record) << step;
+      ASSERT_EQ(pointers[i].RingSize(), model[i].record ? std::ranges::count(model, model[i]) : 0) << step;
+    }
+    std::set<int> alive;
+    for (const Place& place : model) alive.insert(place.record);
+    ASSERT_EQ(Shared::alive, static_cast<int>(alive.size() - alive.count(0))) << step;
+  }
+  EXPECT_GE(destroyedByOthers, 300);
+  // One that gives up without destroying leaves the others theirs.
+  pointers = {};
+  ++Shared::alive, pointers[0] = MakeRecord<Shared>();
+  pointers[1] = RingPtr<Shared>::InARingOfItsOwn(pointers[0].Get());
+  pointers[1].Abandon();
+  EXPECT_TRUE(pointers[0] && pointers[0]->IsHeld() && !pointers[1]);
+}
+
 }  // namespace
 }  // namespace KelvoUHW

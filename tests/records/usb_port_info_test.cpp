@@ -19,6 +19,7 @@ TEST(ConnectionRecord, BeginsAtZeroAndIsCounted) {
   const platform::ConnectionInformationEx& base = *record;
   const std::span bytes(reinterpret_cast<const unsigned char*>(&base), sizeof(base));
   EXPECT_EQ(std::ranges::count(bytes, 0), 365);
+  EXPECT_LE(sizeof(ConnectionRecord), 384u);  // what each build keeps for a hub
   EXPECT_EQ(ConnectionRecord::LiveCount(), live + 1);
   record->~ConnectionRecord();
   EXPECT_EQ(ConnectionRecord::LiveCount(), live);

@@ -2,7 +2,11 @@
 
 #include <gmock/gmock.h>
 
+#include <functional>
+#include <map>
+
 #include "platform/wrappers/failing_host.h"
+#include "records/devnode.h"
 #include "tests/support/desk_pc.h"
 #include "tests/support/outline.h"
 #include "tree/publication.h"
@@ -10,7 +14,7 @@
 namespace KelvoUHW {
 namespace {
 
-using platform::simulated::Dismount, platform::simulated::Mount;
+using platform::Status, platform::simulated::Dismount, platform::simulated::Mount;
 using testing::HasSubstr, testing::Not;
 
 Change Out(const Text& id) { return Unplug{id}; }
@@ -167,6 +171,75 @@ TEST(Builds, ARemovedReaderShowsTheCardThatLeft) {
   EXPECT_THAT(DumpOf(*removed), HasSubstr("devMountPoint   : F:\\\r\n"));
   EXPECT_EQ(removed.StaticCast<CZKUMPortDeviceImpl>()->m_infoDevice->m_pParent,
             static_cast<CZKUMUsbTreeNodeImpl*>(removed->m_pParent));
+}
+
+// Unplugs devices while the driver keys are read: each as soon as its own key was asked for.
+struct HostThatLoses final : platform::wrappers::InterceptingHost {
+  explicit HostThatLoses(SimulatedPc& simulated) : InterceptingHost(simulated), pc(simulated) {}
+  Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
+  void AfterCall(const platform::wrappers::HostCall& call, const Status&, const std::intptr_t*) noexcept override {
+    if (call.operation != platform::wrappers::Operation::GetDevNodeRegistryProperty ||
+        call.code != platform::kCM_DRP_DRIVER)
+      return;
+    for (std::size_t i = 0; i < leaving.size(); ++i) {
+      const Text id = KelvoUHW::GetDeviceId(pc, static_cast<platform::DevInst>(call.handle));
+      if (id != leaving[i]) continue;
+      leaving.erase(leaving.begin() + static_cast<std::ptrdiff_t>(i));
+      EXPECT_EQ(pc.Apply({0, u"", Unplug{id}}), u"");
+    }
+  }
+  SimulatedPc& pc;
+  std::vector<Text> leaving;
+};
+
+TEST(Builds, ADeviceThatGoesDuringTheWalkTakesNoOtherAlong) {
+  const std::tuple<std::vector<const char16_t*>, const char*> cases[] = {
+      {{u"X"}, "A B C D | - | X | -"},
+      {{u"X", u"B", u"A"}, "C D | - | A X B | -"},
+      {{u"D"}, "A X B C | - | D | -"},
+      // Each goes in the search for the next one's key, when no walk came to its end so far.
+      {{u"A", u"X", u"B", u"C"}, "D | - | A X B C | -"}};
+  for (const auto& [leaving, lists] : cases) {
+    Desk<HostThatLoses> desk(BarePc(),
+                             {Gadget(u"A", 1), Gadget(u"X", 2), Gadget(u"B", 3), Gadget(u"C", 4), Gadget(u"D", 5)});
+    EXPECT_TRUE(desk.builder.Build());
+    desk.builder.CommitDeviceCache();
+    for (const char16_t* serial : leaving) desk.host.leaving.push_back(UsbId(serial));
+    EXPECT_TRUE(desk.builder.Build());
+    EXPECT_TRUE(desk.host.leaving.empty());
+    EXPECT_EQ(ListsText(desk.builder), lists);
+    desk.builder.CommitDeviceCache();
+    EXPECT_FALSE(desk.builder.Build());
+  }
+}
+
+// Acts before the first call of a kind.
+struct HostThatActs final : platform::wrappers::InterceptingHost {
+  using InterceptingHost::InterceptingHost;
+  Status BeforeCall(const platform::wrappers::HostCall& call) noexcept override {
+    if (const auto found = first.find(call.operation); found != first.end()) std::exchange(found->second, [] {})();
+    return {};
+  }
+  std::map<platform::wrappers::Operation, std::function<void()>> first;
+};
+
+// A device that is reset is away for the walk and back for the device manager: it is told of as removed by a build that
+// publishes, and never as attached again. Only the connected ones tell that it is there.
+TEST(Builds, ADeviceThatIsResetDuringABuildIsToldOnlyAsConnected) {
+  Desk<HostThatActs> desk(BarePc(), {Gadget(u"A", 1), Gadget(u"B", 2)});
+  const auto build = [&] {
+    const std::string lists = desk.builder.Build() ? ListsText(desk.builder) : "same";
+    desk.builder.CommitDeviceCache();
+    return lists;
+  };
+  EXPECT_EQ(build(), "A B | A B | - | -");
+  desk.Do({Gadget(u"C", 3)});
+  desk.host.first = {{platform::wrappers::Operation::OpenDevice, [&] { desk.Do({Out(UsbId(u"B"))}); }},
+                     {platform::wrappers::Operation::GetClassImageList, [&] { desk.Do({Gadget(u"B", 2)}); }}};
+  EXPECT_EQ(build(), "A C | C | B | -");
+  EXPECT_EQ(build(), "same");
+  desk.Do({Gadget(u"D", 4)});
+  EXPECT_EQ(build(), "A C B D | D | - | -");
 }
 
 // A link into freed memory is found by the address sanitizer.
