@@ -3,7 +3,7 @@
 
 namespace {
 
-[[maybe_unused]] const bool registered = [] {
+[[maybe_unused]] const bool buildRegistered = [] {
   for (const bench::Work work :
        {bench::Work::First, bench::Work::Unchanged, bench::Work::OneMore}) {
     bench::RegisterWork(work);

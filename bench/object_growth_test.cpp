@@ -14,7 +14,7 @@ namespace {
 
 using platform::simulated::GeneratedShape;
 
-constexpr std::size_t kDevices = 250;
+constexpr std::size_t kObjectDevices = 250;
 
 class ObjectGrowth : public testing::TestWithParam<GeneratedShape> {};
 
@@ -25,8 +25,8 @@ TEST_P(ObjectGrowth, IsTheSamePerNode) {
     for (const ObjectWork work : kObjectWorks) costs.push_back(workload.CostOf(work));
     return costs;
   };
-  const std::vector<ObjectCost> smallCosts = run(kDevices);
-  const std::vector<ObjectCost> largeCosts = run(kDevices * 10);
+  const std::vector<ObjectCost> smallCosts = run(kObjectDevices);
+  const std::vector<ObjectCost> largeCosts = run(kObjectDevices * 10);
   for (const ObjectWork work : kObjectWorks) {
     SCOPED_TRACE(NameOf(work));
     const ObjectCost& small = smallCosts[static_cast<std::size_t>(work)];

@@ -25,7 +25,7 @@ void RunWork(benchmark::State& state, bench::ObjectWork work, GeneratedShape sha
 }
 
 // The devices of trees with about 100, 1,000 and 10,000 nodes, and of one that is larger still.
-[[maybe_unused]] const bool registered = [] {
+[[maybe_unused]] const bool objectsRegistered = [] {
   for (const GeneratedShape shape : {GeneratedShape::Wide, GeneratedShape::Deep}) {
     for (const bench::ObjectWork work : bench::kObjectWorks) {
       const std::string name =

@@ -3,7 +3,7 @@
 
 namespace {
 
-[[maybe_unused]] const bool registered = [] {
+[[maybe_unused]] const bool walkRegistered = [] {
   bench::RegisterWork(bench::Work::Walk);
   return true;
 }();

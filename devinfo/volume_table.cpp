@@ -18,7 +18,7 @@ namespace {
 using platform::Status;
 
 constexpr std::uint32_t kNameChars = 260;
-using NameBuffer = std::array<char16_t, kNameChars>;
+using VolumeNameBuffer = std::array<char16_t, kNameChars>;
 
 constexpr std::uint32_t kPathNamesChars = 7800;
 // Bounds for a system that never stops asking for more: characters of a list, and calls for it.
@@ -42,7 +42,7 @@ std::vector<std::u16string> SplitTexts(std::span<const char16_t> buffer) {
 
 std::optional<std::u16string> VolumeNameOf(platform::VolumeManager& volumes,
                                            const std::u16string& mountPoint) {
-  NameBuffer name{};
+  VolumeNameBuffer name{};
   if (!volumes.VolumeNameForMountPoint(mountPoint.c_str(), name.data(), kNameChars)) return {};
   return ReceivedText(name);
 }
@@ -52,7 +52,7 @@ class VolumeTableBuilder {
   explicit VolumeTableBuilder(platform::VolumeManager& volumes) : m_volumes(volumes) {}
 
   VolumeTable Build() {
-    NameBuffer name{};
+    VolumeNameBuffer name{};
     VolumeSearch search(m_volumes);
     for (Status found = search.First(name.data(), kNameChars); found && TakeStep();
          found = search.Next(name.data(), kNameChars)) {
@@ -108,7 +108,7 @@ class VolumeTableBuilder {
     if (!SupportsReparsePoints(volumeName)) return;
 
     const std::u16string root = RootOf(volumeName);
-    NameBuffer folder{};
+    VolumeNameBuffer folder{};
     MountPointSearch search(m_volumes);
     for (Status found = search.First(volumeName, folder.data(), kNameChars); found;
          found = search.Next(folder.data(), kNameChars)) {

@@ -15,11 +15,11 @@ constinit std::atomic<std::uint32_t> g_nEventThreads = 0;
 
 namespace {
 
-constexpr std::uint32_t kPollMilliseconds = 10;
+constexpr std::uint32_t kTeardownPollMilliseconds = 10;
 
 void WaitForNone(const std::atomic<std::uint32_t>& count) noexcept {
   try {
-    while (count != 0) platform::CurrentSystem().threads->Sleep(kPollMilliseconds);
+    while (count != 0) platform::CurrentSystem().threads->Sleep(kTeardownPollMilliseconds);
   } catch (...) {
     // The process has ended, and with it those that were waited for.
   }

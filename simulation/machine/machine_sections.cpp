@@ -9,7 +9,7 @@ namespace platform::simulated {
 namespace {
 
 constexpr std::size_t kMostIdCharacters = 199;  // 200 with the zero behind it
-constexpr std::size_t kMostPorts = 255;
+constexpr std::size_t kMostHubPorts = 255;
 
 // A GUID as "{8-4-4-4-12}", digits in either case.
 std::optional<Guid> GuidFrom(const std::u16string& text) {
@@ -207,7 +207,7 @@ void FromJson(const JsonValue& value, Port& out) {
 void FromJson(const JsonValue& value, Hub& out) {
   JsonObject object(value);
   NeedAs<Name>(object, "name", out.name);
-  if (object.Need("ports", out.ports) && out.ports.size() > kMostPorts) {
+  if (object.Need("ports", out.ports) && out.ports.size() > kMostHubPorts) {
     FailAt(value.File(), object.PlaceOf("ports"), "has more than 255 entries");
   }
   object.Read("busPowered", out.busPowered);

@@ -12,7 +12,7 @@
 namespace platform::simulated {
 namespace {
 
-constexpr MachineIndex::Position kNone = MachineIndex::kNone;
+constexpr MachineIndex::Position kNobody = MachineIndex::kNone;
 
 // Whether the id carries that of a removed disk, `_??_` before and `#{` behind it, # for each \.
 bool CarriesRemoved(const Text& loweredId, const std::unordered_set<Text>& removedMarks) {
@@ -70,7 +70,7 @@ class Removal {
       if (!m_ids.insert(id).second) continue;
       m_marks.insert(Mark(id));
       if (m_machine.devices[device].driver) m_drivers.Add(*m_machine.devices[device].driver);
-      for (MachineIndex::Position child = m_index.FirstChild(device); child != kNone;
+      for (MachineIndex::Position child = m_index.FirstChild(device); child != kNobody;
            child = m_index.NextSibling(child)) {
         pending.push_back(child);
       }

@@ -8,32 +8,32 @@
 namespace platform::simulated {
 namespace {
 
-using Bytes = std::string;  // which has a hash
-using Values = std::optional<Bytes> (*)(const Device&);
+using ValueBytes = std::string;  // which has a hash
+using Values = std::optional<ValueBytes> (*)(const Device&);
 
-Bytes BytesOf(const Text& text) {
+ValueBytes BytesOf(const Text& text) {
   return {reinterpret_cast<const char*>(text.c_str()), (text.size() + 1) * sizeof(char16_t)};
 }
 
 template <auto kMember>
-std::optional<Bytes> TextValue(const Device& device) {
+std::optional<ValueBytes> TextValue(const Device& device) {
   if (!(device.*kMember)) return std::nullopt;
   return BytesOf(*(device.*kMember));
 }
 
 template <auto kMember>
-std::optional<Bytes> ListValue(const Device& device) {
+std::optional<ValueBytes> ListValue(const Device& device) {
   if (!(device.*kMember)) return std::nullopt;
-  Bytes bytes;
+  ValueBytes bytes;
   for (const Text& text : *(device.*kMember)) bytes += BytesOf(text);
   return bytes += BytesOf(Text());
 }
 
 template <auto kMember>
-std::optional<Bytes> NumberValue(const Device& device) {
+std::optional<ValueBytes> NumberValue(const Device& device) {
   if (!(device.*kMember)) return std::nullopt;
   static_assert(sizeof(*(device.*kMember)) == 4);
-  return Bytes(reinterpret_cast<const char*>(&*(device.*kMember)), 4);
+  return ValueBytes(reinterpret_cast<const char*>(&*(device.*kMember)), 4);
 }
 
 struct Property {
@@ -63,10 +63,10 @@ constexpr std::array kKnown = {
 PropertyTable::PropertyTable(const std::vector<Device>& devices) {
   static_assert(kKnown.size() == kProperties);
   for (std::size_t i = 0; i < kKnown.size(); ++i) {
-    std::unordered_map<Bytes, std::uint32_t> offsets;
+    std::unordered_map<ValueBytes, std::uint32_t> offsets;
     m_places[i].reserve(devices.size());
     for (const Device& device : devices) {
-      const std::optional<Bytes> value = kKnown[i].values(device);
+      const std::optional<ValueBytes> value = kKnown[i].values(device);
       if (!value) {
         m_places[i].push_back({0, 0});
         continue;

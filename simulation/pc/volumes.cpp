@@ -9,7 +9,7 @@ namespace platform::simulated {
 namespace {
 
 using Position = MachineIndex::Position;
-constexpr Position kNone = MachineIndex::kNone;
+constexpr Position kNoPosition = MachineIndex::kNone;
 
 constexpr std::uint32_t kERROR_PATH_NOT_FOUND = 3;
 constexpr std::uint32_t kERROR_DIR_NOT_ROOT = 144;
@@ -40,18 +40,18 @@ std::optional<Text> PlaceKey(const char16_t* path) {
 // The volume of a root, a mount folder, a volume name or the path of a volume's device interface;
 // each with the backslash at the end.
 Position VolumeAt(const IndexedMachine& now, const Text& key) {
-  if (const Position byName = now.index.Volume(key); byName != kNone) return byName;
-  if (const Position byPath = now.index.VolumeByPath(key); byPath != kNone) return byPath;
+  if (const Position byName = now.index.Volume(key); byName != kNoPosition) return byName;
+  if (const Position byPath = now.index.VolumeByPath(key); byPath != kNoPosition) return byPath;
   const Position interface = now.index.Interface(key.substr(0, key.size() - 1));
-  if (interface == kNone) return kNone;
+  if (interface == kNoPosition) return kNoPosition;
   const Interface& entry = now.machine.interfaces[interface];
-  if (entry.interfaceClass != GUID_DEVINTERFACE_VOLUME) return kNone;
+  if (entry.interfaceClass != GUID_DEVINTERFACE_VOLUME) return kNoPosition;
   return now.index.VolumeByDevice(ToLower(entry.device));
 }
 
 // Whether the place is on a drive that stands, as a folder may be that no volume is mounted in.
 bool IsOnDrive(const MachineIndex& index, std::u16string_view key) {
-  return key.size() >= 3 && IsDriveRoot(key.substr(0, 3)) && index.Drive(key[0]) != kNone;
+  return key.size() >= 3 && IsDriveRoot(key.substr(0, 3)) && index.Drive(key[0]) != kNoPosition;
 }
 
 }  // namespace
@@ -91,7 +91,7 @@ Status SimulatedPc::VolumePathNames(const char16_t* volumeName, char16_t* names,
   if (!key) return Status::Failure(kERROR_INVALID_NAME);
   const std::lock_guard lock(m_state->mutex);
   const Position volume = m_state->now->index.Volume(*key);
-  if (volume == kNone) return Status::Failure(kERROR_FILE_NOT_FOUND);
+  if (volume == kNoPosition) return Status::Failure(kERROR_FILE_NOT_FOUND);
   Text list;
   for (const Text& path : m_state->now->machine.volumes[volume].paths) list += path + u'\0';
   list += u'\0';
@@ -107,7 +107,7 @@ Status SimulatedPc::VolumeNameForMountPoint(const char16_t* mountPoint, char16_t
   if (!key) return Status::Failure(kERROR_INVALID_NAME);
   const std::lock_guard lock(m_state->mutex);
   const Position volume = VolumeAt(*m_state->now, *key);
-  if (volume == kNone) return Status::Failure(kERROR_FILE_NOT_FOUND);
+  if (volume == kNoPosition) return Status::Failure(kERROR_FILE_NOT_FOUND);
   return GiveName(m_state->now->machine.volumes[volume].name, name, nameChars);
 }
 
@@ -116,7 +116,7 @@ std::uint32_t SimulatedPc::LogicalDriveStrings(std::uint32_t bufferChars,
   const std::lock_guard lock(m_state->mutex);
   Text list;
   for (char16_t letter = u'A'; letter <= u'Z'; ++letter) {
-    if (m_state->now->index.Drive(letter) != kNone) list += Text(1, letter) + u":\\" + u'\0';
+    if (m_state->now->index.Drive(letter) != kNoPosition) list += Text(1, letter) + u":\\" + u'\0';
   }
   const auto written = static_cast<std::uint32_t>(list.size());
   if (buffer == nullptr || bufferChars <= written) return written + 1;
@@ -134,7 +134,7 @@ std::uint32_t SimulatedPc::DriveType(const char16_t* path) noexcept {
     return now.machine.drives[now.index.Drive(letter)].type;
   };
   if (IsDriveRoot(*key) && IsOnDrive(now.index, *key)) return typeOfDrive(key->front());
-  if (const Position volume = VolumeAt(now, *key); volume != kNone) {
+  if (const Position volume = VolumeAt(now, *key); volume != kNoPosition) {
     return now.machine.volumes[volume].driveType;
   }
   // A folder below: that of the volume in which it stands, the one with the longest path.
@@ -143,7 +143,7 @@ std::uint32_t SimulatedPc::DriveType(const char16_t* path) noexcept {
     above.pop_back();
     above.resize(above.rfind(u'\\') + 1);  // no backslash left: empty
     const Position volume = now.index.VolumeByPath(above);
-    if (volume != kNone && !IsDriveRoot(above)) return now.machine.volumes[volume].driveType;
+    if (volume != kNoPosition && !IsDriveRoot(above)) return now.machine.volumes[volume].driveType;
   }
   if (IsOnDrive(now.index, above)) return typeOfDrive(above.front());
   return kDRIVE_NO_ROOT_DIR;
@@ -158,7 +158,7 @@ Status SimulatedPc::VolumeInformation(const char16_t* path, char16_t* label,
   const std::lock_guard lock(m_state->mutex);
   const IndexedMachine& now = *m_state->now;
   const Position position = VolumeAt(now, *key);
-  if (position == kNone) {
+  if (position == kNoPosition) {
     if (!IsOnDrive(now.index, *key)) return Status::Failure(kERROR_PATH_NOT_FOUND);
     return Status::Failure(IsDriveRoot(*key) ? kERROR_NOT_READY : kERROR_DIR_NOT_ROOT);
   }
@@ -180,7 +180,7 @@ Status SimulatedPc::FirstMountPoint(const char16_t* volumeName, char16_t* mountP
   if (!key) return Status::Failure(kERROR_INVALID_NAME);
   const std::lock_guard lock(m_state->mutex);
   const Position volume = m_state->now->index.Volume(*key);
-  if (volume == kNone) return Status::Failure(kERROR_FILE_NOT_FOUND);
+  if (volume == kNoPosition) return Status::Failure(kERROR_FILE_NOT_FOUND);
   MountPointSearch found;
   for (const FolderMount& mount : m_state->now->machine.volumes[volume].folderMounts) {
     found.folders.push_back(mount.folder);
@@ -216,8 +216,9 @@ Status SimulatedPc::DosDeviceTarget(const char16_t* name, char16_t* target,
   const std::u16string_view asked(name);
   const std::lock_guard lock(m_state->mutex);
   const IndexedMachine& now = *m_state->now;
-  const Position drive = asked.size() == 2 && asked[1] == u':' ? now.index.Drive(asked[0]) : kNone;
-  if (drive == kNone || !now.machine.drives[drive].dosDevice) {
+  const Position drive =
+      asked.size() == 2 && asked[1] == u':' ? now.index.Drive(asked[0]) : kNoPosition;
+  if (drive == kNoPosition || !now.machine.drives[drive].dosDevice) {
     return Status::Failure(kERROR_FILE_NOT_FOUND);
   }
   // One target and the empty text that ends the list.

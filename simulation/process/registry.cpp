@@ -11,8 +11,8 @@ namespace platform::simulated {
 namespace {
 
 // Far from the handles of files and sets, so that one is never taken for the other.
-constexpr RegistryKeyHandle kFirstHandle = 0x20000000;
-constexpr RegistryKeyHandle kHandleStep = 4;
+constexpr RegistryKeyHandle kFirstKey = 0x20000000;
+constexpr RegistryKeyHandle kKeyStep = 4;
 
 constexpr std::size_t kMaxLevels = 512;
 constexpr std::size_t kMaxValueNameChars = 16383;
@@ -44,8 +44,7 @@ std::u16string DataText(std::uint32_t type, const std::vector<std::uint8_t>& byt
 
 }  // namespace
 
-SimulatedRegistry::SimulatedRegistry()
-    : m_root(std::make_shared<Key>()), m_nextHandle(kFirstHandle) {
+SimulatedRegistry::SimulatedRegistry() : m_root(std::make_shared<Key>()), m_nextHandle(kFirstKey) {
   m_root->name = u"HKEY_CLASSES_ROOT";
 }
 
@@ -80,7 +79,7 @@ Status SimulatedRegistry::Split(const char16_t* path,
 
 RegistryKeyHandle SimulatedRegistry::Hand(const std::shared_ptr<Key>& key, std::uint32_t access) {
   const RegistryKeyHandle handle = m_nextHandle;
-  m_nextHandle += kHandleStep;
+  m_nextHandle += kKeyStep;
   m_open.emplace(handle, OpenedKey{key, access, PathOf(*key)});
   return handle;
 }

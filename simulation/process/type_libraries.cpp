@@ -9,7 +9,7 @@
 namespace platform::simulated {
 namespace {
 
-constexpr TypeLibraryHandle kFirstHandle = 0x30000000;
+constexpr TypeLibraryHandle kFirstLibrary = 0x30000000;
 
 // The system's marshallers of interfaces that a type library describes.
 constexpr char16_t kLibraryMarshaller[] = u"{00020424-0000-0000-C000-000000000046}";
@@ -69,7 +69,7 @@ bool DeleteIfEmpty(Registry& registry, const std::u16string& path) {
 }  // namespace
 
 SimulatedTypeLibraries::SimulatedTypeLibraries(Registry& registry)
-    : m_registry(registry), m_nextHandle(kFirstHandle) {}
+    : m_registry(registry), m_nextHandle(kFirstLibrary) {}
 
 void SimulatedTypeLibraries::Add(std::u16string_view path, TypeLibrary library) {
   const std::lock_guard lock(m_mutex);

@@ -15,7 +15,7 @@ namespace {
 constexpr HRESULT kNoConnection = static_cast<HRESULT>(0x80040200);
 constexpr HRESULT kAdviseLimit = static_cast<HRESULT>(0x80040201);
 constexpr HRESULT kCannotConnect = static_cast<HRESULT>(0x80040202);
-constexpr HRESULT kOtherCode = static_cast<HRESULT>(0x80070005);
+constexpr HRESULT kSinkCode = static_cast<HRESULT>(0x80070005);
 constexpr DWORD kMark = 0xA5A5A5A5;
 
 using Scene = NotifierScene;
@@ -88,11 +88,11 @@ TEST_F(DeviceEventProxy, AdviseCodes) {
       {"sink fails", [](Scene& s) { s.a.onEvent = [] { return E_FAIL; }; }, S_OK, true, "build list0 reset", "A 0 c"},
       {"no IUnknown", [](Scene& s) { s.a.unknownCode = E_NOINTERFACE; }, E_NOINTERFACE, false, "", ""},
       {"no event interface", answers({E_NOINTERFACE}), kCannotConnect, false, "", ""},
-      {"another code", answers({kOtherCode}), kOtherCode, false, "", ""},
+      {"another code", answers({kSinkCode}), kSinkCode, false, "", ""},
       {"throws when asked", answers({TestSink::kThrows}), E_FAIL, false, "", ""},
       {"no event interface the second time", answers({S_OK, E_NOINTERFACE}), E_NOINTERFACE, true, "", ""},
-      {"build fails", [](Scene& s) { s.tree.built = kOtherCode; }, kOtherCode, true, "build", ""},
-      {"list fails", [](Scene& s) { s.tree.listed = kOtherCode; }, E_FAIL, true, "build list0", ""},
+      {"build fails", [](Scene& s) { s.tree.built = kSinkCode; }, kSinkCode, true, "build", ""},
+      {"list fails", [](Scene& s) { s.tree.listed = kSinkCode; }, E_FAIL, true, "build list0", ""},
       {"no list", [](Scene& s) { s.tree.withoutLists = true; }, E_FAIL, true, "build list0", ""},
       {"unadvised meanwhile", unadvises, S_OK, false, "build list0 reset", ""},
   };
@@ -176,7 +176,7 @@ TEST_F(DeviceEventProxy, FiringAnswersTheLastCode) {
     const char* log;
   } kCases[] = {
       {{E_FAIL, S_OK, S_OK}, false, S_OK, "A 1 d, B 1 d, C 1 d"},
-      {{S_OK, S_OK, kOtherCode}, false, kOtherCode, "A 1 d, B 1 d, C 1 d"},
+      {{S_OK, S_OK, kSinkCode}, false, kSinkCode, "A 1 d, B 1 d, C 1 d"},
       {{E_FAIL, S_FALSE, E_FAIL}, true, S_FALSE, "B 1 d"},
   };
   Scene scene;

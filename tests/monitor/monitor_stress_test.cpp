@@ -11,7 +11,7 @@ namespace {
 
 using platform::simulated::VolumeBroadcast;
 
-constexpr std::uint32_t kArrival = platform::kDBT_DEVICEARRIVAL;
+constexpr std::uint32_t kAnyArrival = platform::kDBT_DEVICEARRIVAL;
 
 TEST(MonitorStress, FourThreadsShareTheLock) {
   constexpr std::size_t kThreads = 4;
@@ -54,8 +54,8 @@ TEST(MonitorStress, StartsAndTearsDownInFreshProcesses) {
     receiver->Start(&target);  // whether the window is there in time is a matter of luck on the real clock
     std::thread sender([&] {
       for (std::size_t i = 0; i < kBroadcasts; ++i) {
-        process.desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0));
-        process.desktop.Broadcast(NamedBroadcast(kArrival, 5, kWatchedPath));
+        process.desktop.Broadcast(VolumeBroadcast(kAnyArrival, u'E', 0));
+        process.desktop.Broadcast(NamedBroadcast(kAnyArrival, 5, kWatchedPath));
       }
     });
     // Half of them tear down amid the broadcasts.

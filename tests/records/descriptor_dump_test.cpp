@@ -111,7 +111,7 @@ TEST(DescriptorDump, UnknownBytesStandSixteenToALine) {
   }
 }
 
-std::string Connection(const platform::ConnectionInformationEx& record) {
+std::string ConnectionText(const platform::ConnectionInformationEx& record) {
   std::u16string out;
   DumpConnectionInformation(record, u"-", out);
   return platform::ToUtf8(out);
@@ -119,11 +119,11 @@ std::string Connection(const platform::ConnectionInformationEx& record) {
 
 TEST(ConnectionDump, WritesTheDeviceThePortAndTheOpenPipes) {
   platform::ConnectionInformationEx record{};
-  EXPECT_EQ(Connection(record), "-ConnectionStatus: NoDeviceConnected\r\n");
+  EXPECT_EQ(ConnectionText(record), "-ConnectionStatus: NoDeviceConnected\r\n");
   record.Info = {1, {18, 1, 0x0200, 9, 1, 2, 64, 0x46D, 0xC018, 0x4301, 1, 2, 3, 4}, 5, 2, 1, 0x107, 1, 1};
   // It says 9 bytes: its last two come from the place behind the descriptor.
   record.PipeList[0] = {{9, 5, 0x81, 3, 8, 10}, 0x0000BBAA};
-  EXPECT_EQ(Connection(record), Golden("connection-information"));
+  EXPECT_EQ(ConnectionText(record), Golden("connection-information"));
 }
 
 TEST(ConnectionDump, TakesNoNumberFromTheRecordAtItsWord) {
@@ -145,7 +145,7 @@ TEST(ConnectionDump, TakesNoNumberFromTheRecordAtItsWord) {
     record->Info.ConnectionStatus = c.Status;
     record->Info.Speed = c.Speed;
     record->PipeList.back().EndpointDescriptor.bLength = 9;
-    const auto lines = Lines(Connection(*record));
+    const auto lines = Lines(ConnectionText(*record));
     // With a bLength of 0, too, an endpoint is shown in the long form.
     EXPECT_EQ(std::ranges::count(lines, "-bSyncAddress:         0x00"), c.Endpoints);
     for (const std::string& line : c.Lines) EXPECT_EQ(std::ranges::count(lines, line), 1) << line;

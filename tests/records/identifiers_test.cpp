@@ -13,7 +13,7 @@ namespace {
 
 using platform::Guid, platform::ToUtf8;
 using testing::ElementsAre;
-using Text = const char16_t*;
+using Chars = const char16_t*;
 
 TEST(HexField, ScansWithinTheCount) {
   // Blanks use the count up as well; a 0x whose digit lies behind the count is no number, but a
@@ -43,7 +43,7 @@ TEST(HexField, ScansWithinTheCount) {
 TEST(InstanceId, IsTakenApart) {
   // The record held 7, 8, "V", "P", "S" before; a value that shows them was not touched.
   constexpr std::uint32_t kNone = kUnknownId;
-  const std::tuple<Text, std::uint32_t, std::uint32_t, Text, Text, Text> cases[] = {
+  const std::tuple<Chars, std::uint32_t, std::uint32_t, Chars, Chars, Chars> cases[] = {
       {u"USB\\VID_046D&PID_C52B&MI_00\\6&1A&0&0000", 0x046D, 0xC52B, u"V", u"P", u"6&1A&0&0000"},
       {u"USBSTOR\\DISK&VEN_X&PROD_Y&REV_1.00\\4C53&0", kNone, 8, u"X", u"Y&REV_1.00", u"4C53&0"},
       {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04\\3&11583659&0&A0", kNone, 8, u"8086", u"", u"S"},
@@ -92,7 +92,7 @@ TEST(GuidText, KeepsWhatStandsBeforeABreak) {
 
 TEST(GuidText, FollowsTheRulesOfAScan) {
   // Blanks do not count against a width, but against the place where a group must end.
-  const std::tuple<Text, std::uint32_t, std::uint16_t, std::uint16_t, bool> cases[] = {
+  const std::tuple<Chars, std::uint32_t, std::uint16_t, std::uint16_t, bool> cases[] = {
       {u"x12345678-9ABC-DEF0-1234-56789ABCDEF0 more", 0x12345678, 0x9ABC, 0xDEF0, true},
       {u"{ 2345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x2345678, 0x9ABC, 0xDEF0, true},
       {u"{ 12345678-9ABC-DEF0-1234-56789ABCDEF0}", 0x12345678, 0x9ABC, 0xDEF0, false},
@@ -114,12 +114,12 @@ TEST(GuidText, FollowsTheRulesOfAScan) {
 }
 
 TEST(DerivedIds, ComeFromPathsAndVolumes) {
-  const std::pair<Text, Text> paths[] = {
+  const std::pair<Chars, Chars> paths[] = {
       {u"USB#ROOT_HUB20#4&2f5a2f0&0#{f18a0e88-c30c-11d0-8815-00a0c906bed8}", u"USB\\ROOT_HUB20\\4&2F5A2F0&0"},
       {u"\\\\?\\usb#vid_1#2#{g}", u"\\\\?\\USB\\VID_1\\2"},
       {u"\u00E4#", u"\u00C4"}};
   for (const auto& [path, id] : paths) EXPECT_EQ(InterfacePathToInstanceId(path), id);
-  for (const char16_t* none : {u"#", u"usb\\x", u"", Text()}) EXPECT_EQ(InterfacePathToInstanceId(none), u"");
+  for (const char16_t* none : {u"#", u"usb\\x", u"", Chars()}) EXPECT_EQ(InterfacePathToInstanceId(none), u"");
   const std::pair<std::u16string, std::u16string> volumes[] = {
       {u"STORAGE\\VOLUME\\_??_USBSTOR#DISK&VEN_X#4C53&0#{53f56307-b6bf}", u"USBSTOR\\DISK&VEN_X\\4C53&0"},
       {u"_??_A#{B#{_??_C", u"A"},
@@ -130,7 +130,7 @@ TEST(DerivedIds, ComeFromPathsAndVolumes) {
 }
 
 TEST(PciHardwareId, NeedsAllFourNumbers) {
-  const std::tuple<Text, bool, std::uint32_t, std::uint32_t, std::uint32_t, std::uint32_t> cases[] = {
+  const std::tuple<Chars, bool, std::uint32_t, std::uint32_t, std::uint32_t, std::uint32_t> cases[] = {
       {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1E318086&REV_04", true, 0x8086, 0x1E31, 0x1E318086, 4},
       {u"PCI\\VEN_ 8086&DEV_+1&SUBSYS_-1&REV_0x4Z", true, 0x8086, 1, 0xFFFFFFFF, 4},
       {u"PCI\\VEN_8086&DEV_1E31&SUBSYS_1&REV_", false, 0x8086, 0x1E31, 1, 0},

@@ -43,7 +43,7 @@ TEST(InfoDevice, DumpsEveryFieldAndResetLeavesThree) {
   CZKUMInfoDeviceImpl device;
   FillEveryField(device);
   // The class name decides about the first class line and is not in it: this is meant.
-  EXPECT_EQ(DumpOf(device, u"> "), Golden("info-device.txt"));
+  EXPECT_EQ(DumpOf(device, u"> "), Golden("info-device"));
   device.m_nVendorId = device.m_nProductId = 1;
   device.Reset();
   EXPECT_TRUE(device.m_nVendorId == kUnknownId && device.m_nProductId == kUnknownId);

@@ -39,7 +39,7 @@ TEST(InterfaceDevice, DumpsWhatItHas) {
   EXPECT_EQ(volume.MountPoint(), u"E:\\");
   std::u16string dump = u"before|\r\n";
   volume.ToString(dump, u"> ");
-  EXPECT_EQ(platform::ToUtf8(dump), Golden("interface-device.txt"));
+  EXPECT_EQ(platform::ToUtf8(dump), Golden("interface-device"));
 }
 
 }  // namespace

@@ -64,7 +64,7 @@ TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
                                                       u"USB Mass Storage Device", u"USB\\VID_0781&PID_5580\\AA01");
   EXPECT_EQ(device->NumberInterfaces(), 1);
   ASSERT_EQ(device->m_interfaceDescrs.size(), 1u);
-  EXPECT_EQ(DumpOf(*device, u"> "), Golden("port-device.txt"));
+  EXPECT_EQ(DumpOf(*device, u"> "), Golden("port-device"));
 }
 
 }  // namespace

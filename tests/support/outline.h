@@ -8,6 +8,7 @@
 #include "platform/text.h"
 #include "records/port_device.h"
 #include "records/records.h"
+#include "tests/support/golden.h"
 
 namespace KelvoUHW {
 
@@ -17,10 +18,7 @@ inline std::string DumpOf(const CZKUMUsbTreeNodeImpl& node, const char16_t* inde
   return platform::ToUtf8(out);
 }
 
-inline std::string Golden(const std::string& name) {
-  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/golden/" + name, std::ios::binary);
-  return {std::istreambuf_iterator<char>(file), {}};
-}
+using testing_support::Golden;
 
 // Depth in dots, kind, what tells the node apart, and where it hangs by its own account.
 inline std::string OutlineOf(const NodePtr& node, const std::string& dots = "") {

@@ -19,7 +19,9 @@ namespace KelvoUHW {
 namespace {
 
 using platform::ToUtf8;
-using testing_support::Gadget, testing_support::Kind, testing_support::RandomPc;
+using RandomGadget = testing_support::Gadget;
+using RandomKind = testing_support::Kind;
+using testing_support::RandomPc;
 
 constexpr int kScripts = 500, kChangesPerScript = 14;
 // The first build meets the last change; then held parents return, one level per build: a slot with
@@ -64,7 +66,7 @@ Picture PictureOfPc(const platform::simulated::Machine& machine, const RandomPc&
     }
   }
   for (const auto& volume : machine.volumes) {
-    for (const Gadget& gadget : pc.Gadgets()) {
+    for (const RandomGadget& gadget : pc.Gadgets()) {
       for (const auto& disk : gadget.disks) {
         if (std::ranges::find(disk, volume.name) == disk.end()) continue;
         picture[ToUtf8(gadget.id)].volumes.insert(VolumeText(volume.name, volume.paths));
@@ -115,7 +117,7 @@ class Watcher {
   // With nothing going on, every device is connected that has a way to be.
   void CheckAtRest() {
     for (int i = 0; i < kBuildsUntilHeldAreBack; ++i) Build();
-    for (const Gadget& gadget : m_pc.Gadgets()) {
+    for (const RandomGadget& gadget : m_pc.Gadgets()) {
       if (gadget.plugged && IsReported(gadget) && !CannotReturn(gadget)) {
         EXPECT_TRUE(m_connected.contains(ToUtf8(gadget.id))) << ToUtf8(gadget.id);
       }
@@ -125,14 +127,16 @@ class Watcher {
  private:
   // Exception: a device whose own node is left out by its service has no info device. It is in the
   // tree and never in a list of arrivals; hubs are in no list at all.
-  static bool IsReported(const Gadget& gadget) { return gadget.kind != Kind::Unreported && gadget.kind != Kind::Hub; }
+  static bool IsReported(const RandomGadget& gadget) {
+    return gadget.kind != RandomKind::Unreported && gadget.kind != RandomKind::Hub;
+  }
   // Exception: a card that is taken out takes its slot and the reader along, which are reported as
   // removed and held back until they have a child again.
-  bool MayBeHeld(const Gadget& gadget) const {
-    return gadget.kind == Kind::CardReader && m_lostACard.contains(ToUtf8(gadget.id));
+  bool MayBeHeld(const RandomGadget& gadget) const {
+    return gadget.kind == RandomKind::CardReader && m_lostACard.contains(ToUtf8(gadget.id));
   }
   // Exception: a reader all of whose slots were emptied has no child that could bring it back.
-  bool CannotReturn(const Gadget& gadget) const {
+  bool CannotReturn(const RandomGadget& gadget) const {
     if (!MayBeHeld(gadget)) return false;
     for (std::size_t slot = 0; slot < gadget.disks.size(); ++slot) {
       if (!gadget.disks[slot].empty() || !m_emptied.contains(DiskId(gadget, slot))) return false;
@@ -140,8 +144,8 @@ class Watcher {
     return true;
   }
   void NoteEmptiedSlots() {
-    for (const Gadget& gadget : m_pc.Gadgets()) {
-      if (!gadget.plugged || gadget.kind != Kind::CardReader) continue;
+    for (const RandomGadget& gadget : m_pc.Gadgets()) {
+      if (!gadget.plugged || gadget.kind != RandomKind::CardReader) continue;
       for (std::size_t slot = 0; slot < gadget.disks.size(); ++slot) {
         const auto id = DiskId(gadget, slot);
         std::u16string card = gadget.disks[slot].empty() ? u"" : gadget.disks[slot][0];
@@ -183,7 +187,7 @@ class Watcher {
     Picture shown = m_shown;
     Picture expected = PictureOfPc(m_pc.Pc().Snapshot(), m_pc);
     Ids reported;
-    for (const Gadget& gadget : m_pc.Gadgets()) {
+    for (const RandomGadget& gadget : m_pc.Gadgets()) {
       const std::string id = ToUtf8(gadget.id);
       if (!expected.contains(id)) continue;
       const bool held = MayBeHeld(gadget) && !m_connected.contains(id);

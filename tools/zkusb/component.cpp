@@ -15,10 +15,6 @@ std::string CodeText(HRESULT code) {
   return "0x" + platform::ToUtf8(platform::Hex(static_cast<std::uint32_t>(code), 8));
 }
 
-void Check(HRESULT result, const char* call) {
-  if (FAILED(result)) throw ComponentError(call, result);
-}
-
 template <class Interface>
 ComPtr<Interface> CreateObject(const CLSID& clsid, const char* name) {
   ComPtr<Interface> object;
@@ -32,6 +28,10 @@ ComPtr<Interface> CreateObject(const CLSID& clsid, const char* name) {
 
 ComponentError::ComponentError(const std::string& call, HRESULT code)
     : std::runtime_error(call + " failed with " + CodeText(code)) {}
+
+void Check(HRESULT result, const char* call) {
+  if (FAILED(result)) throw ComponentError(call, result);
+}
 
 Apartment::Apartment() {
   Check(CoInitializeEx(nullptr, COINIT_MULTITHREADED), "entering the multithreaded apartment");

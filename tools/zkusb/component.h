@@ -18,6 +18,9 @@ class ComponentError : public std::runtime_error {
   ComponentError(const std::string& call, HRESULT code);
 };
 
+// Throws a ComponentError for a code of failure; `call` names what failed, for people.
+void Check(HRESULT result, const char* call);
+
 // The multithreaded apartment of the calling thread, for as long as it lives.
 class Apartment {
  public:

@@ -16,10 +16,6 @@ using KelvoUHW::ComPtr;
 // are read, shown and dropped level inside level.
 constexpr int kMostLevels = 400;
 
-void Check(HRESULT result, const char* call) {
-  if (FAILED(result)) throw ComponentError(call, result);
-}
-
 class OwnedBstr {
  public:
   OwnedBstr() noexcept = default;

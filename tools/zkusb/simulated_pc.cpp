@@ -34,10 +34,6 @@ Script ReadScript(const std::string& file, const Machine& machine) {
   return file.empty() ? Script() : platform::simulated::LoadScript(file, machine);
 }
 
-void Check(HRESULT result, const char* call) {
-  if (FAILED(result)) throw ComponentError(call, result);
-}
-
 }  // namespace
 
 struct Pc::State {

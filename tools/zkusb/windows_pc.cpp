@@ -26,10 +26,6 @@ constexpr std::uint32_t kAnswerMilliseconds = 500;
 // The longest wait between a message and what it sets off is three seconds.
 constexpr std::uint32_t kSettleMilliseconds = 4000;
 
-void Check(HRESULT result, const char* call) {
-  if (FAILED(result)) throw ComponentError(call, result);
-}
-
 // The file that looks at a simulated PC. The one that looks at this PC takes no machine file.
 std::u16string SimulatedServer(const std::u16string& server) {
   std::u16string path = server.substr(0, server.find_last_of(u"\\/") + 1);
