@@ -1,0 +1,122 @@
+# Sourced by ./test: what its stages do, and how they are shown.
+#
+# A stage is a function stage_NAME. It runs in a shell of its own with its output in build/log/NAME.log, ends with
+# `outcome PASSED FAILED SKIPPED [REASON]`, and fails when something in it does.
+
+export CTEST_OUTPUT_ON_FAILURE=1
+# A compiler cache saves most of a second build. Without one everything works as well.
+if command -v ccache >/dev/null; then
+  export CMAKE_CXX_COMPILER_LAUNCHER=${CMAKE_CXX_COMPILER_LAUNCHER-ccache}
+  export CMAKE_C_COMPILER_LAUNCHER=${CMAKE_C_COMPILER_LAUNCHER-ccache}
+fi
+
+# What each stage is, and about how many seconds it takes on two cores from nothing.
+about() {
+  case $1 in
+    tree) echo 'the tree of files: order of the rooms, format, test lists|5' ;;
+    native) echo 'all native tests under the address sanitizer|150' ;;
+    windows-x64) echo 'the 64-bit Windows tests under Wine|180' ;;
+    windows-x86) echo 'the 32-bit Windows tests under Wine|180' ;;
+    plain) echo 'growth by exact counts, and what the module exports|60' ;;
+    threads) echo 'what shares memory, under the thread sanitizer|120' ;;
+    fuzz) echo 'each fuzz target for a moment|60' ;;
+    tidy)
+      if [ -n "${CI:-}" ]; then
+        echo 'clang-tidy over every source file|420'
+      else
+        echo 'clang-tidy over what the last commit and the working tree changed|40'
+      fi
+      ;;
+    reproducible) echo 'the Windows files, built twice: the same bytes|150' ;;
+  esac
+}
+
+outcome() { printf '%s|%s|%s|%s\n' "$1" "$2" "$3" "${4:-}" >"$outcome_file"; }
+
+build_preset() { # PRESET [TARGET...]
+  local preset=$1
+  shift
+  cmake --preset "$preset" && cmake --build --preset "$preset" --target "${@:-all}"
+}
+
+# Runs the tests of a preset, reads the counts from the log and says the outcome.
+test_preset() { # PRESET [OPTION OF CTEST...]
+  local preset=$1 log passed failed skipped reasons
+  shift
+  log=build/log/$preset-ctest.log
+  ctest --preset "$preset" -V -j"$(nproc)" "${which_tests[@]}" "$@" >"$log" 2>&1 &
+  local ctest_process=$!
+  # What the line of progress reads.
+  tail -n +1 -f --pid=$ctest_process "$log" 2>/dev/null | grep -aE --line-buffered '^ *[0-9]+/[0-9]+ Test' || true
+  wait "$ctest_process" || true
+  { read -r passed failed skipped; reasons=$(cat); } < <(awk -f scripts/count-tests.awk "$log")
+  [ $((passed + failed)) -gt 0 ] || failed=1
+  if [ "$failed" -gt 0 ]; then
+    echo "--- what failed"
+    grep -aE -B12 '^[0-9]+: \[  FAILED  \]|\*\*\*(Failed|Timeout|Exception|Not Run)' "$log" | tail -80 || tail -20 "$log"
+  fi
+  outcome "$passed" "$failed" "$skipped" "$(tr '\n' ';' <<<"$reasons" | sed 's/;*$//')"
+  [ "$failed" -eq 0 ]
+}
+
+stage_tree() { scripts/check-tree.sh && outcome 1 0 0; }
+stage_native() { build_preset asan && test_preset asan; }
+stage_plain() {
+  build_preset release ZKUsbMonitor zkusb_growth && test_preset release -R '^(module_exports|zkusb_growth)'
+}
+stage_threads() {
+  build_preset tsan zkusb_tree_tests zkusb_records_tests zkusb_com_tests zkusb_simulation_tests zkusb_monitor_tests \
+    zkusb_notifier_tests zkusb_module_tests &&
+    test_preset tsan -R '^zkusb_[a-z_]*_tests\.(Ring|Walk|ConnectionRecord|TreeThreads|SimulatedRegistry|MonitorStress|ModuleStress|NotifierStress)'
+}
+stage_fuzz() { build_preset fuzz zkusb_fuzz_targets && test_preset fuzz -R '^zkusb_fuzz'; }
+stage_windows-x64() { windows_stage windows-x64; }
+stage_windows-x86() { windows_stage windows-x86; }
+windows_stage() { . scripts/windows-stage.sh; }
+stage_tidy() { scripts/check-tidy.sh ${CI:+--all} && outcome 1 0 0; }
+stage_reproducible() { scripts/check-reproducible.sh && outcome 1 0 0; }
+
+# The last step that a log tells of: "[12/57]" of a build, "12/270 Test" of a test run.
+progress_of() {
+  tail -c 4000 "$1" 2>/dev/null | grep -aoE '^\[[0-9]+/[0-9]+\]|^ *[0-9]+/[0-9]+ Test' | tail -1 |
+    sed -E 's/^\[(.*)\]/building \1/; s/^ *([0-9]+\/[0-9]+) Test/testing \1/'
+}
+
+# Runs one stage with a line of progress, on a terminal anew each second, else once a minute.
+run_stage() { # NUMBER OF NAME
+  local number=$1 of=$2 name=$3 log=build/log/$3.log started=$SECONDS status=0 line
+  outcome_file=build/log/$name.outcome
+  rm -f "$outcome_file"
+  local title
+  title=$(about "$name")
+  title="[$number/$of] $name: ${title%|*}"
+  echo "$title"
+  (
+    set -eo pipefail
+    "stage_$name"
+  ) >"$log" 2>&1 </dev/null &
+  local process=$!
+  while kill -0 "$process" 2>/dev/null; do
+    sleep 1
+    line="      $(progress_of "$log"), $((SECONDS - started)) s"
+    if [ -t 1 ]; then
+      printf '\r\033[K%s' "$line"
+    elif [ $(((SECONDS - started) % 60)) -eq 59 ]; then
+      echo "$line"
+    fi
+  done
+  wait "$process" || status=$?
+  [ ! -t 1 ] || printf '\r\033[K'
+  [ -f "$outcome_file" ] || outcome 0 1 0 "it ended before its tests"
+  [ "$status" -eq 0 ] || tail -100 "$log"
+  echo "      $((SECONDS - started)) s"
+  local passed failed skipped reason
+  IFS='|' read -r passed failed skipped reason <"$outcome_file"
+  # A stage that failed in something else than a test has failed all the same.
+  [ "$status" -eq 0 ] || [ "$failed" -gt 0 ] || failed=1
+  all_passed=$((all_passed + passed))
+  all_failed=$((all_failed + failed))
+  all_skipped=$((all_skipped + skipped))
+  rows+=("$(printf '%-14s %7d %7d %8d %8d' "$name" "$passed" "$failed" "$skipped" $((SECONDS - started)))")
+  [ -z "$reason" ] || rows+=("$(tr ';' '\n' <<<"$reason" | sed 's/^/    skipped: /')")
+}
