@@ -12,7 +12,7 @@ install(DIRECTORY ${CMAKE_BINARY_DIR}/symbols/ DESTINATION symbols/${width} FILE
 
 install(DIRECTORY include/ DESTINATION include FILES_MATCHING PATTERN "*.h")
 install(FILES com/zkusb_monitor.idl com/idl/base_types.idl com/idl/stdole2.idl DESTINATION include)
-install(DIRECTORY samples machines docs DESTINATION . PATTERN ".clang-format" EXCLUDE
+install(DIRECTORY samples dotnet machines docs DESTINATION . PATTERN ".clang-format" EXCLUDE PATTERN ".gitignore" EXCLUDE
               PATTERN "bin" EXCLUDE PATTERN "obj" EXCLUDE)
 install(FILES CHANGELOG.md DESTINATION . OPTIONAL)
 install(FILES README.md packaging/NOTICES.txt packaging/LICENSE.txt DESTINATION .)

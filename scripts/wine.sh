@@ -9,7 +9,7 @@ wine_checkout=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd -P)
 export WINEPREFIX="$wine_home/prefix-$(cksum <<<"$wine_checkout" | cut -d' ' -f1)"
 export WINEARCH=win64 WINEDEBUG=${WINEDEBUG:--all}
 # No question to install add-ons, no menu entries in the home folder, no display.
-export WINEDLLOVERRIDES='mscoree=;mshtml=;winemenubuilder.exe='
+export WINEDLLOVERRIDES=${ZKUSB_WINE_OVERRIDES:-'mscoree=;mshtml=;winemenubuilder.exe='}
 unset DISPLAY WAYLAND_DISPLAY
 
 wine_version=$(dpkg-query -W -f='${Version}' libwine 2>/dev/null || true)
