@@ -29,3 +29,19 @@ if(ZKUSB_BUILD_TESTS)
   find_path(ZKUSB_GOOGLETEST CMakeLists.txt PATHS /usr/src/googletest NO_DEFAULT_PATH REQUIRED)
   add_subdirectory(${ZKUSB_GOOGLETEST} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
 endif()
+
+# The version resource of a DLL or program, for a resource script that includes cmake/version.rc: the version is that of
+# the project.
+enable_language(RC)
+function(zkusb_version_resource name)
+  string(REPLACE "." "," numbers "${PROJECT_VERSION}")
+  target_compile_definitions(${name} PRIVATE $<$<COMPILE_LANGUAGE:RC>:
+    ZKUSB_VERSION_NUMBERS=${numbers},0
+    ZKUSB_VERSION=${PROJECT_VERSION}
+    ZKUSB_FILE_NAME=$<TARGET_FILE_NAME:${name}>>)
+  foreach(source ${ARGN})
+    target_sources(${name} PRIVATE ${source})
+    set_source_files_properties(${source} TARGET_DIRECTORY ${name} PROPERTIES
+      OBJECT_DEPENDS ${CMAKE_SOURCE_DIR}/cmake/version.rc)
+  endforeach()
+endfunction()

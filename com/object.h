@@ -87,6 +87,7 @@ class ComObject final : private ModuleReference, public Class {
   static HRESULT Create(ComObject*& out) noexcept {
     out = nullptr;
     return Guarded([&] {
+      // Guarded answers E_OUTOFMEMORY. NOLINTNEXTLINE(bugprone-unhandled-exception-at-new)
       ComObject* object = new ComObject;
       object->m_nRef = 1;
       HRESULT result = object->InitializeLock();

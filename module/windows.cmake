@@ -1,5 +1,4 @@
 # The module as a Windows DLL: ${CMAKE_BINARY_DIR}/NAME.dll.
-enable_language(RC)
 
 # The sources behind the name are those the DLL has besides the component.
 function(zkusb_windows_module name)
@@ -10,14 +9,10 @@ function(zkusb_windows_module name)
     ${CMAKE_SOURCE_DIR}/module/exports.cpp ${exports} ${resources} ${ARGN})
   target_link_libraries(${name} PRIVATE zkusb_component)
 
-  string(REPLACE "." "," numbers "${PROJECT_VERSION}")
   set_source_files_properties(${resources} PROPERTIES
     INCLUDE_DIRECTORIES "${CMAKE_BINARY_DIR}/generated;${CMAKE_SOURCE_DIR}/module"
-    OBJECT_DEPENDS "${CMAKE_BINARY_DIR}/generated/zkusb_monitor.tlb;${scripts}/module.rgs;${scripts}/event_notifier.rgs;${scripts}/usb_tree.rgs")
-  target_compile_definitions(${name} PRIVATE $<$<COMPILE_LANGUAGE:RC>:
-    ZKUSB_VERSION_NUMBERS=${numbers},0
-    ZKUSB_VERSION=${PROJECT_VERSION}
-    ZKUSB_FILE_NAME=${name}.dll>)
+    OBJECT_DEPENDS "${CMAKE_BINARY_DIR}/generated/zkusb_monitor.tlb;${CMAKE_SOURCE_DIR}/cmake/version.rc;${scripts}/module.rgs;${scripts}/event_notifier.rgs;${scripts}/usb_tree.rgs")
+  zkusb_version_resource(${name})
   add_dependencies(${name} zkusb_type_library_file)
 
   # 32-bit names of the calling convention carry the bytes of their parameters; the exported ones do not.
