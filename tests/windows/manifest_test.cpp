@@ -9,6 +9,7 @@
 #include <atomic>
 #include <mutex>
 #include <optional>
+#include <thread>
 
 namespace {
 
@@ -208,19 +209,17 @@ TEST(Manifest, ServesBothApartmentsAndAWatcher) {
   watcher.reset();
 
   std::vector<std::size_t> direct;
-  HANDLE thread = CreateThread(
-      nullptr, 0,
-      [](void* out) -> DWORD {
-        *static_cast<std::vector<std::size_t>*>(out) = Client(COINIT_MULTITHREADED).Undirected();
-        return 0;
-      },
-      &direct, 0, nullptr);
+  std::atomic<bool> done = false;
+  std::thread reader([&] {
+    direct = Client(COINIT_MULTITHREADED).Undirected();
+    done = true;
+  });
   // Meanwhile the object of this thread's sink may be let go of by another.
   EXPECT_TRUE(WaitUntil([&] {
     Pump();
-    return WaitForSingleObject(thread, 0) == WAIT_OBJECT_0;
+    return done.load();
   }));
-  CloseHandle(thread);
+  reader.join();
   EXPECT_EQ(direct, (std::vector<std::size_t>{4, 2, 1}));
 }
 
