@@ -24,9 +24,16 @@ for preset in windows-x64 windows-x86; do
       tail -40 "$work/log"
       exit 1
     }
-  elif [ ! -f "build/$preset/ZKUsbMonitorSimulated.dll" ] || [ ! -f "build/$preset/zkusb.exe" ]; then
-    echo "left out: $preset is not built"
-    continue
+  else
+    missing=
+    for file in ZKUsbMonitor.dll ZKUsbMonitorSimulated.dll zkusb.exe zkusb_typelib.exe generated/version.txt \
+      ZKUsbMonitor.Assembly.manifest simulated/ZKUsbMonitor.Assembly.manifest; do
+      [ -f "build/$preset/$file" ] || missing=$file
+    done
+    if [ -n "$missing" ]; then
+      echo "left out: $preset, which is not built: there is no $missing"
+      continue
+    fi
   fi
   cmake --install "build/$preset" --component zkusb --prefix "$stage" >/dev/null
   version=$(cat "build/$preset/generated/version.txt")
