@@ -1,8 +1,10 @@
 #include "devinfo/disk_letters.h"
 
+#include <algorithm>
 #include <cstring>
 #include <optional>
 
+#include "devinfo/volume_table.h"
 #include "platform/setup_api.h"
 #include "platform/storage_ioctl.h"
 #include "platform/text.h"
@@ -55,15 +57,15 @@ InterfaceDetail ReadShortDetail(platform::DeviceSets& sets, platform::DeviceSetH
                                 const platform::SP_DEVICE_INTERFACE_DATA& data,
                                 platform::SP_DEVINFO_DATA& device) {
   std::uint32_t required = 0;
-  sets.GetDeviceInterfaceDetail(set, data, nullptr, 0, &required, nullptr);
-  if (required < platform::kInterfaceDetailPathOffset || required > kDetailBytes) return {};
-
-  std::vector<std::uint8_t> bytes(required);
+  std::vector<std::uint8_t> bytes(kDetailBytes);
   const std::uint32_t fixedPart = platform::kInterfaceDetailSize;
   std::memcpy(bytes.data(), &fixedPart, sizeof fixedPart);
   device.cbSize = sizeof device;
-  if (!sets.GetDeviceInterfaceDetail(set, data, bytes.data(), required, nullptr, &device))
+  if (!sets.GetDeviceInterfaceDetail(set, data, bytes.data(), kDetailBytes, &required, &device) ||
+      required < platform::kInterfaceDetailPathOffset || required > kDetailBytes) {
     return {};
+  }
+  bytes.resize(required);
   return InterfaceDetail(std::move(bytes));
 }
 
@@ -78,10 +80,19 @@ void DiskLetterFinder::FindDriveLettersForDisk(const CZKUMInterfaceDeviceImpl& d
 
 void DiskLetterFinder::ReadLetters() {
   m_roots.clear();
+  // Opening a letter is expensive, and most are not there. A system that lists none is not
+  // believed.
+  const std::vector<std::u16string> present = ReadDriveRoots(m_host);
+  const auto mayBeThere = [&present](char16_t letter) {
+    return present.empty() || std::ranges::any_of(present, [letter](const std::u16string& root) {
+             return platform::ToUpper(root.front()) == letter;
+           });
+  };
   for (char16_t letter = u'A'; letter <= u'Z'; ++letter) {
+    if (!mayBeThere(letter)) continue;
     const platform::DevInst device = DeviceOfLetter(letter);
     if (device == 0) continue;
-    m_roots[platform::ToLower(GetDeviceId(m_host, device))].push_back(
+    m_roots[platform::ToLower(GetDeviceId(m_nodes, device))].push_back(
         std::u16string(1, letter).append(u":\\"));
   }
   m_lettersRead = true;

@@ -21,7 +21,10 @@ namespace KelvoUHW {
 // afterwards.
 class DiskLetterFinder {
  public:
-  explicit DiskLetterFinder(platform::Host& host) noexcept : m_host(host) {}
+  explicit DiskLetterFinder(platform::Host& host) noexcept : DiskLetterFinder(host, host) {}
+  // Ids of device-manager nodes are asked of `nodes`.
+  DiskLetterFinder(platform::Host& host, platform::DeviceManager& nodes) noexcept
+      : m_host(host), m_nodes(nodes) {}
 
   // Appends the roots (X:\, A first) of the letters whose device has the record's instance id,
   // ignoring case.
@@ -48,6 +51,7 @@ class DiskLetterFinder {
   void ReadClass(const platform::Guid& interfaceClass, ClassDevices& devices);
 
   platform::Host& m_host;
+  platform::DeviceManager& m_nodes;
   std::array<ClassDevices, 3> m_classes;                                    // disk, floppy, CD
   std::unordered_map<std::u16string, std::vector<std::u16string>> m_roots;  // by lower-cased id
   bool m_lettersRead = false;

@@ -5,6 +5,7 @@
 #include <string>
 #include <utility>
 
+#include "devinfo/device_answers.h"
 #include "devinfo/info_device_linking.h"
 #include "devinfo/property_reader.h"
 #include "platform/flat_index.h"
@@ -120,44 +121,80 @@ std::uint32_t InfoDeviceCache::EnumerateDeviceNodes(std::u16string_view classNam
   }
 
   m_current.Clear();
-  PropertyBuffer buffer;
+  ElementReader reader(m_sets, set.Get(), m_answers);
+  PassedElements passed;
   InfoDevicePtr record = MakeRecord<CZKUMInfoDeviceImpl>();
   for (std::uint32_t index = 0; index < kMostElements; ++index) {
     platform::SP_DEVINFO_DATA element;
     element.cbSize = sizeof element;
     if (!m_sets.EnumDeviceInfo(set.Get(), index, element)) break;
-    // This is meant: an excluded node leaves its properties in the record, and the next node shows
-    // those that it does not have itself.
-    if (!ReadNode(set.Get(), element, buffer, *record)) continue;
-    if (!HasAdmittedParent(*record)) {
-      record->Reset();
+    // The service, which nobody else asks for, comes last.
+    if (!ReadClass(reader, element, *record)) {
+      passed.AddExcluded(element);
       continue;
     }
-    Keep(record);
-    record = MakeRecord<CZKUMInfoDeviceImpl>();
+    if (!IsAdmitted(reader, element, *record)) {
+      record->Reset();
+      passed.AddUnwanted(element);
+      continue;
+    }
+    if (!ReadService(reader, element, *record)) {
+      record->Reset();
+      passed.AddExcluded(element);
+      continue;
+    }
+    if (IsKnown(element.DevInst)) {
+      record->Reset();
+    } else {
+      const bool read = ReadNewNode(reader, element, passed, *record);
+      if (read) KeepAsNewUnlessPrevious(record);
+      record = MakeRecord<CZKUMInfoDeviceImpl>();
+      if (!read) {
+        passed.AddUnwanted(element);
+        continue;
+      }
+    }
+    passed.Clear();
   }
   CreateDiskDriveRecords();
   return 0;
 }
 
-// False for an excluded node.
-bool InfoDeviceCache::ReadNode(platform::DeviceSetHandle set,
-                               const platform::SP_DEVINFO_DATA& element, PropertyBuffer& buffer,
-                               CZKUMInfoDeviceImpl& record) {
-  if (!ReadInfoDeviceProperties(m_sets, set, element, buffer, record)) return false;
-  record.SetInstanceId(GetInstanceId(m_sets, set, element));
+// Fills handles and parent. The node's own id is read only where its parent's cannot be told
+// without it.
+bool InfoDeviceCache::IsAdmitted(const ElementReader& reader,
+                                 const platform::SP_DEVINFO_DATA& element,
+                                 CZKUMInfoDeviceImpl& record) {
   record.m_devInstHandle = element.DevInst;
-  ResolveParentInstanceId(m_manager, record);
-  return true;
+  if (ReadParent(m_answers, record)) {
+    record.m_strDevInstId = reader.InstanceId(element);
+    NameDiskAsParent(record);
+  }
+  return HasAdmittedParent(record);
 }
 
-void InfoDeviceCache::Keep(const InfoDevicePtr& record) {
-  if (m_held.HasHandle(record->m_devInstHandle)) return;  // the held record may return later
-  if (const InfoDevicePtr& known = m_previous.FindByHandle(record->m_devInstHandle)) {
-    m_current.Insert(known);
-    return;
-  }
-  KeepAsNewUnlessPrevious(record);
+// A node that was there before keeps the record it has, so nothing more of it is read. One that is
+// held may return later.
+bool InfoDeviceCache::IsKnown(platform::DevInst handle) {
+  if (m_held.HasHandle(handle)) return true;
+  const InfoDevicePtr& known = m_previous.FindByHandle(handle);
+  if (known) m_current.Insert(known);
+  return static_cast<bool>(known);
+}
+
+// False where the node is no longer there for anybody: a record that is made now would keep for
+// good what cannot be read at the moment.
+bool InfoDeviceCache::ReadNewNode(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
+                                  PassedElements& passed, CZKUMInfoDeviceImpl& record) {
+  const std::size_t failures = reader.Failures();
+  ReadOtherProperties(reader, element, passed, record);
+  if (record.m_strDevInstId.empty()) record.m_strDevInstId = reader.InstanceId(element);
+  const bool failed = record.m_strDevInstId.empty() || reader.Failures() != failures;
+  platform::DevInst parent = 0;
+  if (failed && !m_answers.AskParent(element.DevInst, parent)) return false;
+  record.ParseInstanceId();
+  if (record.m_strSerialNumber.empty()) record.SetSerialNumber(passed.SerialNumber(reader));
+  return true;
 }
 
 void InfoDeviceCache::KeepAsNewUnlessPrevious(const InfoDevicePtr& record) {

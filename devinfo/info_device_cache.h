@@ -5,13 +5,15 @@
 #include <string_view>
 #include <vector>
 
+#include "devinfo/device_answers.h"
 #include "devinfo/info_device_set.h"
 #include "platform/host.h"
 #include "records/device_node_record.h"
 
 namespace KelvoUHW {
 
-class PropertyBuffer;
+class ElementReader;
+class PassedElements;
 
 // The setup class that a name stands for; null, which means all classes, for any other name.
 const platform::Guid* DeviceClassByName(std::u16string_view name) noexcept;
@@ -27,8 +29,9 @@ const platform::Guid* DeviceClassByName(std::u16string_view name) noexcept;
 // One thread at a time. Exceptions: std::bad_alloc only.
 class InfoDeviceCache {
  public:
-  InfoDeviceCache(platform::DeviceSets& sets, platform::DeviceManager& manager) noexcept
-      : m_sets(sets), m_manager(manager) {}
+  // `answers` is what the running build has been told; whoever starts a pass makes it forget.
+  InfoDeviceCache(platform::DeviceSets& sets, DeviceAnswers& answers) noexcept
+      : m_sets(sets), m_answers(answers) {}
 
   // The records of disk drives found by the builder, for the next passes.
   void SetDiskDrives(std::vector<DeviceNodeRecord> diskDrives);
@@ -66,9 +69,11 @@ class InfoDeviceCache {
   std::int32_t RemovedCount() const noexcept { return m_nRemovedCount; }
 
  private:
-  bool ReadNode(platform::DeviceSetHandle set, const platform::SP_DEVINFO_DATA& element,
-                PropertyBuffer& buffer, CZKUMInfoDeviceImpl& record);
-  void Keep(const InfoDevicePtr& record);
+  bool IsAdmitted(const ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
+                  CZKUMInfoDeviceImpl& record);
+  bool IsKnown(platform::DevInst handle);
+  bool ReadNewNode(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
+                   PassedElements& passed, CZKUMInfoDeviceImpl& record);
   void KeepAsNewUnlessPrevious(const InfoDevicePtr& record);
   void CreateDiskDriveRecords();
   void ReturnHeldParents();
@@ -78,7 +83,7 @@ class InfoDeviceCache {
   void SortPending(const NodePtr& treeRoot);
 
   platform::DeviceSets& m_sets;
-  platform::DeviceManager& m_manager;
+  DeviceAnswers& m_answers;
   std::vector<DeviceNodeRecord> m_diskDrives;
   InfoDeviceSet m_previous;
   InfoDeviceSet m_current;

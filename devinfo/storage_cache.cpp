@@ -28,7 +28,8 @@ void MergeDisksWithoutVolumes(const std::vector<NodePtr>& disks, std::vector<Nod
 
 }  // namespace
 
-StorageCache::StorageCache(platform::Host& host) : m_host(host) {
+StorageCache::StorageCache(platform::Host& host, platform::DeviceManager& nodes)
+    : m_host(host), m_nodes(nodes) {
   m_volumeEnumeration.SetupClass = platform::GUID_DEVCLASS_USB;
   m_volumeEnumeration.InterfaceClass = platform::GUID_DEVINTERFACE_VOLUME;
   m_diskEnumeration.SetupClass = platform::GUID_DEVCLASS_USB;
@@ -45,7 +46,7 @@ void StorageCache::OpenEnumeration(InterfaceEnumeration& enumeration) {
 }
 
 bool StorageCache::CollectStorage(std::u16string& diagnostics) {
-  StoragePass pass(m_host, diagnostics);
+  StoragePass pass(m_host, m_nodes, diagnostics);
   std::vector<NodePtr> volumes = CollectVolumes(pass);
   std::vector<NodePtr> disks = CollectDisks(pass);
   const bool changed = DiffersFromLastPass(volumes);

@@ -21,7 +21,9 @@ class StorageCache {
   // `host` must outlive the cache. This is meant: a volume set is opened here already, and no set
   // of the cache is ever destroyed. A pass overwrites the handles of the one before and adds two
   // sets to those that are open.
-  explicit StorageCache(platform::Host& host);
+  explicit StorageCache(platform::Host& host) : StorageCache(host, host) {}
+  // Ids and parents of device-manager nodes are asked of `nodes`, which must outlive the cache too.
+  StorageCache(platform::Host& host, platform::DeviceManager& nodes);
   StorageCache(const StorageCache&) = delete;
   StorageCache& operator=(const StorageCache&) = delete;
 
@@ -52,6 +54,7 @@ class StorageCache {
   bool DiffersFromLastPass(const std::vector<NodePtr>& accepted) const;
 
   platform::Host& m_host;
+  platform::DeviceManager& m_nodes;
   InterfaceEnumeration m_volumeEnumeration;
   std::vector<NodePtr> m_volumes;
   std::size_t m_acceptedVolumes = 0;  // the first ones of m_volumes

@@ -27,8 +27,8 @@ bool BelongsToUsbLikeDevice(const NodeIdentity& node) {
 
 StorageOutcome StoragePass::Identify(CZKUMInterfaceDeviceImpl& record) {
   record.m_devInstHandle = record.DeviceData.DevInst;
-  record.SetInstanceId(GetDeviceId(m_host, record.m_devInstHandle));
-  ResolveParentInstanceId(m_host, record);
+  record.SetInstanceId(GetDeviceId(m_nodes, record.m_devInstHandle));
+  ResolveParentInstanceId(m_nodes, record);
   return BelongsToUsbLikeDevice(record) ? KStorageAccepted : KStorageRejected;
 }
 

@@ -32,6 +32,7 @@ struct DeviceNodeRecord {
   std::u16string ClassName;
   std::u16string Location;
   std::u16string HardwareId;
+  platform::SP_DEVINFO_DATA Element;  // of the set that was read
   std::vector<DeviceNodeRecord> Children;
 };
 

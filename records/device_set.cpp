@@ -11,6 +11,8 @@ namespace {
 
 // Twice the longest path there is, in bytes.
 constexpr std::uint32_t kMostDetailBytes = 1U << 17;
+// Holds nearly every path there is.
+constexpr std::uint32_t kFirstDetailBytes = 1024;
 
 }  // namespace
 
@@ -26,20 +28,26 @@ std::u16string InterfaceDetail::DevicePath() const {
 InterfaceDetail ReadInterfaceDetail(platform::DeviceSets& sets, platform::DeviceSetHandle set,
                                     const platform::SP_DEVICE_INTERFACE_DATA& data,
                                     platform::SP_DEVINFO_DATA* device, platform::Status& status) {
-  std::uint32_t required = 0;
-  status = sets.GetDeviceInterfaceDetail(set, data, nullptr, 0, &required, nullptr);
-  if (required == 0 || required > kMostDetailBytes) return {};
-
-  // The size is the system's word; a buffer that could not even hold the size field is not offered.
   const std::uint32_t fixedPart = platform::kInterfaceDetailSize;
-  std::vector<std::uint8_t> bytes(std::max<std::size_t>(required, sizeof fixedPart));
-  std::memcpy(bytes.data(), &fixedPart, sizeof fixedPart);
-  if (device) {
-    *device = {};
-    device->cbSize = sizeof(platform::SP_DEVINFO_DATA);
+  std::vector<std::uint8_t> bytes(kFirstDetailBytes);
+  std::uint32_t required = 0;
+  const auto ask = [&] {
+    const auto offered = static_cast<std::uint32_t>(bytes.size());
+    std::memcpy(bytes.data(), &fixedPart, sizeof fixedPart);
+    if (device) {
+      *device = {};
+      device->cbSize = sizeof(platform::SP_DEVINFO_DATA);
+    }
+    status = sets.GetDeviceInterfaceDetail(set, data, bytes.data(), offered, &required, device);
+  };
+  ask();
+  if (!status && required > bytes.size() && required <= kMostDetailBytes) {
+    bytes.resize(required);
+    ask();
   }
-  status = sets.GetDeviceInterfaceDetail(set, data, bytes.data(), required, nullptr, device);
-  return status ? InterfaceDetail(std::move(bytes)) : InterfaceDetail();
+  if (!status) return {};
+  bytes.resize(std::min<std::size_t>(required, bytes.size()));
+  return InterfaceDetail(std::move(bytes));
 }
 
 InterfaceDetail GetInterfaceDetail(platform::DeviceSets& sets, platform::DebugOutput& debug,

@@ -132,9 +132,9 @@ class InterfaceDetail {
   std::vector<std::uint8_t> m_bytes;
 };
 
-// Reads the detail of an interface in two steps, size first, into a buffer of exactly that size.
-// `device` (may be null) is filled with the element the interface belongs to. Empty when the size
-// is 0 or the second call fails; `status` is that of the last call.
+// Reads the detail of an interface, a second time where it is longer than most. `device` (may be
+// null) is filled with the element the interface belongs to. Empty when the size told is 0 or the
+// system fails; `status` is that of the last call.
 InterfaceDetail ReadInterfaceDetail(platform::DeviceSets& sets, platform::DeviceSetHandle set,
                                     const platform::SP_DEVICE_INTERFACE_DATA& data,
                                     platform::SP_DEVINFO_DATA* device, platform::Status& status);

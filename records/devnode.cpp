@@ -91,10 +91,17 @@ std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst n
   return platform::Replaced(ReceivedText(buffer).value_or(std::u16string()), u'/', u'\\');
 }
 
-void ResolveParentInstanceId(platform::DeviceManager& manager, NodeIdentity& node) {
+bool ReadParent(platform::DeviceManager& manager, NodeIdentity& node) {
   manager.GetParent(node.m_devInstHandle, node.m_devInstHandleParent);
   node.m_strDevInstIdParent = GetDeviceId(manager, node.m_devInstHandleParent);
-  if (!node.m_strDevInstIdParent.starts_with(u"ROOT\\VOLMGR\\")) return;
+  return node.m_strDevInstIdParent.starts_with(u"ROOT\\VOLMGR\\");
+}
+
+void ResolveParentInstanceId(platform::DeviceManager& manager, NodeIdentity& node) {
+  if (ReadParent(manager, node)) NameDiskAsParent(node);
+}
+
+void NameDiskAsParent(NodeIdentity& node) {
   if (auto diskId = DiskIdOfVolumeId(node.m_strDevInstId)) {
     node.m_strDevInstIdParent = *std::move(diskId);
   }

@@ -25,6 +25,11 @@ inline constexpr platform::DevInst kUnknownDevInst = 0xFFFFFFFF;
 // unknown or the call fails.
 std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst node);
 
+// The two steps of ResolveParentInstanceId, for a caller that has not read the node's own id: only
+// when the first one says that the node is a volume below the volume manager, the second needs it.
+bool ReadParent(platform::DeviceManager& manager, NodeIdentity& node);
+void NameDiskAsParent(NodeIdentity& node);
+
 // Fills m_devInstHandleParent and m_strDevInstIdParent from m_devInstHandle. The parent's handle
 // stays as it was where the call fails; its id is read either way. A volume below the volume
 // manager (ROOT\VOLMGR\) gets its disk's id instead, taken from its own id.

@@ -1,5 +1,7 @@
 #include "tree/device_forest.h"
 
+#include <algorithm>
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -39,91 +41,94 @@ class ClassImageList {
   ClassImageList(const ClassImageList&) = delete;
   ClassImageList& operator=(const ClassImageList&) = delete;
 
-  bool HasImage(const platform::Guid& classGuid) noexcept {
-    std::int32_t index = 0;
-    return m_handle != platform::kInvalidHandle &&
-           m_sets.GetClassImageIndex(m_handle, classGuid, index).ok;
-  }
+  platform::DeviceSetHandle Get() const noexcept { return m_handle; }
 
  private:
   platform::DeviceSets& m_sets;
   platform::DeviceSetHandle m_handle = platform::kInvalidHandle;
 };
 
-// Reads the properties of one element into buffers of fixed size; a text that does not fit is not
-// read.
-class ElementReader {
- public:
-  ElementReader(platform::DeviceSets& sets, platform::DeviceSetHandle set,
-                const platform::SP_DEVINFO_DATA& data) noexcept
-      : m_sets(sets), m_set(set), m_data(data) {}
-
-  std::optional<std::u16string> Text(std::uint32_t property, std::uint32_t bufferBytes) const {
-    std::u16string buffer(bufferBytes / sizeof(char16_t), u'\0');
-    if (!m_sets.GetDeviceRegistryProperty(m_set, m_data, property, nullptr, buffer.data(),
-                                          bufferBytes, nullptr)) {
-      return std::nullopt;
-    }
-    return ReceivedText(buffer);
-  }
-
-  std::optional<std::u16string> ClassDescription() const {
-    std::u16string buffer(kClassDescriptionChars, u'\0');
-    if (!m_sets.GetClassDescription(m_data.ClassGuid, buffer.data(), kClassDescriptionChars,
-                                    nullptr)) {
-      return std::nullopt;
-    }
-    return ReceivedText(buffer);
-  }
-
- private:
-  platform::DeviceSets& m_sets;
-  platform::DeviceSetHandle m_set;
-  const platform::SP_DEVINFO_DATA& m_data;
-};
+// The text of a property that fits a buffer of fixed size; a longer one counts as not there.
+std::optional<std::u16string> ReadText(ElementReader& elements,
+                                       const platform::SP_DEVINFO_DATA& element,
+                                       std::uint32_t property, std::uint32_t bufferBytes) {
+  PropertyAnswer answer;
+  if (!elements.ReadAndKeep(element, property, answer)) return std::nullopt;
+  const std::optional<std::u16string_view> text = TextWithin(answer, bufferBytes);
+  return text ? std::optional<std::u16string>(*text) : std::nullopt;
+}
 
 }  // namespace
 
-std::vector<DeviceNodeRecord> ReadDeviceRecords(platform::Host& host) {
+const DeviceRecordReader::SetupClass* DeviceRecordReader::FindClass(
+    const platform::Guid& guid) const noexcept {
+  const auto found = std::ranges::find(m_classes, guid, &SetupClass::guid);
+  return found == m_classes.end() ? nullptr : &*found;
+}
+
+// A class is shown when it has an image and a description. It is asked for until it is found to be
+// shown: once, where all goes well.
+bool DeviceRecordReader::IsShown(const platform::Guid& guid, platform::DeviceSetHandle images) {
+  if (FindClass(guid) != nullptr) return true;
+  std::int32_t index = 0;
+  if (images == platform::kInvalidHandle || !m_host.GetClassImageIndex(images, guid, index)) {
+    return false;
+  }
+  std::array<char16_t, kClassDescriptionChars> buffer{};
+  if (!m_host.GetClassDescription(guid, buffer.data(), kClassDescriptionChars, nullptr)) {
+    return false;
+  }
+  std::optional<std::u16string> description = ReceivedText(buffer);
+  if (!description) return false;
+  m_classes.push_back({guid, *std::move(description)});
+  return true;
+}
+
+std::vector<DeviceNodeRecord> DeviceRecordReader::Read() {
   std::vector<DeviceNodeRecord> records;
-  ClassImageList images(host);
-  DeviceSet set(host);
-  set.Open(nullptr,
-           platform::kDIGCF_PRESENT | platform::kDIGCF_ALLCLASSES | platform::kDIGCF_PROFILE);
-  if (set.Get() == platform::kInvalidHandle) return records;
+  const ClassImageList images(m_host);
+  m_set.Open(nullptr,
+             platform::kDIGCF_PRESENT | platform::kDIGCF_ALLCLASSES | platform::kDIGCF_PROFILE);
+  if (m_set.Get() == platform::kInvalidHandle) return records;
+  m_elements.emplace(m_host, m_set.Get(), m_answers);
 
   for (std::uint32_t index = 0; index < kMostElements; ++index) {
     platform::SP_DEVINFO_DATA data{.cbSize = sizeof data};
-    if (!host.EnumDeviceInfo(set.Get(), index, data)) break;
-    const ElementReader element(host, set.Get(), data);
-
-    std::optional<std::u16string> className = element.Text(platform::kSPDRP_CLASS, kClassNameBytes);
-    if (!className || !images.HasImage(data.ClassGuid)) continue;
-    std::optional<std::u16string> classDescription = element.ClassDescription();
-    if (!classDescription) continue;
+    if (!m_host.EnumDeviceInfo(m_set.Get(), index, data)) break;
+    std::optional<std::u16string> className =
+        ReadText(*m_elements, data, platform::kSPDRP_CLASS, kClassNameBytes);
+    if (!className || !IsShown(data.ClassGuid, images.Get())) continue;
 
     DeviceNodeRecord record;
     record.DevInst = data.DevInst;
-    record.InstanceId = GetInstanceId(host, set.Get(), data);
-    if (!host.GetParent(data.DevInst, record.ParentDevInst)) {
+    if (!m_answers.GetParent(data.DevInst, record.ParentDevInst)) {
       // Everything read so far is dropped and the set stays open. This is meant: a PC that shows a
       // device without parent has no device-manager side at all.
-      set.Release();
+      m_set.Release();
       return {};
     }
-    record.ParentInstanceId = GetDeviceId(host, record.ParentDevInst);
-    std::optional<std::u16string> name = element.Text(platform::kSPDRP_FRIENDLYNAME, kNameBytes);
-    if (!name) name = element.Text(platform::kSPDRP_DEVICEDESC, kNameBytes);
-    record.Name = std::move(name).value_or(u"");
-    record.ClassDescription = std::move(*classDescription);
     record.ClassName = std::move(*className);
-    record.Location =
-        element.Text(platform::kSPDRP_LOCATION_INFORMATION, kClassNameBytes).value_or(u"");
-    record.HardwareId = element.Text(platform::kSPDRP_HARDWAREID, kClassNameBytes).value_or(u"");
     if (IsClass(record, u"Processor") || IsClass(record, u"Computer")) continue;
+    record.Element = data;
     records.push_back(std::move(record));
   }
   return records;
+}
+
+void DeviceRecordReader::Complete(DeviceNodeRecord& record) {
+  const auto read = [&](std::uint32_t property, std::uint32_t bufferBytes) {
+    return ReadText(*m_elements, record.Element, property, bufferBytes);
+  };
+  record.InstanceId = m_elements->InstanceId(record.Element);
+  record.ParentInstanceId = GetDeviceId(m_answers, record.ParentDevInst);
+  std::optional<std::u16string> name = read(platform::kSPDRP_FRIENDLYNAME, kNameBytes);
+  if (!name) name = read(platform::kSPDRP_DEVICEDESC, kNameBytes);
+  if (const SetupClass* setupClass = FindClass(record.Element.ClassGuid)) {
+    record.ClassDescription = setupClass->description;
+  }
+  record.Name = std::move(name).value_or(u"");
+  record.Location = read(platform::kSPDRP_LOCATION_INFORMATION, kClassNameBytes).value_or(u"");
+  record.HardwareId = read(platform::kSPDRP_HARDWAREID, kClassNameBytes).value_or(u"");
 }
 
 namespace {
@@ -289,6 +294,25 @@ void AddController(const DeviceNodeRecord& record, CZKUMUsbTreeNodeImpl& root) {
 
 std::vector<DeviceNodeRecord> LinkDeviceForest(std::vector<DeviceNodeRecord> records) {
   return Forest(records).TakePruned();
+}
+
+std::vector<DeviceNodeRecord> ReadDeviceForest(platform::Host& host, DeviceAnswers& answers) {
+  DeviceRecordReader reader(host, answers);
+  std::vector<DeviceNodeRecord> forest = LinkDeviceForest(reader.Read());
+  std::vector<DeviceNodeRecord*> waiting;
+  const auto wait = [&waiting](std::vector<DeviceNodeRecord>& level) {
+    for (auto record = level.rbegin(); record != level.rend(); ++record) {
+      waiting.push_back(&*record);
+    }
+  };
+  wait(forest);
+  while (!waiting.empty()) {
+    DeviceNodeRecord& record = *waiting.back();
+    waiting.pop_back();
+    reader.Complete(record);
+    wait(record.Children);
+  }
+  return forest;
 }
 
 void AddForestNodes(const std::vector<DeviceNodeRecord>& forest, CZKUMUsbTreeNodeImpl& root) {

@@ -1,6 +1,7 @@
 #include "tree/hub_queries.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
@@ -16,31 +17,32 @@ namespace {
 
 // Twice the longest name there is, in bytes.
 constexpr std::uint32_t kMostNameBytes = 1U << 17;
+// Holds nearly every name there is, so that few requests are made twice: they are what a build
+// waits for.
+constexpr std::uint32_t kFirstNameBytes = 512;
 
-// A second buffer for a name, zeroed, of the size the driver asked for. The size is the driver's
-// word alone: beyond what any name can have, and where there is no memory, there is no buffer and
-// the name is empty.
+// A zeroed buffer for a name. A size above kFirstNameBytes is the driver's word alone: beyond what
+// any name can have, and where there is no memory, there is no buffer and the name is empty.
 class NameBuffer {
  public:
-  explicit NameBuffer(std::uint32_t size) noexcept
-      : m_bytes(size > kMostNameBytes ? nullptr : static_cast<std::uint8_t*>(std::calloc(size, 1))),
-        m_size(size) {}
-
-  explicit operator bool() const noexcept { return m_bytes != nullptr; }
-  std::uint8_t* Data() noexcept { return m_bytes.get(); }
-  std::uint32_t Size() const noexcept { return m_size; }
-  void PutHead(const void* head, std::size_t size) noexcept {
-    std::memcpy(m_bytes.get(), head, std::min<std::size_t>(size, m_size));
+  // False without a buffer of that size.
+  bool Grow(std::uint32_t size) noexcept {
+    if (size > kMostNameBytes) return false;
+    m_large.reset(static_cast<std::uint8_t*>(std::calloc(size, 1)));
+    m_size = size;
+    return m_large != nullptr;
   }
-  // The characters behind the head, as far as they were received, up to the terminating zero.
-  std::u16string Name(std::size_t head, std::uint32_t received) const {
-    const std::size_t end = std::min(received, m_size);
-    if (end <= head) return {};
+  std::uint8_t* Data() noexcept { return m_large ? m_large.get() : m_first.data(); }
+  std::uint32_t Size() const noexcept { return m_size; }
+  // The characters between the head and `end`, as far as they were received, up to the terminating
+  // zero.
+  std::u16string Name(std::size_t head, std::uint32_t end) {
+    end = std::min(end, m_size);
     // Taken one by one: how much a driver claims to have written says nothing about the name.
     std::u16string name;
     for (std::size_t at = head; at + sizeof(char16_t) <= end; at += sizeof(char16_t)) {
       char16_t unit;
-      std::memcpy(&unit, m_bytes.get() + at, sizeof unit);
+      std::memcpy(&unit, Data() + at, sizeof unit);
       if (unit == u'\0') break;
       name += unit;
     }
@@ -52,77 +54,54 @@ class NameBuffer {
     void operator()(std::uint8_t* bytes) const noexcept { std::free(bytes); }
   };
 
-  std::unique_ptr<std::uint8_t[], Free> m_bytes;
-  std::uint32_t m_size;
+  std::array<std::uint8_t, kFirstNameBytes> m_first{};
+  std::unique_ptr<std::uint8_t[], Free> m_large;
+  std::uint32_t m_size = kFirstNameBytes;
 };
 
-// The record with its one declared character, for the first request.
+// Asks for a name, again with the size that the driver told where it is longer than most. One
+// buffer serves for input (the head, where `takesInput`) and output. Empty where the request fails
+// or the driver tells of fewer than `leastBytes`.
 template <class Head>
-struct FirstAnswer {
-  Head head{};
-  char16_t name = 0;
-};
+std::u16string AskForName(platform::DeviceIo& io, platform::FileHandle device, std::uint32_t code,
+                          const Head& head, bool takesInput, std::uint32_t leastBytes) {
+  NameBuffer buffer;
+  for (bool grown = false;; grown = true) {
+    std::memcpy(buffer.Data(), &head, sizeof head);
+    std::uint32_t received = 0;
+    if (!io.DeviceControl(device, code, takesInput ? buffer.Data() : nullptr,
+                          takesInput ? buffer.Size() : 0, buffer.Data(), buffer.Size(), received)) {
+      return {};
+    }
+    if (grown) return buffer.Name(sizeof head, received);
+    Head answer;
+    std::memcpy(&answer, buffer.Data(), sizeof answer);
+    if (answer.ActualLength < leastBytes) return {};
+    if (answer.ActualLength <= buffer.Size()) {
+      return buffer.Name(sizeof head, std::min(received, answer.ActualLength));
+    }
+    if (!buffer.Grow(answer.ActualLength)) return {};
+  }
+}
 
-// Both port queries: one buffer for input and output, the port set in it each time.
 std::u16string ConnectionText(platform::DeviceIo& io, platform::FileHandle hub, std::uint32_t port,
                               std::uint32_t code) {
-  using Head = platform::UsbConnectionNameHead;
-  constexpr std::uint32_t kSize = platform::kConnectionNameRecordSize;
-  std::uint32_t received = 0;
-
-  FirstAnswer<Head> first;
-  first.head.ConnectionIndex = port;
-  if (!io.DeviceControl(hub, code, &first, kSize, &first, kSize, received)) return {};
-  if (first.head.ActualLength <= kSize) return {};
-
-  NameBuffer second(first.head.ActualLength);
-  if (!second) return {};
-  const Head head{port, 0};
-  second.PutHead(&head, sizeof head);
-  if (!io.DeviceControl(hub, code, second.Data(), second.Size(), second.Data(), second.Size(),
-                        received)) {
-    return {};
-  }
-  return second.Name(sizeof head, received);
+  return AskForName(io, hub, code, platform::UsbConnectionNameHead{port, 0}, true,
+                    platform::kConnectionNameRecordSize + 1);
 }
 
 }  // namespace
 
 std::u16string GetHcdDriverKeyName(platform::DeviceIo& io, platform::FileHandle controller) {
-  constexpr std::uint32_t kCode = platform::kIOCTL_GET_HCD_DRIVERKEY_NAME;
-  constexpr std::uint32_t kSize = platform::kNameRecordSize;
-  std::uint32_t received = 0;
-
-  FirstAnswer<platform::UsbNameHead> first;
-  if (!io.DeviceControl(controller, kCode, &first, kSize, &first, kSize, received)) return {};
-  if (first.head.ActualLength <= kSize) return {};
-
-  NameBuffer second(first.head.ActualLength);
-  if (!second) return {};
-  if (!io.DeviceControl(controller, kCode, second.Data(), second.Size(), second.Data(),
-                        second.Size(), received)) {
-    return {};
-  }
-  return second.Name(sizeof(platform::UsbNameHead), received);
+  return AskForName(io, controller, platform::kIOCTL_GET_HCD_DRIVERKEY_NAME,
+                    platform::UsbNameHead{}, true, platform::kNameRecordSize + 1);
 }
 
 std::u16string GetRootHubName(platform::DeviceIo& io, platform::FileHandle controller) {
-  constexpr std::uint32_t kCode = platform::kIOCTL_USB_GET_ROOT_HUB_NAME;
-  std::uint32_t received = 0;
-
-  FirstAnswer<platform::UsbNameHead> first;
-  if (!io.DeviceControl(controller, kCode, nullptr, 0, &first, platform::kNameRecordSize,
-                        received)) {
-    return {};
-  }
   // No input and no test of the size, unlike the other name queries. This is meant: the controller
-  // driver takes nothing in, and a size that is too small simply fails the second request.
-  NameBuffer second(first.head.ActualLength);
-  if (!second) return {};
-  if (!io.DeviceControl(controller, kCode, nullptr, 0, second.Data(), second.Size(), received)) {
-    return {};
-  }
-  return second.Name(sizeof(platform::UsbNameHead), received);
+  // driver takes nothing in.
+  return AskForName(io, controller, platform::kIOCTL_USB_GET_ROOT_HUB_NAME, platform::UsbNameHead{},
+                    false, 0);
 }
 
 bool GetNodeInformation(platform::DeviceIo& io, platform::FileHandle hub,

@@ -4,7 +4,6 @@
 #include <string>
 #include <vector>
 
-#include "devinfo/caching_device_manager.h"
 #include "devinfo/info_device_cache.h"
 #include "platform/host.h"
 #include "records/device_lists.h"
@@ -37,7 +36,7 @@ class Publication {
   DeviceList RemovedDevices();
   DeviceList ModifiedDevices(const DeviceList& attached, const TreeIndex& index);
 
-  CachingDeviceManager m_manager;
+  platform::DeviceManager& m_manager;
   InfoDeviceCache& m_devices;
   const std::vector<NodePtr>& m_interfaceDevices;
   const NodePtr m_building;

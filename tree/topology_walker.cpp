@@ -40,6 +40,7 @@ struct CZKUMTopologyWalker::HubOnTheWay {
 };
 
 void CZKUMTopologyWalker::StartWalk() {
+  m_answers.Forget();
   m_previous = m_current;
   m_nConnectedDevices = 0;
   m_nConnectedHubs = 0;
@@ -55,12 +56,12 @@ void CZKUMTopologyWalker::StartWalk() {
 }
 
 DriverKeyIndex& CZKUMTopologyWalker::DriverKeys() {
-  return m_driverKeys ? *m_driverKeys : m_driverKeys.emplace(m_host);
+  return m_driverKeys ? *m_driverKeys : m_driverKeys.emplace(m_freshNodes);
 }
 
 void CZKUMTopologyWalker::ReadDeviceManagerTree() {
   m_deviceRecords.clear();
-  m_deviceRecords = LinkDeviceForest(ReadDeviceRecords(m_host));
+  m_deviceRecords = ReadDeviceForest(m_host, m_answers);
   AddForestNodes(m_deviceRecords, *m_building);
 }
 
@@ -124,7 +125,7 @@ bool CZKUMTopologyWalker::AddHostController(platform::FileHandle handle,
 
 bool CZKUMTopologyWalker::AddRootHub(const RingPtr<CZKUMHostControllerImpl>& controller,
                                      platform::FileHandle handle) {
-  if (!Initialise(m_host, m_host, DriverKeys(), handle, *controller)) return false;
+  if (!Initialise(m_host, m_answers, DriverKeys(), handle, *controller)) return false;
   std::unique_ptr<ConnectionRecord> none;
   if (NodePtr hub = BuildHub(controller->m_strRootHubName, none, u"RootHub")) {
     AddChild(std::move(hub), controller.Get());
@@ -204,7 +205,7 @@ void CZKUMTopologyWalker::BuildPort(HubPath& path, std::uint32_t index) {
       if (!driverKey.empty()) {
         node = DriverKeys().Find(driverKey);
         description = GetDeviceDescription(m_host, node);
-        instanceId = GetDeviceId(m_host, node);
+        instanceId = GetDeviceId(m_answers, node);
       }
     }
     if (info.DeviceIsHub != 0) {

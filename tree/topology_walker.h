@@ -8,6 +8,7 @@
 #include <unordered_set>
 #include <vector>
 
+#include "devinfo/device_answers.h"
 #include "platform/host.h"
 #include "records/device_node_record.h"
 #include "records/devnode.h"
@@ -22,7 +23,12 @@ namespace KelvoUHW {
 // lack of memory is reported, as std::bad_alloc.
 class CZKUMTopologyWalker {
  public:
-  explicit CZKUMTopologyWalker(platform::Host& host) noexcept : m_host(host) {}
+  explicit CZKUMTopologyWalker(platform::Host& host) noexcept
+      : m_host(host), m_answers(host), m_freshNodes(host, m_answers) {}
+
+  // What has been asked since the latest walk started. Whatever else a build asks about
+  // device-manager nodes it asks there.
+  DeviceAnswers& Answers() noexcept { return m_answers; }
 
   // Starts a new tree and walks: the names \\.\HCD0 to \\.\HCD9, then the device interfaces, then
   // the device manager.
@@ -66,6 +72,8 @@ class CZKUMTopologyWalker {
   void BuildPort(HubPath& path, std::uint32_t index);
 
   platform::Host& m_host;
+  DeviceAnswers m_answers;
+  FreshDeviceManager m_freshNodes;
   DriverKeyIndex& DriverKeys();
 
   std::optional<DriverKeyIndex> m_driverKeys;  // of the running walk

@@ -7,7 +7,7 @@
 namespace KelvoUHW {
 
 CZKUMUsbTreeBuilder::CZKUMUsbTreeBuilder(platform::Host& host)
-    : m_walker(host), m_deviceInfo(host, host), m_storage(host), m_host(host) {}
+    : m_walker(host), m_deviceInfo(host, m_walker.Answers()), m_storage(host, m_walker.Answers()) {}
 
 bool CZKUMUsbTreeBuilder::Build() {
   const RecordsInUse inUse;
@@ -21,14 +21,17 @@ bool CZKUMUsbTreeBuilder::Build() {
   if (m_storage.CollectStorage(diagnostics)) m_bOwesPublication = true;
   if (!m_bOwesPublication) {
     m_walker.Abort();
+    m_walker.Answers().Forget();
     return false;
   }
   {
     const RecordWriteLock lock;
-    Publication(m_host, m_deviceInfo, m_storage.Volumes(), m_walker.m_building, m_walker.m_current)
+    Publication(m_walker.Answers(), m_deviceInfo, m_storage.Volumes(), m_walker.m_building,
+                m_walker.m_current)
         .Run(m_deviceLists);
   }
   m_walker.Commit();
+  m_walker.Answers().Forget();
   m_bOwesPublication = false;
   return true;
 }

@@ -45,7 +45,6 @@ class CZKUMUsbTreeBuilder {
   CZKUMTopologyWalker m_walker;
   InfoDeviceCache m_deviceInfo;
   StorageCache m_storage;
-  platform::Host& m_host;
   bool m_bOwesPublication = false;  // a change was reported and is not published yet
 };
 

@@ -35,7 +35,8 @@ class InfoDeviceCacheTest : public testing::Test {
     machine.devices = std::move(devices);
     pc = std::make_unique<SimulatedPc>(machine);
     host = std::make_unique<platform::wrappers::FailingHost>(*pc);
-    cache = std::make_unique<InfoDeviceCache>(*host, *host);
+    answers = std::make_unique<DeviceAnswers>(*host);
+    cache = std::make_unique<InfoDeviceCache>(*host, *answers);
   }
   void TearDown() override {
     EXPECT_EQ(pc->Open(), platform::simulated::OpenCounts{});
@@ -58,6 +59,7 @@ class InfoDeviceCacheTest : public testing::Test {
       AddChild(node, port.Get());
       AddChild(port, root.Get());
     }
+    answers->Forget();
     return cache->Collect(root);
   }
   // A pass that is committed at once, as text: "current | added | 1 of removed | held | pending".
@@ -74,6 +76,7 @@ class InfoDeviceCacheTest : public testing::Test {
   }
   std::unique_ptr<SimulatedPc> pc;
   std::unique_ptr<platform::wrappers::FailingHost> host;
+  std::unique_ptr<DeviceAnswers> answers;
   std::unique_ptr<InfoDeviceCache> cache;
 };
 

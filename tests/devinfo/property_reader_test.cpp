@@ -58,38 +58,43 @@ struct ScriptedSets final : wrappers::InterceptingHost {
 };
 
 TEST(DeviceProperty, IsReadWithinWhatWasReceived) {
-  std::vector<std::uint32_t> withoutEnd(kMostPropertyReads, 8);
-  withoutEnd[0] = 0;
-  // One buffer serves all: what a longer text left in it must not show.
+  constexpr std::uint32_t kFirst = PropertyBuffer::kFirstBytes;
+  const std::vector<std::uint32_t> withoutEnd(kMostPropertyReads, kFirst);
+  const std::u16string fits(kFirst / 2 - 1, u'f'), tooLong(kFirst / 2, u't');
+  // One buffer serves all but the longest: what a longer text left in it must not show.
   const std::tuple<Value, std::u16string, std::vector<std::uint32_t>> cases[] = {
-      {{.text = u"long enough"}, u"long enough", {0, 24}},
-      {{.text = u"abc", .withoutZero = true, .claimedAfter = 99}, u"abc", {0, 6}},
-      {{.text = u"abc"}, u"abc", {0, 8}},
-      {{.text = u"abc", .withoutZero = true}, u"abc", {0, 6}},
-      {{.text = u"abc", .claimedAfter = 5}, u"ab", {0, 8}},
-      {{.text = u"", .withoutZero = true}, u"", {0}},
-      {{.text = std::u16string(u"a\0b", 3)}, u"a", {0, 8}},
-      {{.text = u"a", .claimedBytes = 9}, u"a", {0, 9}},
-      {{.text = u"abc", .outgrown = 2}, u"abc", {0, 8, 8, 8}},
+      {{.text = fits}, fits, {kFirst}},
+      {{.text = u"abc", .claimedAfter = 0xFFFFFFFF}, u"abc", {kFirst}},
+      {{.text = u"abc"}, u"abc", {kFirst}},
+      {{.text = u"abc", .withoutZero = true}, u"abc", {kFirst}},
+      {{.text = u"abc", .claimedAfter = 5}, u"ab", {kFirst}},
+      {{.text = u"", .withoutZero = true}, u"", {kFirst}},
+      {{.text = std::u16string(u"a\0b", 3)}, u"a", {kFirst}},
+      {{.text = u"a", .claimedBytes = 9}, u"a", {kFirst}},
+      {{.text = u"abc", .outgrown = 2}, u"abc", {kFirst, kFirst, kFirst}},
       {{.text = u"abc", .outgrown = 99}, u"failure 122", withoutEnd},
-      {{.text = u"abc", .claimedBytes = 0xFFFFFFFF}, u"failure 122", {0}},
-      {{.failure = kERROR_INVALID_DATA}, u"failure 13", {0}},
-      {{.failure = 0}, u"failure 0", {0}}};
+      {{.text = u"abc", .claimedBytes = 0xFFFFFFFF, .outgrown = 1}, u"failure 122", {kFirst}},
+      {{.failure = kERROR_INVALID_DATA}, u"failure 13", {kFirst}},
+      {{.failure = 0}, u"failure 0", {kFirst}},
+      {{.text = tooLong}, tooLong, {kFirst, kFirst + 2}}};
   PropertyBuffer buffer;
   for (const auto& [value, read, offered] : cases) {
     ScriptedSets sets;
     sets.values[kSPDRP_MFG] = value;
     std::uint32_t type = 0;
     const Status status = ReadDeviceProperty(sets, 1, {}, kSPDRP_MFG, type, buffer);
-    EXPECT_EQ(status ? std::u16string(buffer.Text()) : u"failure " + Decimal(static_cast<int>(status.error)), read);
+    const PropertyAnswer answer{true, type, buffer.Received(), buffer.Chars()};
+    EXPECT_EQ(status ? std::u16string(TextOf(answer)) : u"failure " + Decimal(static_cast<int>(status.error)), read);
     EXPECT_EQ(sets.offered, offered);
   }
-  const std::pair<Value, std::u16string_view> ids[] = {{{.text = u"USB/A\\B/"}, u"USB\\A\\B\\"},
-                                                       {{.text = u"AB", .withoutZero = true}, u"AB"},
-                                                       {{.text = u"AB", .failure = 0}, u""},
-                                                       {{.text = u"ABCDEF", .claimedBytes = 3}, u""},
-                                                       {{.text = u"AB", .claimedBytes = 0xFFFFFFFF}, u""},
-                                                       {{.text = u"AB", .claimedBytes = 0}, u""}};
+  const std::pair<Value, std::u16string> ids[] = {
+      {{.text = u"USB/A\\B/"}, u"USB\\A\\B\\"},
+      {{.text = u"AB", .withoutZero = true}, u"AB"},
+      {{.text = u"AB", .failure = 0}, u""},
+      {{.text = u"ABCDEF", .claimedBytes = 3}, u"ABC"},
+      {{.text = std::u16string(300, u'L')}, std::u16string(300, u'L')},
+      {{.text = std::u16string(300, u'L'), .claimedBytes = 0xFFFFFFFF}, u""},
+      {{.text = u"AB", .claimedBytes = 0}, u""}};
   for (const auto& [value, id] : ids) {
     ScriptedSets sets;
     sets.id = value;
@@ -98,8 +103,12 @@ TEST(DeviceProperty, IsReadWithinWhatWasReceived) {
 }
 
 bool Read(ScriptedSets& sets, CZKUMInfoDeviceImpl& record) {
-  PropertyBuffer buffer;
-  return ReadInfoDeviceProperties(sets, 1, {}, buffer, record);
+  DeviceAnswers answers(sets);
+  ElementReader reader(sets, 1, answers);
+  PassedElements none;
+  const bool accepted = ReadClass(reader, {}, record) & ReadService(reader, {}, record);
+  ReadOtherProperties(reader, {}, none, record);
+  return accepted;
 }
 
 TEST(InfoDeviceProperties, FillTheirFields) {
@@ -140,11 +149,10 @@ TEST(InfoDeviceProperties, FillTheirFields) {
 TEST(InfoDeviceProperties, ServicesExcludeIgnoringCaseAndClassesExactly) {
   const auto accepts = [](const std::u16string& service, const std::u16string& deviceClass) {
     ScriptedSets sets;
-    sets.values = {{kSPDRP_SERVICE, {service}}, {kSPDRP_CLASS, {deviceClass}}, {kSPDRP_FRIENDLYNAME, {u"name"}}};
+    sets.values = {{kSPDRP_SERVICE, {service}}, {kSPDRP_CLASS, {deviceClass}}};
     CZKUMInfoDeviceImpl record;
     const bool accepted = Read(sets, record);
-    // An excluded node leaves its properties behind, and this is meant.
-    EXPECT_EQ(record.FriendlyName + record.DevClass, u"name" + deviceClass);
+    EXPECT_EQ(record.Service + record.DevClass, service + deviceClass);
     return accepted;
   };
   std::istringstream services(

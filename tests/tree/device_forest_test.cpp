@@ -26,6 +26,14 @@ Machine ThreeDevices() {
   return machine;
 }
 
+Records ReadAll(platform::Host& host) {
+  DeviceAnswers answers(host);
+  DeviceRecordReader reader(host, answers);
+  Records records = reader.Read();
+  for (DeviceNodeRecord& record : records) reader.Complete(record);
+  return records;
+}
+
 TEST(DeviceRecords, WhichDevicesAreRead) {
   struct Case {
     const char* what;
@@ -61,7 +69,7 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
     const std::uint64_t call = c.fails ? 1 : platform::wrappers::FailurePlan::kNever;
     FailingHost host(pc, {.call = call, .onwards = true, .operation = c.fails});
     std::string names;
-    for (const DeviceNodeRecord& record : ReadDeviceRecords(host)) names += platform::ToUtf8(record.Name) + " ";
+    for (const DeviceNodeRecord& record : ReadAll(host)) names += platform::ToUtf8(record.Name) + " ";
     EXPECT_EQ(names, c.names) << c.what;
     EXPECT_EQ(host.Failures() != 0, c.fails.has_value()) << c.what;
     EXPECT_TRUE(pc.Open() == OpenCounts{.sets = c.setsLeftOpen} && pc.Misuses().empty()) << c.what;
@@ -73,7 +81,7 @@ TEST(DeviceRecords, FieldsAreThoseOfTheDevice) {
   machine.devices[1].location = u"slot 3";
   machine.devices[1].hardwareIds = {{u"PCI\\FIRST", u"PCI\\SECOND"}};
   SimulatedPc pc(machine);
-  const Records records = ReadDeviceRecords(pc);
+  const Records records = ReadAll(pc);
   ASSERT_EQ(records.size(), 3u);
   EXPECT_EQ(records[0].ParentDevInst, platform::simulated::kRootDeviceNumber);
   EXPECT_EQ(records[0].ParentInstanceId + records[0].Location, platform::simulated::kRootDeviceId);

@@ -21,6 +21,16 @@ constexpr char16_t kStickId[] = u"USB\\VID_0781&PID_5406\\0774611B";
 // An identifier without a zero byte, so that a byte that is lost shows.
 constexpr Guid kInterfaceClass{0x7A5B1CDE, 0x4F21, 0x4D3E, {0x91, 0x22, 0x33, 0x44, 0x55, 0x66, 0x77, 0x88}};
 
+bool ReadProperties(Host& host, DeviceSetHandle set, const SP_DEVINFO_DATA& element,
+                    KelvoUHW::CZKUMInfoDeviceImpl& record) {
+  KelvoUHW::DeviceAnswers answers(host);
+  KelvoUHW::ElementReader reader(host, set, answers);
+  KelvoUHW::PassedElements none;
+  const bool accepted = ReadClass(reader, element, record) && ReadService(reader, element, record);
+  ReadOtherProperties(reader, element, none, record);
+  return accepted;
+}
+
 class DeviceNodes : public testing::Test {
  protected:
   void SetUp() override {
@@ -52,8 +62,7 @@ TEST_F(DeviceNodes, ShowTheirProperties) {
   EXPECT_EQ(m_stick.ClassGuid, GUID_DEVCLASS_USB);
 
   const auto record = KelvoUHW::MakeRecord<KelvoUHW::CZKUMInfoDeviceImpl>();
-  KelvoUHW::PropertyBuffer buffer;
-  EXPECT_TRUE(KelvoUHW::ReadInfoDeviceProperties(m_host, m_set.Get(), m_stick, buffer, *record.Get()));
+  EXPECT_TRUE(ReadProperties(m_host, m_set.Get(), m_stick, *record.Get()));
   EXPECT_EQ(record->Service, u"USBSTOR");
   EXPECT_EQ(record->m_strDeviceDescr, u"USB Mass Storage Device");
   EXPECT_EQ(record->HardwareId, u"USB\\Vid_0781&Pid_5406&Rev_0100");
@@ -111,7 +120,7 @@ TEST_F(DeviceNodes, EndReadingWhatTheyLack) {
   EXPECT_GE(failures, 10);
   const auto record = KelvoUHW::MakeRecord<KelvoUHW::CZKUMInfoDeviceImpl>();
   record->Location = u"kept";
-  KelvoUHW::ReadInfoDeviceProperties(m_host, set.Get(), element, buffer, *record.Get());
+  ReadProperties(m_host, set.Get(), element, *record.Get());
   EXPECT_EQ(record->Location, u"kept");
   EXPECT_EQ(record->LegacyBusType, -1);
 }
