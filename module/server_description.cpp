@@ -7,20 +7,27 @@
 
 namespace KelvoUHW {
 
-const ServerDescription& ModuleDescription() noexcept {
-  using platform::FromSystemGuid;
-  // The tree is registered as "ZKUMUsbTree Class" although the type library calls the same class
-  // "USB Tree". Both are published and meant.
-  static const std::array kClasses = {
-      RegisteredClass{FromSystemGuid(CLSID_ZKUMUsbTree), RegistryScript(ScriptResource::UsbTree),
-                      u"KelvoUsbMonitor.UsbTree", u"1", u"ZKUMUsbTree Class", u"Free"},
-      RegisteredClass{FromSystemGuid(CLSID_ZKUMEventNotifier),
-                      RegistryScript(ScriptResource::EventNotifier),
-                      u"KelvoUsbMonitor.EventNotifier", u"1", u"ZKUMEventNotifier Class", u"Free"},
-  };
-  static const ServerDescription kDescription{FromSystemGuid(LIBID_ZKUsbMonitorLib),
-                                              RegistryScript(ScriptResource::Module), kClasses};
-  return kDescription;
-}
+namespace {
+
+using platform::FromSystemGuid;
+
+// Made when the module is loaded. Variables of a function would be guarded by the run-time library of Windows builds,
+// which takes a system index for that and does not give it back when the module is unloaded.
+//
+// The tree is registered as "ZKUMUsbTree Class" although the type library calls the same class "USB
+// Tree". Both are published and meant.
+const std::array kClasses = {
+    RegisteredClass{FromSystemGuid(CLSID_ZKUMUsbTree), RegistryScript(ScriptResource::UsbTree),
+                    u"KelvoUsbMonitor.UsbTree", u"1", u"ZKUMUsbTree Class", u"Free"},
+    RegisteredClass{FromSystemGuid(CLSID_ZKUMEventNotifier),
+                    RegistryScript(ScriptResource::EventNotifier), u"KelvoUsbMonitor.EventNotifier",
+                    u"1", u"ZKUMEventNotifier Class", u"Free"},
+};
+const ServerDescription kDescription{FromSystemGuid(LIBID_ZKUsbMonitorLib),
+                                     RegistryScript(ScriptResource::Module), kClasses};
+
+}  // namespace
+
+const ServerDescription& ModuleDescription() noexcept { return kDescription; }
 
 }  // namespace KelvoUHW

@@ -18,7 +18,12 @@ LibraryInterface Automation(const char16_t* name) {
 platform::TypeLibrary ModuleTypeLibrary() {
   platform::TypeLibrary library;
   library.attributes.guid = FromSystemGuid(LIBID_ZKUsbMonitorLib);
+#ifdef _WIN64
+  library.attributes.syskind = platform::kSYS_WIN64;
+#else
+  // Elsewhere than on Windows, too: what is modelled there is the 32-bit module.
   library.attributes.syskind = platform::kSYS_WIN32;
+#endif
   library.attributes.wMajorVerNum = 1;
   library.helpString = u"ZKUsbMonitor 1.0 Type Library";
   library.interfaces = {

@@ -6,7 +6,8 @@ function(zkusb_windows_module name)
   set(exports ${CMAKE_SOURCE_DIR}/module/exports.def)
   set(scripts ${CMAKE_SOURCE_DIR}/module/scripts)
   add_library(${name} SHARED
-    ${CMAKE_SOURCE_DIR}/module/exports.cpp ${exports} ${resources} ${ARGN})
+    ${CMAKE_SOURCE_DIR}/module/exports.cpp
+    ${CMAKE_SOURCE_DIR}/platform/windows/thread_data.cpp ${exports} ${resources} ${ARGN})
   target_link_libraries(${name} PRIVATE zkusb_component)
 
   set_source_files_properties(${resources} PROPERTIES

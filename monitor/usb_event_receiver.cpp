@@ -18,6 +18,8 @@ namespace KelvoUHW {
 namespace {
 
 constexpr std::uint32_t kWindowPollMilliseconds = 10;
+// So long for the window once its object is there. Where none comes the process is about to end.
+constexpr std::uint32_t kLongestWindowWaitMilliseconds = 5000;
 // A watched device's removal is looked at late, its arrival and every volume at once: it is meant
 // so.
 constexpr std::uint32_t kRemovalDelayMilliseconds = 3000;
@@ -106,8 +108,13 @@ bool CZKUMUsbEventReceiver::Start(IZKUMPrivateNotifier* target) {
   }
   while (g_pMsgWindow == nullptr) Threads().Sleep(kWindowPollMilliseconds);
 
-  // The object may be there before its window is. Then the handle is null, and the system refuses
-  // it: nobody waits for the window.
+  // The object is there before its window is, and the system refuses a null handle: the process
+  // would never hear of a device interface.
+  std::uint32_t waited = 0;
+  while (g_pMsgWindow.load()->m_hWnd == 0 && waited < kLongestWindowWaitMilliseconds) {
+    Threads().Sleep(kWindowPollMilliseconds);
+    waited += kWindowPollMilliseconds;
+  }
   const platform::WindowHandle window = g_pMsgWindow.load()->m_hWnd;
   platform::DEV_BROADCAST_DEVICEINTERFACE_W filter;
   filter.dbcc_size = sizeof filter;

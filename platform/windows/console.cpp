@@ -6,7 +6,10 @@
 #include <io.h>
 #include <shellapi.h>
 
+#include <atomic>
+#include <csignal>
 #include <cstdio>
+#include <cstdlib>
 #include <memory>
 
 #include "platform/text.h"
@@ -18,6 +21,20 @@ namespace {
 struct FreeLocal {
   void operator()(void* memory) const noexcept { LocalFree(memory); }
 };
+
+// The console's code page before this program; 0: it was not changed, or is back.
+constinit std::atomic<UINT> g_codePage = 0;
+
+void PutCodePageBack() noexcept {
+  if (const UINT codePage = g_codePage.exchange(0)) SetConsoleOutputCP(codePage);
+}
+
+BOOL WINAPI OnControl(DWORD) {
+  PutCodePageBack();
+  return FALSE;  // the system goes on to end the process
+}
+
+void OnAbort(int) { PutCodePageBack(); }
 
 }  // namespace
 
@@ -34,7 +51,13 @@ std::vector<std::string> Arguments() {
 }
 
 void PassOutputThrough() noexcept {
-  SetConsoleOutputCP(CP_UTF8);
+  const UINT before = GetConsoleOutputCP();
+  if (before != 0 && SetConsoleOutputCP(CP_UTF8)) {
+    g_codePage = before;
+    std::atexit(PutCodePageBack);
+    std::signal(SIGABRT, OnAbort);
+    SetConsoleCtrlHandler(OnControl, TRUE);
+  }
   _setmode(_fileno(stdout), _O_BINARY);
   _setmode(_fileno(stderr), _O_BINARY);
 }

@@ -12,6 +12,7 @@ using platform::kDBT_DEVICEARRIVAL;
 using platform::kDBT_DEVICEREMOVECOMPLETE;
 using platform::kWM_DEVICECHANGE;
 using platform::simulated::VolumeBroadcast;
+using testing::Each;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
@@ -131,20 +132,25 @@ TEST(UsbEventReceiver, RegistersForEveryInterfaceOnceTheWindowIsThere) {
   EXPECT_EQ(desktop.Calls(DesktopCall::RegisterDeviceNotificationW), 1u);
 }
 
-TEST(UsbEventReceiver, StartFailsWithoutItsWindow) {
-  // The object is published, its window not yet made: nobody waits for it, and volumes still come.
-  {
+TEST(UsbEventReceiver, WaitsForItsWindowButNotForEver) {
+  // The object is published, its window not yet made. One that comes too late hears of volumes alone.
+  const std::tuple<std::uint32_t, bool, std::uint64_t> kCases[] = {
+      {100, true, 100}, {4995, true, 5000}, {5005, true, 5010}, {5100, false, 5010}, {9000, false, 5010}};
+  for (const auto& [delay, started, until] : kCases) {
+    SCOPED_TRACE(delay);
     MonitorProcess process;
-    process.desktop.Order({.call = DesktopCall::CreateWindowExW, .delayMilliseconds = 100});
+    process.desktop.Order({.call = DesktopCall::CreateWindowExW, .delayMilliseconds = delay});
     RecordingTarget target(process.desktop);
     CZKUMUsbEventReceiver receiver;
-    EXPECT_FALSE(receiver.Start(&target));
-    EXPECT_EQ(process.desktop.Now(), 10u);
-    process.desktop.RunFor(90);
-    EXPECT_EQ(process.desktop.Broadcast(NamedBroadcast(kArrival, kInterface, kWatchedPath)), 0u);
+    EXPECT_EQ(receiver.Start(&target), started);
+    EXPECT_EQ(process.desktop.Now(), until);
+    process.desktop.RunFor(static_cast<std::uint32_t>(10'000 - until));
+    EXPECT_EQ(process.desktop.Registrations().size(), started ? 1u : 0u);
+    EXPECT_EQ(process.desktop.Broadcast(NamedBroadcast(kArrival, kInterface, kWatchedPath)), started ? 1u : 0u);
     EXPECT_EQ(process.desktop.Broadcast(VolumeBroadcast(kArrival, u'E', 0)), 1u);
     process.desktop.Settle();
-    EXPECT_THAT(target.Calls(), ElementsAre(RecordingTarget::Call{100, 0, TRUE, true}));
+    EXPECT_THAT(target.Calls(), Each(RecordingTarget::Call{10'000, 0, TRUE, true}));
+    EXPECT_EQ(target.Calls().size(), started ? 2u : 1u);
   }
   // The handle is there from the window's first message on, while the window is still being made.
   {

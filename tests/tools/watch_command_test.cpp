@@ -88,6 +88,26 @@ TEST(WatchCommand, TellsEveryScriptInOrder) {
   EXPECT_GE(scripts, 4);
 }
 
+// Kept in a file, for the builds that cannot run on virtual time to compare with.
+TEST(WatchCommand, TellsTheEventsThatAreKept) {
+#ifdef _WIN32
+  GTEST_SKIP() << "scripts play in real time; the tests of the DLL that ships compare with the file";
+#endif
+  const Json kept = Json::parse(testing_support::Contents("tests/golden/script-events.json"));
+  EXPECT_EQ(kept.size(), 4u);
+  for (const auto& [script, expected] : kept.items()) {
+    const std::string file = (ScriptsFolder() / (script + ".json")).string();
+    Json told = Json::array();
+    for (const Json& line :
+         JsonLines(Output({"watch", "--json", "--machine", MachineFile(expected.at("machine")), "--script", file}))) {
+      if (line.contains("event") && !line.at("event").is_null()) {
+        told.push_back({line.at("event"), line.at("InstanceId"), line.value("MountPoints", Json())});
+      }
+    }
+    EXPECT_EQ(told.dump(1), expected.at("events").dump(1)) << script;
+  }
+}
+
 TEST(WatchCommand, WatchesAPcWithoutController) {
 #ifdef _WIN32
   GTEST_SKIP() << "scripts play in real time, and this one takes a minute";

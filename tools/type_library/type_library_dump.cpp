@@ -229,7 +229,9 @@ std::string DumpTypeLibrary(const std::u16string& path) {
       Join({"library ", Take(name), " ",
             platform::ToUtf8(platform::GuidText(platform::FromSystemGuid(own->guid))), " ",
             Number(own->wMajorVerNum), ".", Number(own->wMinorVerNum),
-            own->syskind == SYS_WIN32 ? " SYS_WIN32" : " another system", " \"", Take(help), "\""});
+            own->syskind == SYS_WIN64   ? " SYS_WIN64"
+            : own->syskind == SYS_WIN32 ? " SYS_WIN32"
+                                        : " another system", " \"", Take(help), "\""});
   if (own->lcid != 0) text += Join({" locale ", Number(own->lcid)});
   text += "\n";
   library->ReleaseTLibAttr(own);
