@@ -11,8 +11,9 @@ namespace {
 
 using platform::FromSystemGuid;
 
-// Made when the module is loaded. Variables of a function would be guarded by the run-time library of Windows builds,
-// which takes a system index for that and does not give it back when the module is unloaded.
+// Made when the module is loaded. Variables of a function would be guarded by the run-time library
+// of Windows builds, which takes a system index for that and does not give it back when the module
+// is unloaded.
 //
 // The tree is registered as "ZKUMUsbTree Class" although the type library calls the same class "USB
 // Tree". Both are published and meant.

@@ -14,8 +14,9 @@
 namespace platform {
 
 // One code unit, lowered or raised without regard to context. On Windows this is the system's own
-// CharLowerW and CharUpperW. Elsewhere 531 letters of the common alphabets (native/case_mapping.cpp)
-// map to their one partner, and all else, such as what Unicode added later, to itself.
+// CharLowerW and CharUpperW. Elsewhere 531 letters of the common alphabets
+// (native/case_mapping.cpp) map to their one partner, and all else, such as what Unicode added
+// later, to itself.
 char16_t ToLower(char16_t unit) noexcept;
 char16_t ToUpper(char16_t unit) noexcept;
 

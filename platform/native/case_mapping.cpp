@@ -1,4 +1,5 @@
-// The letters that have one partner in the other case: Latin, Greek, Cyrillic, Armenian, circled and full-width ones.
+// The letters that have one partner in the other case: Latin, Greek, Cyrillic, Armenian, circled
+// and full-width ones.
 #include <array>
 
 #include "platform/text.h"

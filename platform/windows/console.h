@@ -10,8 +10,9 @@ namespace platform::windows {
 // system, and has lost what that one does not know. Throws std::bad_alloc.
 std::vector<std::string> Arguments();
 
-// From now on standard output takes UTF-8, byte for byte: no line end is changed. The console, which others use after
-// this program, gets its code page back when main returns and at exit, abort, Ctrl-C and their like; not where the process is killed.
+// From now on standard output takes UTF-8, byte for byte: no line end is changed. The console,
+// which others use after this program, gets its code page back when main returns and at exit,
+// abort, Ctrl-C and their like; not where the process is killed.
 void PassOutputThrough() noexcept;
 
 }  // namespace platform::windows

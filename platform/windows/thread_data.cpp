@@ -1,19 +1,20 @@
 // Thread-local variables of a module that is loaded and unloaded any number of times.
 //
-// The compiler reaches each of them through __emutls_get_address; the record it passes is that of its run-time
-// library (libgcc, emutls.c). The library's own function takes an index of the system and, with its thread library,
-// handles for each load, and never gives them back: after a thousand loads the process has none left. This one
-// stands before it in the module, and what it takes an unload gives back.
+// The compiler reaches each of them through __emutls_get_address; the record it passes is that of
+// its run-time library (libgcc, emutls.c). The library's own function takes an index of the system
+// and, with its thread library, handles for each load, and never gives them back: after a thousand
+// loads the process has none left. This one stands before it in the module, and what it takes an
+// unload gives back.
 #include "platform/windows/thread_data.h"
 
 #include <windows.h>
 
+#include <malloc.h>
 #include <array>
 #include <atomic>
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
-#include <malloc.h>
 #include <mutex>
 
 #include "platform/process_lock.h"

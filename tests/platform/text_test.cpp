@@ -4,25 +4,13 @@
 
 #include <limits>
 
-#ifdef _WIN32
-#include <windows.h>
-#endif
-
 namespace platform {
 namespace {
 
-#ifdef _WIN32
-TEST(Case, IsTheSystems) {
-  for (unsigned unit = 1; unit < 0x10000; ++unit) {
-    wchar_t lower[] = {static_cast<wchar_t>(unit), 0}, upper[] = {static_cast<wchar_t>(unit), 0};
-    ASSERT_TRUE(CharLowerBuffW(lower, 1) == 1 && CharUpperBuffW(upper, 1) == 1);
-    ASSERT_EQ(ToLower(static_cast<char16_t>(unit)), lower[0]) << std::hex << unit;
-    ASSERT_EQ(ToUpper(static_cast<char16_t>(unit)), upper[0]) << std::hex << unit;
-  }
-  EXPECT_EQ(ToLower(u'\x10A0'), u'\x2D00') << "a pair that the other builds do not know";
-}
-#else
 TEST(Case, PairsMapToEachOther) {
+#ifdef _WIN32
+  GTEST_SKIP() << "the mapping is the system's, which tests/windows compares";
+#endif
   // Upper and lower: one pair of each kind of range, and letters whose partner stands elsewhere.
   constexpr char16_t kPairs[][2] = {
       {u'A', u'a'},     {u'Z', u'z'},     {0x00C0, 0x00E0}, {0x00DE, 0x00FE}, {0x0178, 0x00FF}, {0x0100, 0x0101},
@@ -49,7 +37,6 @@ TEST(Case, PairsMapToEachOther) {
   }
   EXPECT_EQ(raised, 531) << "letters of which the upper one is lowered";
 }
-#endif
 
 TEST(Texts, CasePartsAndReplacement) {
   EXPECT_EQ(ToUpper(std::u16string_view(u"usb\0äß", 6)), std::u16string_view(u"USB\0Äß", 6));

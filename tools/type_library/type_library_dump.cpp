@@ -231,7 +231,8 @@ std::string DumpTypeLibrary(const std::u16string& path) {
             Number(own->wMajorVerNum), ".", Number(own->wMinorVerNum),
             own->syskind == SYS_WIN64   ? " SYS_WIN64"
             : own->syskind == SYS_WIN32 ? " SYS_WIN32"
-                                        : " another system", " \"", Take(help), "\""});
+                                        : " another system",
+            " \"", Take(help), "\""});
   if (own->lcid != 0) text += Join({" locale ", Number(own->lcid)});
   text += "\n";
   library->ReleaseTLibAttr(own);

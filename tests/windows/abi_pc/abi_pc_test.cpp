@@ -79,8 +79,12 @@ struct Watched {
 };
 Watched RunInPc(const std::string& id, const std::string& machine, const Lines& args, const std::string& script = {}) {
   const std::string report = Temporary(id + ".report", "");
-  Lines words{Beside(u"bin\\zkusb_abi_pc_dll.dll"), "ABI_PC_MODULE=" + platform::ToUtf8(Module()),
-              "ABI_PC_MACHINE=" + machine, "ABI_PC_REPORT=" + report, "ABI_PC_SCRIPT=" + script, Beside(u"zkusb.exe")};
+  Lines words{Beside(u"bin\\zkusb_abi_pc_dll.dll"),
+              "ABI_PC_MODULE=" + platform::ToUtf8(Module()),
+              "ABI_PC_MACHINE=" + machine,
+              "ABI_PC_REPORT=" + report,
+              "ABI_PC_SCRIPT=" + script,
+              Beside(u"zkusb.exe")};
   words.insert(words.end(), args.begin(), args.end());
   Watched watched{RunProgram(Beside(u"bin\\zkusb_launcher.exe"), words), {}, {}};
   std::ifstream lines(report);
@@ -186,7 +190,8 @@ TEST(AbiPc, EveryStartHearsOfInterfaces) {
 // member elsewhere.
 void MakeOdd(Json& machine, std::mt19937& random) {
   const auto below = [&](std::size_t bound) { return static_cast<std::size_t>(random() % bound); };
-  constexpr const char* kSections[] = {"devices", "interfaces", "hostControllers", "hubs", "storage", "volumes", "drives"};
+  constexpr const char* kSections[] = {"devices", "interfaces", "hostControllers", "hubs",
+                                       "storage", "volumes",    "drives"};
   Json* list = nullptr;
   while (list == nullptr || !list->is_array() || list->empty()) list = &machine[kSections[below(7)]];
   Json* record = &(*list)[below(list->size())];

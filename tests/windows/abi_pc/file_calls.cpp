@@ -13,7 +13,8 @@ namespace {
 static_assert(sizeof(USB_NODE_CONNECTION_INFORMATION_EX) == 35 && sizeof(USB_NODE_INFORMATION) == 76);
 static_assert(sizeof(USB_DEVICE_DESCRIPTOR) == 18 && sizeof(USB_PIPE_INFO) == 11);
 static_assert(offsetof(USB_ROOT_HUB_NAME, RootHubName) == 4 && offsetof(USB_NODE_CONNECTION_NAME, NodeName) == 8);
-static_assert(sizeof(STORAGE_DEVICE_DESCRIPTOR) == 40 && offsetof(STORAGE_DEVICE_DESCRIPTOR, RawDeviceProperties) == 36);
+static_assert(sizeof(STORAGE_DEVICE_DESCRIPTOR) == 40 &&
+              offsetof(STORAGE_DEVICE_DESCRIPTOR, RawDeviceProperties) == 36);
 static_assert(sizeof(STORAGE_DEVICE_NUMBER) == 12);
 constexpr std::size_t kSerialNumberOffset = 16;  // of the characters in MEDIA_SERIAL_NUMBER_DATA
 constexpr DWORD kMediaSerialNumber = 0x2D0C10;
@@ -100,7 +101,8 @@ Answer AnswerConnection(const sim::Port& port, ULONG number, Request& request) {
 Answer AnswerHub(const sim::Hub& hub, Request& request) {
   if (request.code == IOCTL_USB_GET_NODE_INFORMATION) return AnswerNode(hub, request);
   if (request.code != IOCTL_USB_GET_NODE_CONNECTION_INFORMATION &&
-      request.code != IOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX && request.code != IOCTL_USB_GET_NODE_CONNECTION_NAME &&
+      request.code != IOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX &&
+      request.code != IOCTL_USB_GET_NODE_CONNECTION_NAME &&
       request.code != IOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME) {
     return Refused(ERROR_INVALID_FUNCTION);
   }

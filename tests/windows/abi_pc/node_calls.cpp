@@ -100,12 +100,9 @@ BOOL WINAPI UnregisterNotification(HDEVNOTIFY handle) {
 }  // namespace
 
 Functions NodeFunctions() {
-  return {{"CM_Locate_DevNodeW", Address(Locate)},
-          {"CM_Get_Parent", Address(Parent)},
-          {"CM_Get_Child", Address(Child)},
-          {"CM_Get_Sibling", Address(Sibling)},
-          {"CM_Get_Device_IDW", Address(DeviceId)},
-          {"CM_Get_DevNode_Registry_PropertyW", Address(RegistryProperty)}};
+  return {{"CM_Locate_DevNodeW", Address(Locate)},  {"CM_Get_Parent", Address(Parent)},
+          {"CM_Get_Child", Address(Child)},         {"CM_Get_Sibling", Address(Sibling)},
+          {"CM_Get_Device_IDW", Address(DeviceId)}, {"CM_Get_DevNode_Registry_PropertyW", Address(RegistryProperty)}};
 }
 
 Functions NotificationFunctions() {

@@ -12,7 +12,8 @@ constexpr DWORD kDetailSize = sizeof(void*) == 8 ? 8 : 6;
 constexpr DWORD kImagesSize = sizeof(void*) == 8 ? 24 : 12;
 constexpr std::size_t kPathOffset = 4;
 static_assert(sizeof(SP_DEVINFO_DATA) == kElementSize && sizeof(SP_DEVICE_INTERFACE_DATA) == kInterfaceSize &&
-              sizeof(SP_DEVICE_INTERFACE_DETAIL_DATA_W) == kDetailSize && sizeof(SP_CLASSIMAGELIST_DATA) == kImagesSize);
+              sizeof(SP_DEVICE_INTERFACE_DETAIL_DATA_W) == kDetailSize &&
+              sizeof(SP_CLASSIMAGELIST_DATA) == kImagesSize);
 
 // What says to which set an element belongs, and where it stands there.
 ULONG_PTR Reserved(HANDLE set, std::size_t position) {

@@ -127,20 +127,34 @@ std::optional<std::pair<DWORD, std::string>> PropertyOf(const sim::Device& devic
     return std::pair(type, BytesOf(*member));
   };
   switch (property) {
-    case SPDRP_DEVICEDESC: return value(REG_SZ, device.description);
-    case SPDRP_HARDWAREID: return value(REG_MULTI_SZ, device.hardwareIds);
-    case SPDRP_SERVICE: return value(REG_SZ, device.service);
-    case SPDRP_CLASS: return value(REG_SZ, device.deviceClass);
-    case SPDRP_CLASSGUID: return value(REG_SZ, device.classGuid);
-    case SPDRP_DRIVER: return value(REG_SZ, device.driver);
-    case SPDRP_MFG: return value(REG_SZ, device.manufacturer);
-    case SPDRP_FRIENDLYNAME: return value(REG_SZ, device.friendlyName);
-    case SPDRP_LOCATION_INFORMATION: return value(REG_SZ, device.location);
-    case SPDRP_PHYSICAL_DEVICE_OBJECT_NAME: return value(REG_SZ, device.physicalName);
-    case SPDRP_UI_NUMBER: return value(REG_DWORD, device.uiNumber);
-    case SPDRP_LEGACYBUSTYPE: return value(REG_DWORD, device.legacyBusType);
-    case SPDRP_ENUMERATOR_NAME: return value(REG_SZ, device.enumerator);
-    default: return std::nullopt;
+    case SPDRP_DEVICEDESC:
+      return value(REG_SZ, device.description);
+    case SPDRP_HARDWAREID:
+      return value(REG_MULTI_SZ, device.hardwareIds);
+    case SPDRP_SERVICE:
+      return value(REG_SZ, device.service);
+    case SPDRP_CLASS:
+      return value(REG_SZ, device.deviceClass);
+    case SPDRP_CLASSGUID:
+      return value(REG_SZ, device.classGuid);
+    case SPDRP_DRIVER:
+      return value(REG_SZ, device.driver);
+    case SPDRP_MFG:
+      return value(REG_SZ, device.manufacturer);
+    case SPDRP_FRIENDLYNAME:
+      return value(REG_SZ, device.friendlyName);
+    case SPDRP_LOCATION_INFORMATION:
+      return value(REG_SZ, device.location);
+    case SPDRP_PHYSICAL_DEVICE_OBJECT_NAME:
+      return value(REG_SZ, device.physicalName);
+    case SPDRP_UI_NUMBER:
+      return value(REG_DWORD, device.uiNumber);
+    case SPDRP_LEGACYBUSTYPE:
+      return value(REG_DWORD, device.legacyBusType);
+    case SPDRP_ENUMERATOR_NAME:
+      return value(REG_SZ, device.enumerator);
+    default:
+      return std::nullopt;
   }
 }
 
