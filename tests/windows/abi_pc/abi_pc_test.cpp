@@ -316,7 +316,8 @@ TEST(AbiPc, AStickIsPulledOutWhileABuildLooks) {
   for (unsigned at = 0; at < calls; at += 1 + calls / 150) {
     const std::string what = "pulled out before call " + std::to_string(at);
     Begin(machine);
-    BeforeCalls([&, gone = false](unsigned before) mutable {
+    bool gone = false;
+    BeforeCalls([&](unsigned before) {
       if (before >= at && !std::exchange(gone, true)) Change(without);
     });
     {
