@@ -3,14 +3,17 @@
 
     scripts/windows-faults.py [BUILD] [FIRST [LAST]]
 
-BUILD is a folder of the windows-x64 preset in which everything is built (build/windows-x64). Only the changed file is
-compiled, and the two modules and the test program that contains it are linked, in a folder of their own: neither the
+BUILD is a folder in which everything is built, file by file:
+
+    cmake --preset windows-x64 -B build/faults -DCMAKE_UNITY_BUILD=OFF && cmake --build build/faults
+
+Only the changed file is compiled, and the two modules and the test program that contains it are linked, in a folder of their own: neither the
 sources nor the build change. Ends with 1 when fewer are seen than the project wants.
 """
 import json, os, pathlib, re, shlex, shutil, subprocess, sys, tempfile
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
-BUILD = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else ROOT / "build/windows-x64").resolve()
+BUILD = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else ROOT / "build/faults").resolve()
 
 # File, what stands there, what is put there.
 FAULTS = [

@@ -32,8 +32,9 @@ constexpr std::size_t kSetsOfABuild = 4;
 
 std::string MachinePath(const std::string& name) { return ZKUSB_SOURCE_DIR "/machines/" + name + ".json"; }
 std::string Beside(const char16_t* file) { return platform::ToUtf8(ModuleFile(file)); }
+// A file of this process alone: two runs may go side by side.
 std::string Temporary(const std::string& name, const std::string& text) {
-  const std::string path = testing::TempDir() + "zkusb-abi-" + std::to_string(sizeof(void*)) + "-" + name;
+  const std::string path = testing::TempDir() + "zkusb-abi-" + std::to_string(GetCurrentProcessId()) + "-" + name;
   std::ofstream(path, std::ios::binary) << text;
   return path;
 }
@@ -154,6 +155,7 @@ TEST(AbiPc, ScriptsTellWhatTheNativeBuildTells) {
   }
   for (std::thread& run : runs) run.join();
   for (const auto& [script, run] : watched) {
+    std::filesystem::remove(Temporary(script + ".json", ""));
     ExpectNothingWrong(run, script, 30 * kSetsOfABuild);
     Json told = Json::array();
     std::istringstream lines(run.result.out);
@@ -252,6 +254,7 @@ TEST(AbiPc, MadeUpPcsAreShownAlike) {
     const std::string file = Temporary("made-up.json", machine.dump());
     const std::string picture = PictureOf(sim::LoadMachine(file), what);
     EXPECT_TRUE(picture == SimulatedPictureOf(file)) << what;
+    std::filesystem::remove(file);
     distinct += picture != before ? 1 : 0;
     before = picture;
   }
