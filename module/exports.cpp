@@ -20,19 +20,17 @@ void OnUnload() noexcept {
 }  // namespace
 
 #ifdef _WIN32
-#include "platform/windows/thread_data.h"
-
 #define ZKUSB_EXPORT extern "C"
 extern "C" BOOL WINAPI DllMain(HINSTANCE instance, DWORD reason, LPVOID processEnds) {
   if (reason == DLL_PROCESS_ATTACH) {
     platform::SetModuleInstance(instance);
     return OnLoad() ? TRUE : FALSE;
   }
-  if (reason == DLL_THREAD_DETACH) platform::windows::ForgetThread();
+  if (reason == DLL_THREAD_DETACH) platform::ForgetThread();
   // When the process ends its other threads are gone already, whatever they held: nothing is done.
   if (reason == DLL_PROCESS_DETACH && processEnds == nullptr) {
     OnUnload();
-    platform::windows::ForgetAllThreads();
+    platform::ForgetAllThreads();
   }
   return TRUE;
 }

@@ -5,7 +5,7 @@
 // and, with its thread library, handles for each load, and never gives them back: after a thousand
 // loads the process has none left. This one stands before it in the module, and what it takes an
 // unload gives back.
-#include "platform/windows/thread_data.h"
+#include "platform/process_end.h"
 
 #include <windows.h>
 
@@ -37,7 +37,9 @@ namespace __gnu_cxx {
 void __freeres();
 }  // namespace __gnu_cxx
 
-namespace platform::windows {
+namespace platform {
+
+namespace windows {
 
 namespace {
 
@@ -109,7 +111,10 @@ void Free(ThreadData* data) noexcept {
 
 }  // namespace
 
+}  // namespace windows
+
 void ForgetThread() noexcept {
+  using namespace windows;
   const std::lock_guard lock(g_lock);
   if (g_index == TLS_OUT_OF_INDEXES) return;
   auto* const data = static_cast<ThreadData*>(TlsGetValue(g_index));
@@ -123,6 +128,7 @@ void ForgetThread() noexcept {
 }
 
 void ForgetAllThreads() noexcept {
+  using namespace windows;
   __gnu_cxx::__freeres();
   const std::lock_guard lock(g_lock);
   while (ThreadData* const data = g_threads) {
@@ -133,7 +139,7 @@ void ForgetAllThreads() noexcept {
   g_index = TLS_OUT_OF_INDEXES;
 }
 
-}  // namespace platform::windows
+}  // namespace platform
 
 void* __emutls_get_address(EmulatedVariable* variable) {
   using namespace platform::windows;
