@@ -12,9 +12,10 @@
 #include <cstdlib>
 #include <memory>
 
+#include "platform/console.h"
 #include "platform/text.h"
 
-namespace platform::windows {
+namespace platform {
 
 namespace {
 
@@ -36,9 +37,20 @@ BOOL WINAPI OnControl(DWORD) {
 
 void OnAbort(int) { PutCodePageBack(); }
 
+// Lives until the process ends: the system calls the handler on a thread of its own.
+HANDLE g_wake = nullptr;
+std::atomic<bool> g_interrupted = false;
+
+// Called before the other, which is older. A console that closes ends the process when it returns.
+BOOL WINAPI OnInterrupt(DWORD event) {
+  Interrupt();
+  if (event != CTRL_C_EVENT && event != CTRL_BREAK_EVENT) PutCodePageBack();
+  return TRUE;
+}
+
 }  // namespace
 
-std::vector<std::string> Arguments() {
+std::vector<std::string> windows::Arguments() {
   int count = 0;
   const std::unique_ptr<LPWSTR[], FreeLocal> words(CommandLineToArgvW(GetCommandLineW(), &count));
   std::vector<std::string> arguments;
@@ -50,7 +62,7 @@ std::vector<std::string> Arguments() {
   return arguments;
 }
 
-void PassOutputThrough() noexcept {
+void PrepareConsole() noexcept {
   const UINT before = GetConsoleOutputCP();
   if (before != 0 && SetConsoleOutputCP(CP_UTF8)) {
     g_codePage = before;
@@ -62,4 +74,36 @@ void PassOutputThrough() noexcept {
   _setmode(_fileno(stderr), _O_BINARY);
 }
 
-}  // namespace platform::windows
+std::size_t OutputColumns() noexcept {
+  CONSOLE_SCREEN_BUFFER_INFO info{};
+  if (!GetConsoleScreenBufferInfo(GetStdHandle(STD_OUTPUT_HANDLE), &info)) return 0;
+  // A line that fills the last column is followed by an empty one.
+  const int columns = info.srWindow.Right - info.srWindow.Left;
+  return columns > 0 ? static_cast<std::size_t>(columns) : 80;
+}
+
+bool OutputIsClosedPipe() noexcept {
+  return GetFileType(GetStdHandle(STD_OUTPUT_HANDLE)) == FILE_TYPE_PIPE;
+}
+
+void CatchInterrupts() noexcept {
+  g_wake = CreateEventW(nullptr, TRUE, FALSE, nullptr);
+  SetConsoleCtrlHandler(OnInterrupt, TRUE);
+}
+
+void Interrupt() noexcept {
+  g_interrupted = true;
+  if (g_wake) SetEvent(g_wake);
+}
+
+bool Interrupted() noexcept { return g_interrupted; }
+
+void WaitForInterrupt(std::optional<std::uint32_t> milliseconds) noexcept {
+  if (g_wake) {
+    WaitForSingleObject(g_wake, milliseconds.value_or(INFINITE));
+  } else {
+    Sleep(milliseconds.value_or(INFINITE));
+  }
+}
+
+}  // namespace platform

@@ -14,6 +14,7 @@
 #include "platform/text.h"
 #include "tests/support/golden.h"
 #include "tests/support/program.h"
+#include "tests/tools/json_schema.h"
 #include "tools/zkusb/run.h"
 
 namespace zkusb {
@@ -22,7 +23,29 @@ using Json = nlohmann::ordered_json;
 using Args = std::vector<std::string>;
 using testing_support::Golden;
 
-inline ProgramResult RunClient(const Args& args) { return RunProgram(ZKUSB_PROGRAM, args); }
+inline std::vector<std::string> Lines(const std::string& text) {
+  std::vector<std::string> lines;
+  std::istringstream stream(text);
+  for (std::string line; std::getline(stream, line);) lines.push_back(line);
+  return lines;
+}
+
+// All JSON that any test makes is held against the schema: that of watch line by line.
+inline void CheckJson(const std::string& text, bool byLine) {
+  for (const std::string& part : byLine ? Lines(text) : std::vector{text}) {
+    const Json json = Json::parse(part, nullptr, false);
+    ASSERT_FALSE(json.is_discarded()) << part;
+    EXPECT_EQ(SchemaFault(json), "");
+  }
+}
+
+inline ProgramResult RunClient(const Args& args) {
+  ProgramResult result = RunProgram(ZKUSB_PROGRAM, args);
+  const bool help = std::ranges::count(args, "--help") != 0;
+  const bool json = std::ranges::count(args, "--json") == 1 && result.code != kRefused && !help;
+  if (json) CheckJson(result.out, std::ranges::count(args, "watch") == 1);
+  return result;
+}
 
 inline std::filesystem::path MachinesFolder() { return std::filesystem::path(ZKUSB_SOURCE_DIR) / "machines"; }
 inline std::string MachineFile(const std::string& name) { return (MachinesFolder() / (name + ".json")).string(); }
@@ -50,13 +73,6 @@ inline Json JsonOutput(Args args) {
   const Json json = Json::parse(Output(args), nullptr, false);
   EXPECT_FALSE(json.is_discarded());
   return json;
-}
-
-inline std::vector<std::string> Lines(const std::string& text) {
-  std::vector<std::string> lines;
-  std::istringstream stream(text);
-  for (std::string line; std::getline(stream, line);) lines.push_back(line);
-  return lines;
 }
 
 inline Json LoadJson(const std::filesystem::path& path) {

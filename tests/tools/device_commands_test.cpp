@@ -5,8 +5,9 @@ namespace {
 
 using testing::HasSubstr;
 
-TEST(DeviceCommands, PrintWhatTheTranscriptShows) {
-  const std::vector<std::string> lines = Lines(Golden("client-transcript"));
+// Runs each command of a transcript and compares what it prints; its lines end where `ends` stands. Returns how many
+// commands there are.
+std::size_t CompareTranscript(const std::vector<std::string>& lines, const std::string& ends) {
   std::size_t cases = 0;
   for (auto line = lines.begin(); line != lines.end();) {
     const std::string command = *line++;
@@ -16,14 +17,29 @@ TEST(DeviceCommands, PrintWhatTheTranscriptShows) {
     for (std::string word; words >> word;)
       args.push_back(word.starts_with("machines/") ? ZKUSB_SOURCE_DIR "/" + word : word);
     std::string expected;
-    for (; line != lines.end() && line->find_first_of("$#") != 0; ++line) expected += *line + "\n";
+    for (; line != lines.end() && !line->empty() && line->find_first_of(ends) != 0; ++line) expected += *line + "\n";
     ++cases;
 #ifdef _WIN32  // where scripts play in real time, which is never the same
     if (command.find("--script") != command.npos) continue;
 #endif
     EXPECT_EQ(Output(args), expected) << command;
   }
-  EXPECT_EQ(cases, 8u);
+  return cases;
+}
+
+TEST(DeviceCommands, PrintWhatTheTranscriptShows) {
+  EXPECT_EQ(CompareTranscript(Lines(Golden("client-transcript")), "$#"), 10u);
+}
+
+TEST(DeviceCommands, PrintWhatTheReadmeShows) {
+  std::ifstream readme(ZKUSB_SOURCE_DIR "/README.md");
+  std::vector<std::string> lines;
+  bool client = false;
+  for (std::string line; std::getline(readme, line);) {
+    if (line.starts_with("## ")) client = line == "## The client";
+    if (client) lines.push_back(line.starts_with("    ") ? line.substr(4) : "");
+  }
+  EXPECT_EQ(CompareTranscript(lines, "$"), 4u);
 }
 
 TEST(VolumesCommand, ShowsVolumesThatAreNotMounted) {
@@ -37,29 +53,69 @@ TEST(VolumesCommand, ShowsVolumesThatAreNotMounted) {
 TEST(DeviceCommands, JsonHoldsTheSameFacts) {
   for (const Args& args : {Args{"find", "--vendor", "781"}, Args{"volumes"}}) {
     const Json json = JsonOutput(args);
-    ASSERT_EQ(json.size(), 1u);
-    const Json& device = json[0];
+    EXPECT_EQ(json.at("command"), args[0]);
+    ASSERT_EQ(json.at("devices").size(), 1u);
+    const Json& device = json["devices"][0];
     const Json facts =
         Json::parse(R"({"Type": "KUDTPortDevice", "InstanceId": "USB\\VID_0781&PID_5580\\AA010603160707470215",
-        "VendorId": 1921, "ProductId": 21888, "VendorName": "SanDisk Corporation", "SerialNumber": "AA010603160707470215",
-        "Service": "USBSTOR", "Controller": 1, "Ports": [3], "MountPoints": ["D:\\"]})");
+        "VendorId": 1921, "ProductId": 21888, "vendorName": "SanDisk Corporation", "SerialNumber": "AA010603160707470215",
+        "Service": "USBSTOR", "portPath": "1-3", "speed": "full", "driveLetters": ["D:"], "mountPoints": ["D:\\"]})");
     for (const auto& [name, value] : facts.items()) EXPECT_EQ(device.at(name), value) << name;
-    const Json& disk = device.at("Disks").at(0);
-    EXPECT_EQ(disk.at("Name"), "SanDisk Extreme USB Device");
-    const Json& volume = disk.at("Volumes").at(0);
+    const Json& disk = device.at("disks").at(0);
+    EXPECT_EQ(disk.at("name"), "SanDisk Extreme USB Device");
+    const Json& volume = disk.at("volumes").at(0);
     EXPECT_EQ(volume.at("VolumeName"), "\\\\?\\Volume{3869c27a-31b8-11e8-9b12-ecf4bb487fed}\\");
     EXPECT_EQ(volume.at("ProductId"), "Extreme         ");  // with its blanks
-    EXPECT_EQ(volume.at("MountPoints"), device.at("MountPoints"));
+    EXPECT_EQ(volume.at("MountPoints"), device.at("mountPoints"));
   }
 
-  const Json reader = JsonOutput({"volumes", "--machine", MachineFile("hp-cardreader")}).at(0);
+  const Json reader = JsonOutput({"volumes", "--machine", MachineFile("hp-cardreader")}).at("devices").at(0);
   Json letters = Json::array();
-  for (const Json& disk : reader.at("Disks")) {
-    EXPECT_EQ(disk.at("Volumes").size(), 0u);
-    letters.insert(letters.end(), disk.at("MountPoints").begin(), disk.at("MountPoints").end());
+  for (const Json& disk : reader.at("disks")) {
+    EXPECT_EQ(disk.at("volumes").size(), 0u);
+    letters.insert(letters.end(), disk.at("mountPoints").begin(), disk.at("mountPoints").end());
   }
   EXPECT_EQ(letters, Json::array({"F:\\", "G:\\", "H:\\", "I:\\"}));
-  EXPECT_EQ(reader.at("MountPoints"), letters);
+  EXPECT_EQ(reader.at("mountPoints"), letters);
+}
+
+TEST(FindCommand, FindsByWhatAPersonKnows) {
+  const std::string stick = "0781:5580", module = "413C:8197", camera = "0C45:643F";
+  const TemporaryFile folder(ChangedMachine([](Json& machine) {
+    for (Json& volume : machine["volumes"]) {
+      if (volume.value("paths", Json::array()) == Json::array({"D:\\"})) volume["paths"].push_back("C:\\Sticks\\One\\");
+    }
+  }));
+  const std::tuple<Args, std::vector<std::string>> cases[] = {
+      {{"D:"}, {stick}},
+      {{"d:\\"}, {stick}},
+      {{"find", "D:", "--vendor", "781"}, {stick}},
+      {{"find", "D:", "--vendor", "782"}, {}},
+      {{"find", "sandisk"}, {stick}},             // by the name of the vendor
+      {{"find", "SANDISK", "extreme"}, {stick}},  // by the name of the disk
+      {{"find", "sandisk", "dell"}, {}},
+      {{"find", "aa0106"}, {stick}},  // by its serial number
+      {{"find", "2-1.4"}, {module}},
+      {{"find", "2-1"}, {}},  // a hub
+      {{"find", "0c45:643f"}, {camera}},
+      {{"find", "0c45"}, {}},
+      {{"find", "c:\\sticks\\one"}, {stick}},
+      {{"find", "C:\\Sticks\\One\\"}, {stick}},
+      {{"find", "C:\\Sticks"}, {}},
+      {{"find", "e"}, {camera, module, stick}},
+      {{"find", "--product", "8197"}, {module}},
+  };
+  for (const auto& [args, ids] : cases) {
+    SCOPED_TRACE(testing::PrintToString(args));
+    Args all = args;
+    all.insert(all.end(), {"--json", "--machine", folder.Path()});
+    const ProgramResult result = RunClient(all);
+    EXPECT_EQ(result.code, ids.empty() ? kNothingFound : kDone);
+    std::vector<std::string> found;
+    const Json json = Json::parse(result.out, nullptr, false);
+    for (const Json& device : json.at("devices")) found.push_back(IdOf(device));
+    EXPECT_THAT(found, testing::UnorderedElementsAreArray(ids));
+  }
 }
 
 }  // namespace

@@ -55,6 +55,7 @@ TEST(DumpCommand, DumpsEveryMachineByteForByte) {
     const std::string expected = Golden(entry.path().stem().string());
     const std::string dump = Output({"--machine", entry.path().string(), "dump"});
     const auto differs = std::ranges::mismatch(dump, expected).in1;
+    EXPECT_EQ(JsonOutput({"--machine", entry.path().string(), "dump"}).at("ToString"), expected);
     EXPECT_TRUE(dump == expected) << entry.path() << ", from byte " << differs - dump.begin() << ": "
                                   << std::string(differs, dump.end()).substr(0, 80);
     ++compared;
@@ -62,7 +63,7 @@ TEST(DumpCommand, DumpsEveryMachineByteForByte) {
   EXPECT_EQ(compared, 4u);
 }
 
-TEST(TreeCommand, NamesEveryDeviceOnceWithinEightyColumns) {
+TEST(TreeCommand, NamesEveryDeviceOnceWithinItsColumns) {
   for (const std::string machine : {"asus-b560", "dell-precision", "hp-cardreader", "vmware-win7"}) {
     SCOPED_TRACE(machine);
     const std::string file = MachineFile(machine);
@@ -70,11 +71,15 @@ TEST(TreeCommand, NamesEveryDeviceOnceWithinEightyColumns) {
     EXPECT_GE(plugged.size(), 2u);
 
     const std::string text = Output({"tree", "--machine", file});
-    EXPECT_LE(WidestLine(text), 80);
+    EXPECT_EQ(text.find("…"), text.npos);
+    EXPECT_EQ(Output({"tree", "--width", "0", "--machine", file}), text);
+    for (const std::ptrdiff_t columns : {1, 50, 80}) {
+      EXPECT_LE(WidestLine(Output({"tree", "--width", std::to_string(columns), "--machine", file})), columns);
+    }
     EXPECT_EQ(DevicesOfText(text), plugged);
 
     std::multiset<std::string> ids;
-    CollectDevices(JsonOutput({"tree", "--machine", file}), ids);
+    CollectDevices(JsonOutput({"tree", "--machine", file}).at("RootNode"), ids);
     EXPECT_EQ(ids, plugged);
   }
   // Internal disks are left out, but not what events may name.
@@ -100,7 +105,7 @@ TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
       }
     }
   }));
-  const std::string text = Output({"tree", "--machine", file.Path()});
+  const std::string text = Output({"tree", "--width", "80", "--machine", file.Path()});
   // The name is shortened, not the mount points.
   EXPECT_THAT(text, HasSubstr("├─ Port 3: full speed  0781:5580 SanDisk Corpora…  [D:, C:\\All sticks\\One]\n"));
   EXPECT_THAT(text, HasSubstr("├─ Port 5: low speed  0000:0000 unknown device\n"));
@@ -109,7 +114,7 @@ TEST(TreeCommand, ShowsWhatGoesWrongOnAPort) {
 
   const std::string found = Output({"find", "--vendor", "781", "--machine", file.Path()});
   EXPECT_THAT(found, HasSubstr("SanDisk Corporation, \\x1B[2J Stick \\u202E  D:, C:\\All"));
-  EXPECT_EQ(JsonOutput({"find", "--vendor", "781", "--machine", file.Path()})[0].at("Description"),
+  EXPECT_EQ(JsonOutput({"find", "--vendor", "781", "--machine", file.Path()})["devices"][0].at("Description"),
             "\u001b[2J   Stick \u202e ");
   EXPECT_THAT(Output({"dump", "--machine", file.Path()}), HasSubstr("deviceDescr : \u001b[2J   Stick \u202e \r\n"));
 }
@@ -130,7 +135,7 @@ std::string HubChain(std::size_t length) {
 
 TEST(TreeCommand, CopesWithMoreHubsThanFitTheWindow) {
   const TemporaryFile deep(HubChain(60));
-  const std::string text = Output({"tree", "--machine", deep.Path()});
+  const std::string text = Output({"tree", "--width", "80", "--machine", deep.Path()});
   EXPECT_THAT(text, HasSubstr("Port 1: hub 1234:5678 "));
   EXPECT_EQ(WidestLine(text), 80);
   EXPECT_GE(Lines(text).size(), 60u);

@@ -29,7 +29,7 @@ TEST(Writer, EscapesWhatATerminalWouldObey) {
     EXPECT_EQ(Written([shown = text](Writer& out) { out.Line(shown); }), line);
   }
   const nlohmann::ordered_json json = {{"a", "\x1B\x7F\xC2\x9B\xE2\x80\xAE\n"}};
-  const std::string written = Written([&](Writer& out) { out.Json(json, false); });
+  const std::string written = Written([&](Writer& out) { out.JsonLine(json); });
   EXPECT_EQ(written, "{\"a\":\"\\u001b\\u007f\\u009b\\u202e\\n\"}\n");
   EXPECT_EQ(nlohmann::ordered_json::parse(written), json);
   EXPECT_EQ(Written([](Writer& out) { out.Verbatim(u"\x1B\r\n"); }), "\x1B\r\n");
@@ -53,7 +53,8 @@ TEST(Writer, FitsALineIntoItsColumns) {
       {u"", times(20, u'\x1B'), u"", ""},
   };
   for (const auto& [head, middle, tail, line] : cases) {
-    const std::string written = Written([&, h = head, m = middle, t = tail](Writer& out) { out.FittedLine(h, m, t); });
+    const std::string written =
+        Written([&, h = head, m = middle, t = tail](Writer& out) { out.SetColumns(80), out.FittedLine(h, m, t); });
     EXPECT_TRUE(line.empty() ? written.find("…") == written.npos : written == line) << written;
   }
   EXPECT_EQ(Tidied(u"  USB   SanDisk 3.2Gen1  "), u"USB SanDisk 3.2Gen1");

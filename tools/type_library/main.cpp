@@ -4,12 +4,13 @@
 #include <stdexcept>
 
 #include "platform/com.h"
+#include "platform/console.h"
 #include "platform/text.h"
 #include "platform/windows/console.h"
 #include "tools/type_library/type_library_dump.h"
 
 int main() {
-  platform::windows::PassOutputThrough();
+  platform::PrepareConsole();
   const std::vector<std::string> arguments = platform::windows::Arguments();
   if (arguments.size() != 1 || arguments[0].starts_with("-")) {
     std::cerr << "usage: zkusb_typelib FILE\n";

@@ -1,6 +1,7 @@
 // What the person at the keyboard asks for.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <stdexcept>
@@ -9,16 +10,19 @@
 
 namespace zkusb {
 
-enum class Command { kTree, kDump, kFind, kVolumes, kWatch, kRegister, kUnregister };
+enum class Command { kTree, kDump, kFind, kVolumes, kPage, kWatch, kRegister, kUnregister };
 
 struct Options {
   Command command = Command::kTree;
   std::string machineFile;  // empty: this PC or the built-in machine
   std::string scriptFile;   // empty: none
   bool json = false;
-  std::uint32_t watchMilliseconds = 0;  // of watch: how long behind the script's end
-  std::uint16_t vendor = 0;             // of find
+  std::optional<std::size_t> columns;              // of --width; 0 is without limit
+  std::optional<std::uint32_t> watchMilliseconds;  // of watch: how long behind the script's end
+  std::vector<std::string> terms;  // of find, with vendor and product: all must hold
+  std::optional<std::uint16_t> vendor;
   std::optional<std::uint16_t> product;
+  std::string file;  // of page
 };
 
 // One line for people, in UTF-8, which points to --help.
@@ -29,10 +33,13 @@ class UsageError : public std::runtime_error {
 
 struct CommandLine {
   std::optional<Options> options;
-  std::string information;  // the help or version text that was asked for instead
+  std::string information;  // the help, version, completion or manual that was asked for instead
 };
 
 // Options may stand before and after the command. Throws UsageError.
 CommandLine ParseCommandLine(const std::vector<std::string>& args);
+
+// Whether it stands for a drive: "E:" or "E:\", in either case.
+bool IsDriveLetter(const std::string& text);
 
 }  // namespace zkusb

@@ -24,7 +24,20 @@ ComPtr<Interface> CreateObject(const CLSID& clsid, const char* name) {
   return object;
 }
 
+ComPtr<IZKUMUsbTreeNode> RootNode(IZKUMUsbTree& tree) {
+  ComPtr<IZKUMUsbTreeNode> root;
+  const HRESULT result = tree.get_RootNode(root.Put());
+  if (result != E_POINTER) Check(result, "RootNode");
+  return root;
+}
+
+ComPtr<IZKUMUsbTree> CreateTree() {
+  return CreateObject<IZKUMUsbTree>(CLSID_ZKUMUsbTree, "creating ZKUMUsbTree");
+}
+
 }  // namespace
+
+ComPtr<IZKUMUsbTreeNode> CurrentRoot() { return RootNode(*CreateTree().Get()); }
 
 ComponentError::ComponentError(const std::string& call, HRESULT code)
     : std::runtime_error(call + " failed with " + CodeText(code)) {}
@@ -40,7 +53,7 @@ Apartment::Apartment() {
 Component::Component(EventSink::Handler handler) {
   m_notifier =
       CreateObject<IZKUMEventNotifier>(CLSID_ZKUMEventNotifier, "creating ZKUMEventNotifier");
-  m_tree = CreateObject<IZKUMUsbTree>(CLSID_ZKUMUsbTree, "creating ZKUMUsbTree");
+  m_tree = CreateTree();
   const auto container = m_notifier.As<IConnectionPointContainer>();
   if (!container) throw ComponentError("asking for the connection points", E_NOINTERFACE);
   Check(container->FindConnectionPoint(DIID_IZKDeviceEventCallBack, m_point.Put()),
@@ -55,22 +68,22 @@ Component::Component(EventSink::Handler handler) {
 
 Component::~Component() { m_point->Unadvise(m_cookie); }
 
-ComPtr<IZKUMUsbTreeNode> Component::RootNode() const {
-  ComPtr<IZKUMUsbTreeNode> root;
-  const HRESULT result = m_tree->get_RootNode(root.Put());
-  if (result != E_POINTER) Check(result, "RootNode");
-  return root;
-}
-
 std::optional<NodeView> Component::Root() const {
-  const ComPtr<IZKUMUsbTreeNode> root = RootNode();
+  const ComPtr<IZKUMUsbTreeNode> root = RootNode(*m_tree.Get());
   if (!root) return std::nullopt;
   return ReadNode(*root.Get());
 }
 
-std::u16string Component::Dump() const {
-  const ComPtr<IZKUMUsbTreeNode> root = RootNode();
-  return root ? ReadDump(*root.Get()) : std::u16string();
+std::optional<NodeView> Component::Top() const {
+  const ComPtr<IZKUMUsbTreeNode> root = RootNode(*m_tree.Get());
+  if (!root) return std::nullopt;
+  return ReadTop(*root.Get(), 2);
+}
+
+void Component::Dump(const std::function<void(std::u16string_view)>& handler) const {
+  const ComPtr<IZKUMUsbTreeNode> root = RootNode(*m_tree.Get());
+  if (!root) return handler({});
+  ReadDump(*root.Get(), handler);
 }
 
 }  // namespace zkusb

@@ -1,9 +1,11 @@
 // The component as a client has it: two objects created through COM, and nothing else.
 #pragma once
 
+#include <functional>
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 
 #include "com/com_ptr.h"
 #include "com/zkusb_monitor.h"
@@ -30,6 +32,10 @@ class Apartment {
   Apartment& operator=(const Apartment&) = delete;
 };
 
+// The root of the tree as it is now; nothing as long as no build has found anything. By any thread
+// in the multithreaded apartment, inside calls of a sink too.
+KelvoUHW::ComPtr<IZKUMUsbTreeNode> CurrentRoot();
+
 // Makes both objects and advises a sink: from then on the tree is there and `handler` is called,
 // first for every connected device before the constructor returns, then for what comes and goes, on
 // threads of the component. One thread; throws ComponentError.
@@ -42,12 +48,12 @@ class Component {
 
   // Nothing as long as no build has found anything.
   std::optional<NodeView> Root() const;
-  // The component's own text for the root; empty when there is none.
-  std::u16string Dump() const;
+  // The same without what lies below the hubs of the controllers.
+  std::optional<NodeView> Top() const;
+  // Calls with the component's own text for the root; with an empty one when there is none.
+  void Dump(const std::function<void(std::u16string_view)>& handler) const;
 
  private:
-  KelvoUHW::ComPtr<IZKUMUsbTreeNode> RootNode() const;
-
   Apartment m_apartment;
   KelvoUHW::ComPtr<IZKUMEventNotifier> m_notifier;
   KelvoUHW::ComPtr<IZKUMUsbTree> m_tree;

@@ -10,16 +10,15 @@ namespace zkusb {
 
 namespace {
 
-void CollectDevices(const NodeView& node, std::size_t controller, std::vector<std::int32_t>& ports,
-                    std::vector<PlacedDevice>& found) {
+void CollectDevices(const NodeView& node, Place& place, std::vector<PlacedDevice>& found) {
   if (node.Type == KUDTPortDevice) {
-    found.push_back({&node, controller, ports});
+    found.push_back({&node, place});
     return;
   }
   const bool isPort = node.Type == KUDTHubPort;
-  if (isPort) ports.push_back(node.PortIndex);
-  for (const NodeView& child : node.Childs) CollectDevices(child, controller, ports, found);
-  if (isPort) ports.pop_back();
+  if (isPort) place.ports.push_back(node.PortIndex);
+  for (const NodeView& child : node.Childs) CollectDevices(child, place, found);
+  if (isPort) place.ports.pop_back();
 }
 
 constexpr std::size_t kNoDisk = static_cast<std::size_t>(-1);
@@ -85,11 +84,28 @@ class DiskCollector {
 
 }  // namespace
 
+std::u16string PortPath(const Place& place) {
+  std::u16string path;
+  if (place.controller == 0) return path;
+  path = platform::Decimal(static_cast<std::int32_t>(place.controller));
+  char16_t before = u'-';
+  for (const std::int32_t port : place.ports) {
+    // What the device manager's storage controllers have instead of ports.
+    if (port == 0) continue;
+    path += before;
+    path += platform::Decimal(port);
+    before = u'.';
+  }
+  return path;
+}
+
 std::vector<PlacedDevice> PortDevices(const NodeView& root) {
   std::vector<PlacedDevice> found;
-  std::vector<std::int32_t> ports;
-  std::size_t controller = 0;
-  for (const NodeView& child : root.Childs) CollectDevices(child, ++controller, ports, found);
+  Place place;
+  for (const NodeView& child : root.Childs) {
+    ++place.controller;
+    CollectDevices(child, place, found);
+  }
   return found;
 }
 
@@ -124,6 +140,14 @@ std::vector<std::u16string> MountPointsOf(const NodeView& device) {
     }
   }
   return all;
+}
+
+std::vector<std::u16string> DriveLetters(const std::vector<std::u16string>& mountPoints) {
+  std::vector<std::u16string> letters;
+  for (const std::u16string& text : mountPoints) {
+    if (text.size() == 3 && text.ends_with(u":\\")) letters.push_back(text.substr(0, 2));
+  }
+  return letters;
 }
 
 }  // namespace zkusb

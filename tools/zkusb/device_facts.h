@@ -10,11 +10,22 @@
 
 namespace zkusb {
 
+// The way to a node.
+struct Place {
+  std::size_t controller = 0;       // 1 is the first child of the root; 0 is no controller's
+  std::vector<std::int32_t> ports;  // from the root hub on
+};
+
+// The number of the controller among the children of the root, a hyphen, and the ports from the
+// root hub on with dots between them: "2-1.4". A port and what is plugged into it have the same
+// path. Where there is no port it is the controller's number alone: for a root hub, and for what a
+// storage controller of the device manager has below it, whose ports have the number 0.
+std::u16string PortPath(const Place& place);
+
 // A port device and the way to it. The node belongs to the tree that was searched.
 struct PlacedDevice {
   const NodeView* device;
-  std::size_t controller;           // 1 is the first
-  std::vector<std::int32_t> ports;  // from the root hub on
+  Place place;
 };
 
 // All port devices below a root, in the order of the tree.
@@ -42,5 +53,7 @@ bool CarriesStorage(const NodeView& device);
 
 // All mount points below a device.
 std::vector<std::u16string> MountPointsOf(const NodeView& device);
+// Those that are roots of drives, as "D:".
+std::vector<std::u16string> DriveLetters(const std::vector<std::u16string>& mountPoints);
 
 }  // namespace zkusb

@@ -43,14 +43,10 @@ std::u16string SerialText(const NodeView& device) {
   return madeUp ? std::u16string() : Tidied(device.SerialNumber);
 }
 
-std::u16string PlaceText(const PlacedDevice& placed) {
-  std::u16string text =
-      u"controller " + platform::Decimal(static_cast<std::int32_t>(placed.controller));
-  for (const std::int32_t port : placed.ports) {
-    // Port 0 is what the device manager's storage controllers have instead of ports.
-    if (port != 0) text += u", port " + platform::Decimal(static_cast<std::int32_t>(port));
-  }
-  return text;
+std::u16string PlaceText(const Place& place) {
+  const std::u16string path = PortPath(place);
+  const bool hasPort = path.find(u'-') != std::u16string::npos;
+  return (hasPort ? u"port " : u"controller ") + path;
 }
 
 std::u16string MountPointsText(const std::vector<std::u16string>& mountPoints) {

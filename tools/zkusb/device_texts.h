@@ -15,7 +15,7 @@ std::u16string VendorText(const NodeView& node);  // by vendor id, or as the dev
 std::u16string ProductText(const NodeView& device);
 std::u16string NamesText(const NodeView& device);   // vendor, product
 std::u16string SerialText(const NodeView& device);  // the device's own, not one Windows made up
-std::u16string PlaceText(const PlacedDevice& placed);
+std::u16string PlaceText(const Place& place);       // "port 2-1.4"
 // "D:" for D:\, commas between several.
 std::u16string MountPointsText(const std::vector<std::u16string>& mountPoints);
 

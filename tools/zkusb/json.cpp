@@ -3,6 +3,7 @@
 #include <array>
 
 #include "platform/text.h"
+#include "platform/usb_ioctl.h"
 #include "records/usb_names.h"
 
 namespace zkusb {
@@ -14,12 +15,6 @@ constexpr std::array<const char*, 8> kTypeNames{
     "KUDTHubPort", "KUDTPortDevice", "KUDTInfoDevice",     "KUDTInterfaceDevice"};
 constexpr std::array<const char*, 4> kEventNames{"KDeviceConnected", "KDeviceAttached",
                                                  "KDeviceRemoved", "KDeviceModified"};
-
-Json TextsJson(const std::vector<std::u16string>& texts) {
-  Json list = Json::array();
-  for (const std::u16string& text : texts) list.push_back(TextJson(text));
-  return list;
-}
 
 void AddInfo(const InfoView& info, Json& object) {
   object["Service"] = TextJson(info.Service);
@@ -41,6 +36,7 @@ void AddStorage(const StorageView& storage, Json& object) {
   object["ProductRev"] = TextJson(storage.ProductRev);
   object["DevicePath"] = TextJson(storage.DevicePath);
   object["MountPoints"] = TextsJson(storage.MountPoints);
+  object["driveLetters"] = TextsJson(DriveLetters(storage.MountPoints));
 }
 
 void AddVendorName(const NodeView& node, Json& object) {
@@ -48,7 +44,20 @@ void AddVendorName(const NodeView& node, Json& object) {
   if (node.VendorId >= 0 && node.VendorId <= 0xFFFF) {
     name = KelvoUHW::VendorName(static_cast<std::uint16_t>(node.VendorId)).value_or(u"");
   }
-  object["VendorName"] = TextJson(name);
+  object["vendorName"] = TextJson(name);
+}
+
+std::string SpeedName(std::uint32_t speed) {
+  switch (speed) {
+    case platform::UsbLowSpeed:
+      return "low";
+    case platform::UsbFullSpeed:
+      return "full";
+    case platform::UsbHighSpeed:
+      return "high";
+    default:
+      return "unknown (" + std::to_string(speed) + ")";
+  }
 }
 
 void AddProperties(const NodeView& node, Json& object) {
@@ -76,7 +85,7 @@ void AddProperties(const NodeView& node, Json& object) {
     case KUDTPortDevice:
       AddVendorName(node, object);
       object["Manufacturer1"] = TextJson(node.Manufacturer1);
-      object["Speed"] = node.Speed;
+      object["speed"] = SpeedName(node.Speed);
       object["NumberInterfaces"] = node.NumberInterfaces;
       break;
     default:
@@ -93,41 +102,40 @@ Json DiskJson(const Disk& disk) {
     AddStorage(*volume, object);
   }
   return {{"InstanceId", TextJson(disk.id)},
-          {"Name", TextJson(disk.name)},
-          {"MountPoints", TextsJson(disk.mountPoints)},
-          {"Volumes", std::move(volumes)}};
+          {"name", TextJson(disk.name)},
+          {"mountPoints", TextsJson(disk.mountPoints)},
+          {"driveLetters", TextsJson(DriveLetters(disk.mountPoints))},
+          {"volumes", std::move(volumes)}};
 }
 
-void AddDevice(const NodeView& device, Json& object) {
-  AddProperties(device, object);
-  object["MountPoints"] = TextsJson(MountPointsOf(device));
-  Json& disks = object["Disks"] = Json::array();
+void AddDisks(const NodeView& device, Json& object) {
+  const std::vector<std::u16string> mountPoints = MountPointsOf(device);
+  object["driveLetters"] = TextsJson(DriveLetters(mountPoints));
+  object["mountPoints"] = TextsJson(mountPoints);
+  Json& disks = object["disks"] = Json::array();
   for (const Disk& disk : DisksOf(device)) disks.push_back(DiskJson(disk));
 }
 
 }  // namespace
 
-Json TreeJson(const NodeView& node) {
+Json NodeJson(const NodeView& node, const Place& place) {
   Json object = Json::object();
+  if (node.Type == KUDTHostController) object["controller"] = place.controller;
+  if (node.Type == KUDTHub || node.Type == KUDTHubPort || node.Type == KUDTPortDevice) {
+    object["portPath"] = TextJson(PortPath(place));
+  }
   AddProperties(node, object);
-  Json& children = object["Childs"] = Json::array();
-  for (const NodeView& child : node.Childs) children.push_back(TreeJson(child));
-  return object;
-}
-
-Json DeviceJson(const NodeView& device) {
-  Json object = Json::object();
-  AddDevice(device, object);
-  return object;
-}
-
-Json PlacedDeviceJson(const PlacedDevice& placed) {
-  Json object = {{"Controller", placed.controller}, {"Ports", placed.ports}};
-  AddDevice(*placed.device, object);
+  if (node.Type == KUDTPortDevice) AddDisks(node, object);
   return object;
 }
 
 Json TextJson(std::u16string_view text) { return platform::ToUtf8(text); }
+
+Json TextsJson(const std::vector<std::u16string>& texts) {
+  Json list = Json::array();
+  for (const std::u16string& text : texts) list.push_back(TextJson(text));
+  return list;
+}
 
 const char* EventName(TDeviceEventType kind) noexcept {
   return kEventNames[static_cast<std::size_t>(kind)];

@@ -1,5 +1,6 @@
-// The same facts for programs, under the names that the interfaces publish. Texts are as the
-// component has them, blanks included.
+// Devices as programs read them (docs/json.md). A name with a capital letter is a property of the
+// interfaces, its text as the component has it, blanks included; one without is worked out here. No
+// object has two names that differ in case alone, which some readers of JSON do not take.
 #pragma once
 
 #include <nlohmann/json.hpp>
@@ -11,14 +12,15 @@ namespace zkusb {
 
 using Json = nlohmann::ordered_json;
 
-// A node with everything below it, in "Childs".
-Json TreeJson(const NodeView& node);
-// A port device without the nodes below it; instead "MountPoints" and "Disks" sum up what they say.
-Json DeviceJson(const NodeView& device);
-// The same with "Controller" and "Ports" in front.
-Json PlacedDeviceJson(const PlacedDevice& placed);
+// The version of the documents' shape. It rises when something that a program may rely on changes
+// its meaning or goes; what is added keeps it.
+inline constexpr int kJsonSchema = 1;
+
+// A node without those below it.
+Json NodeJson(const NodeView& node, const Place& place);
 
 Json TextJson(std::u16string_view text);
+Json TextsJson(const std::vector<std::u16string>& texts);
 // "KDeviceAttached" and the like.
 const char* EventName(TDeviceEventType kind) noexcept;
 

@@ -5,6 +5,7 @@
 #include "com/com_ptr.h"
 #include "platform/text.h"
 #include "tools/zkusb/component.h"
+#include "tools/zkusb/device_facts.h"
 
 namespace zkusb {
 
@@ -23,7 +24,7 @@ class OwnedBstr {
   OwnedBstr& operator=(const OwnedBstr&) = delete;
   ~OwnedBstr() { SysFreeString(m_text); }
   BSTR* Put() noexcept { return &m_text; }
-  std::u16string Text() const { return std::u16string(platform::BstrText(m_text)); }
+  std::u16string_view View() const { return platform::BstrText(m_text); }
 
  private:
   BSTR m_text = nullptr;
@@ -33,7 +34,7 @@ template <class Interface>
 std::u16string Text(Interface& object, HRESULT (STDMETHODCALLTYPE Interface::*property)(BSTR*)) {
   OwnedBstr text;
   Check((object.*property)(text.Put()), "reading a text");
-  return text.Text();
+  return std::u16string(text.View());
 }
 
 template <class Number, class Interface>
@@ -122,11 +123,24 @@ void ReadOwnProperties(IZKUMUsbTreeNode& node, NodeView& view) {
   }
 }
 
-NodeView ReadLevel(IZKUMUsbTreeNode& node, int level) {
-  if (level > kMostLevels) {
-    throw std::runtime_error("the topology has more than " + std::to_string(kMostLevels) +
-                             " levels");
+void CheckLevel(int level) {
+  if (level <= kMostLevels) return;
+  throw std::runtime_error("the topology has more than " + std::to_string(kMostLevels) + " levels");
+}
+
+void ForEachChild(IZKUMUsbTreeNode& node, const std::function<void(IZKUMUsbTreeNode&)>& visit) {
+  ComPtr<IZKUMUsbTreeNodeEnumerator> childs;
+  Check(node.get_Childs(childs.Put()), "Childs");
+  VARIANT_BOOL more = VARIANT_FALSE;
+  while (SUCCEEDED(childs->MoveNext(&more)) && more != VARIANT_FALSE) {
+    ComPtr<IZKUMUsbTreeNode> child;
+    Check(childs->GetCurrent(child.Put()), "GetCurrent");
+    visit(*child.Get());
   }
+}
+
+NodeView ReadLevel(IZKUMUsbTreeNode& node, int level, int last) {
+  CheckLevel(level);
   NodeView view;
   view.Type = Value(node, &IZKUMUsbTreeNode::get_Type);
   view.InstanceId = Text(node, &IZKUMUsbTreeNode::get_InstanceId);
@@ -139,24 +153,46 @@ NodeView ReadLevel(IZKUMUsbTreeNode& node, int level) {
   view.VendorId = Value(*device.Get(), &IZKUMUsbDevice::get_VendorId);
   view.ProductId = Value(*device.Get(), &IZKUMUsbDevice::get_ProductId);
   ReadOwnProperties(node, view);
-
-  ComPtr<IZKUMUsbTreeNodeEnumerator> childs;
-  Check(node.get_Childs(childs.Put()), "Childs");
-  VARIANT_BOOL more = VARIANT_FALSE;
-  while (SUCCEEDED(childs->MoveNext(&more)) && more != VARIANT_FALSE) {
-    ComPtr<IZKUMUsbTreeNode> child;
-    Check(childs->GetCurrent(child.Put()), "GetCurrent");
-    view.Childs.push_back(ReadLevel(*child.Get(), level + 1));
-  }
+  if (level == last) return view;
+  ForEachChild(node, [&](IZKUMUsbTreeNode& child) {
+    view.Childs.push_back(ReadLevel(child, level + 1, last));
+  });
   return view;
+}
+
+void ReadPlacesBelow(IZKUMUsbTreeNode& node, Place& place, int level, const PlaceHandler& handler) {
+  CheckLevel(level);
+  const TUsbDeviceType type = Value(node, &IZKUMUsbTreeNode::get_Type);
+  if (type == KUDTPortDevice) {
+    handler(Text(node, &IZKUMUsbTreeNode::get_InstanceId), PortPath(place));
+    return;
+  }
+  const bool isPort = type == KUDTHubPort;
+  if (isPort) {
+    place.ports.push_back(Value(*Ask<IZKUMHubPort>(node).Get(), &IZKUMHubPort::get_PortIndex));
+  }
+  ForEachChild(node, [&](IZKUMUsbTreeNode& child) {
+    if (level == 0) ++place.controller;
+    ReadPlacesBelow(child, place, level + 1, handler);
+  });
+  if (isPort) place.ports.pop_back();
 }
 
 }  // namespace
 
-NodeView ReadNode(IZKUMUsbTreeNode& node) { return ReadLevel(node, 0); }
+NodeView ReadNode(IZKUMUsbTreeNode& node) { return ReadLevel(node, 0, -1); }
 
-std::u16string ReadDump(IZKUMUsbTreeNode& node) {
-  return Text(*Ask<IZKUMUsbDevice>(node).Get(), &IZKUMUsbDevice::get_ToString);
+NodeView ReadTop(IZKUMUsbTreeNode& node, int levels) { return ReadLevel(node, 0, levels); }
+
+void ReadPlaces(IZKUMUsbTreeNode& root, const PlaceHandler& handler) {
+  Place place;
+  ReadPlacesBelow(root, place, 0, handler);
+}
+
+void ReadDump(IZKUMUsbTreeNode& node, const std::function<void(std::u16string_view)>& handler) {
+  OwnedBstr text;
+  Check(Ask<IZKUMUsbDevice>(node)->get_ToString(text.Put()), "ToString");
+  handler(text.View());
 }
 
 }  // namespace zkusb

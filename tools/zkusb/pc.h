@@ -42,6 +42,7 @@ class Pc {
   // that sets off has run, as far as it goes without waiting, when this returns; in real time, as
   // far as it comes within half a second.
   void Play(std::size_t step);
+  // In real time, Ctrl-C ends it where platform::CatchInterrupts was called.
   void WaitFor(std::uint32_t milliseconds);
   // Until all that was set off has come to its end.
   void Settle();

@@ -2,7 +2,7 @@
 #include <algorithm>
 
 #include "tools/zkusb/commands.h"
-#include "tools/zkusb/json.h"
+#include "tools/zkusb/json_document.h"
 
 namespace zkusb {
 
@@ -12,19 +12,15 @@ void PrintLines(const std::vector<std::u16string>& lines, std::u16string_view be
   for (const std::u16string& line : lines) out.Line(std::u16string(before).append(line));
 }
 
-Json LinesJson(const std::vector<std::u16string>& lines) {
-  Json list = Json::array();
-  for (const std::u16string& line : lines) list.push_back(TextJson(line));
-  return list;
-}
-
 }  // namespace
 
 void PrintRegistration(Pc& pc, bool json, Writer& out) {
   pc.Register();
   const std::vector<std::u16string> written = pc.RegistryLines();
   if (json) {
-    out.Json({{"written", LinesJson(written)}}, true);
+    JsonDocument document("register", out);
+    document.Members({{"written", TextsJson(written)}});
+    document.Finish();
   } else {
     PrintLines(written, {}, out);
   }
@@ -40,7 +36,9 @@ void PrintUnregistration(Pc& pc, bool json, Writer& out) {
                  return std::find(left.begin(), left.end(), line) == left.end();
                });
   if (json) {
-    out.Json({{"removed", LinesJson(removed)}, {"left", LinesJson(left)}}, true);
+    JsonDocument document("unregister", out);
+    document.Members({{"removed", TextsJson(removed)}, {"left", TextsJson(left)}});
+    document.Finish();
     return;
   }
   PrintLines(removed, u"removed  ", out);

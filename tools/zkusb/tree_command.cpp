@@ -5,7 +5,7 @@
 #include "tools/zkusb/commands.h"
 #include "tools/zkusb/device_facts.h"
 #include "tools/zkusb/device_texts.h"
-#include "tools/zkusb/json.h"
+#include "tools/zkusb/json_document.h"
 #include "tools/zkusb/text_tree.h"
 
 namespace zkusb {
@@ -119,11 +119,56 @@ TextTree StorageControllerLine(const NodeView& controller,
   return line;
 }
 
+// Into an object that is open.
+void WriteNode(const NodeView& node, Place& place, JsonDocument& document) {
+  const bool isPort = node.Type == KUDTHubPort;
+  if (isPort) place.ports.push_back(node.PortIndex);
+  document.Members(NodeJson(node, place));
+  document.BeginArray("Childs");
+  for (const NodeView& child : node.Childs) {
+    document.BeginElement();
+    WriteNode(child, place, document);
+    document.End();
+  }
+  document.End();
+  if (isPort) place.ports.pop_back();
+}
+
 }  // namespace
+
+void WriteTree(const NodeView& root, JsonDocument& document) {
+  document.Members(NodeJson(root, {}));
+  document.BeginArray("Childs");
+  Place place;
+  for (const NodeView& controller : root.Childs) {
+    ++place.controller;
+    document.BeginElement();
+    WriteNode(controller, place, document);
+    document.End();
+  }
+  document.End();
+}
+
+void PrintDump(const Component* component, bool json, Writer& out) {
+  const auto print = [&](std::u16string_view text) {
+    if (!json) return out.Verbatim(text);
+    JsonDocument document("dump", out);
+    document.Text("ToString", text);
+    document.Finish();
+  };
+  if (component) {
+    component->Dump(print);
+  } else {
+    print({});
+  }
+}
 
 void PrintTree(const NodeView& root, bool json, Writer& out) {
   if (json) {
-    out.Json(TreeJson(root), true);
+    JsonDocument document("tree", out);
+    document.BeginObject("RootNode");
+    WriteTree(root, document);
+    document.Finish();
     return;
   }
   TextTree tree{u"USB tree", {}, {}, {}};

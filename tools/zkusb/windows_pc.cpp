@@ -3,9 +3,9 @@
 #include <filesystem>
 #include <optional>
 #include <stdexcept>
-#include <thread>
 
 #include "module/type_library.h"
+#include "platform/console.h"
 #include "platform/registry_key.h"
 #include "platform/server_module.h"
 #include "platform/system.h"
@@ -112,9 +112,7 @@ void Pc::Play(std::size_t step) {
   WaitFor(kAnswerMilliseconds);
 }
 
-void Pc::WaitFor(std::uint32_t milliseconds) {
-  std::this_thread::sleep_for(std::chrono::milliseconds(milliseconds));
-}
+void Pc::WaitFor(std::uint32_t milliseconds) { platform::WaitForInterrupt(milliseconds); }
 
 void Pc::Settle() {
   if (m_state->scripted) WaitFor(kSettleMilliseconds);

@@ -1,5 +1,7 @@
 #include "tools/zkusb/writer.h"
 
+#include <algorithm>
+
 #include "platform/text.h"
 
 namespace zkusb {
@@ -57,7 +59,15 @@ std::u16string CutTo(std::u16string_view text, std::size_t columns) {
 
 }  // namespace
 
-void Writer::Line(std::u16string_view text) { Verbatim(Escaped(text) + u"\n"); }
+void Writer::EndLine() {
+  m_stream << '\n';
+  if (m_flushEachLine) m_stream.flush();
+}
+
+void Writer::Line(std::u16string_view text) {
+  Verbatim(Escaped(text));
+  EndLine();
+}
 
 void Writer::FittedLine(std::u16string_view head, std::u16string_view middle,
                         std::u16string_view tail) {
@@ -65,34 +75,50 @@ void Writer::FittedLine(std::u16string_view head, std::u16string_view middle,
   std::u16string name = Escaped(middle);
   const std::u16string end = Escaped(tail);
   const std::size_t around = Columns(start) + Columns(end);
-  if (around + Columns(name) > kColumns && around < kColumns) {
-    name = CutTo(name, kColumns - around);
+  if (m_columns != 0 && around + Columns(name) > m_columns && around < m_columns) {
+    name = CutTo(name, m_columns - around);
   }
   std::u16string line = start + name + end;
-  if (Columns(line) > kColumns) line = CutTo(line, kColumns);
-  Verbatim(line + u"\n");
+  if (m_columns != 0 && Columns(line) > m_columns) line = CutTo(line, m_columns);
+  Verbatim(line);
+  EndLine();
 }
 
 void Writer::Paragraph(std::u16string_view text) {
   Verbatim(text);
-  if (!text.ends_with(u'\n')) Verbatim(u"\n");
+  if (!text.ends_with(u'\n')) EndLine();
 }
 
-void Writer::Json(const nlohmann::ordered_json& value, bool indented) {
-  // The dump leaves some harmful characters as they are; they stand inside of texts only, where
-  // JSON has an escape for each.
+void Writer::JsonLine(const nlohmann::ordered_json& value) {
+  Json(platform::FromUtf8(value.dump()));
+  EndLine();
+}
+
+void Writer::Json(std::u16string_view text) {
+  // What wrote the text leaves some harmful characters as they are; they stand inside of texts
+  // only, where JSON has an escape for each.
   std::u16string harmless;
-  for (const char16_t unit : platform::FromUtf8(value.dump(indented ? 2 : -1))) {
-    if (unit != u'\n' && IsHarmful(unit)) {
+  for (const char16_t unit : text) {
+    const bool isMarkup = m_inMarkup && (unit == u'<' || unit == u'>' || unit == u'&');
+    if (isMarkup || (unit != u'\n' && IsHarmful(unit))) {
       harmless += u"\\u" + platform::HexLower(unit, 4);
     } else {
       harmless += unit;
     }
   }
-  Verbatim(harmless + u"\n");
+  Verbatim(harmless);
 }
 
-void Writer::Verbatim(std::u16string_view text) { m_stream << platform::ToUtf8(text); }
+void Writer::Verbatim(std::u16string_view text) {
+  // In parts: a dump of a big PC is large enough to be held once.
+  constexpr std::size_t kPart = 1 << 16;
+  while (!text.empty()) {
+    std::size_t size = std::min(text.size(), kPart);
+    if (size < text.size() && text[size - 1] >= 0xD800 && text[size - 1] <= 0xDBFF) --size;
+    m_stream << platform::ToUtf8(text.substr(0, size));
+    text.remove_prefix(size);
+  }
+}
 
 std::u16string Tidied(std::u16string_view text) {
   std::u16string result;
