@@ -4,24 +4,18 @@
 // The input is a count byte and that many bytes of string descriptors, a count byte and that many
 // bytes laid over a connection record from its end on down, and for the rest a configuration.
 #include <algorithm>
-#include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <iterator>
 #include <span>
 
+#include "fuzz/fuzz.h"
 #include "records/descriptor_dump.h"
 
 namespace {
 
 using namespace KelvoUHW;
+using fuzz::Require;
 using Bytes = std::span<const std::uint8_t>;
-
-void Require(bool holds, const char* what) {
-  if (holds) return;
-  std::fprintf(stderr, "does not hold: %s\n", what);
-  std::abort();
-}
 
 // The bytes in memory of exactly their size, so that the address sanitizer sees a read behind them.
 std::vector<std::uint8_t> Exact(Bytes bytes) { return {bytes.begin(), bytes.end()}; }
