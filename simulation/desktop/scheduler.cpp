@@ -82,8 +82,20 @@ void Scheduler::AdvanceWhenAllWait() {
     if (settling != m_settling.end()) Go(**settling);
   } else if (m_mode == ClockMode::Virtual) {
     m_virtualNow = std::max(m_virtualNow, *next->m_until);
-    Go(*next);
+    Go(m_choose ? ChosenLike(*next) : *next);
   }
+}
+
+// Of all that wake as `first` does.
+Scheduler::Waiter& Scheduler::ChosenLike(Waiter& first) {
+  std::vector<Waiter*> ready;
+  for (Waiter* sleeper : m_sleepers) {
+    if (!sleeper->m_goes && sleeper->m_until && *sleeper->m_until <= m_virtualNow &&
+        sleeper->m_turn == first.m_turn) {
+      ready.push_back(sleeper);
+    }
+  }
+  return *ready[ready.size() == 1 ? 0 : m_choose(ready.size()) % ready.size()];
 }
 
 void Scheduler::Settle(Lock& lock) {

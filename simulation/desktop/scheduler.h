@@ -19,6 +19,8 @@
 #include <optional>
 #include <thread>
 #include <unordered_map>
+#include <utility>
+#include <vector>
 
 namespace platform::simulated {
 
@@ -61,6 +63,10 @@ class Scheduler {
 
   std::mutex& Mutex() { return m_mutex; }
   ClockMode Mode() const noexcept { return m_mode; }
+  // On virtual time: which of so many threads that could go on just now does. Called with the lock
+  // held, so it must not use the process. None: the one that fell asleep first.
+  using Choose = std::function<std::size_t(std::size_t threads)>;
+  void SetChoice(Choose choose) { m_choose = std::move(choose); }
   Milliseconds Now() const;
 
   // Without a moment only Wake and the end wake it. False when the process has ended: then nothing
@@ -96,6 +102,7 @@ class Scheduler {
   void Await(Lock& lock, Waiter& waiter);
   void Go(Waiter& waiter);
   void AdvanceWhenAllWait();
+  Waiter& ChosenLike(Waiter& first);
   void Run(const std::function<void()>& body, Waiter& turn);
   void Reap();
 
@@ -105,6 +112,7 @@ class Scheduler {
   Milliseconds m_virtualNow = 0;
   std::size_t m_running = 0;  // counted threads that do not wait
   std::size_t m_started = 0;
+  Choose m_choose;
   bool m_ended = false;
   std::unordered_map<std::thread::id, Kind> m_counted;
   std::list<Waiter*> m_sleepers;  // in the order of falling asleep

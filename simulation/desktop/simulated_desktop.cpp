@@ -51,6 +51,11 @@ void SimulatedDesktop::SetDefaultProcedure(std::function<LResult(const MSG&)> pr
   m_state->defaultProcedure = std::move(procedure);
 }
 
+void SimulatedDesktop::SetChoice(Scheduler::Choose choose) {
+  const auto lock = m_state->Guard();
+  m_state->scheduler.SetChoice(std::move(choose));
+}
+
 void SimulatedDesktop::Order(const CallOrder& order) {
   const auto lock = m_state->Guard();
   m_state->orders.Add(order);

@@ -106,6 +106,8 @@ class SimulatedDesktop final : public Threads, public Desktop {
   void Settle();
 
   void Order(const CallOrder& order);
+  // See Scheduler::SetChoice.
+  void SetChoice(Scheduler::Choose choose);
   // What DefWindowProcW does from here on; it may throw. None: what the system does.
   void SetDefaultProcedure(std::function<LResult(const MSG&)> procedure);
   std::uint64_t Calls(DesktopCall call) const;
