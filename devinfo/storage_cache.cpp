@@ -30,9 +30,7 @@ void MergeDisksWithoutVolumes(const std::vector<NodePtr>& disks, std::vector<Nod
 
 StorageCache::StorageCache(platform::Host& host, platform::DeviceManager& nodes)
     : m_host(host), m_nodes(nodes) {
-  m_volumeEnumeration.SetupClass = platform::GUID_DEVCLASS_USB;
   m_volumeEnumeration.InterfaceClass = platform::GUID_DEVINTERFACE_VOLUME;
-  m_diskEnumeration.SetupClass = platform::GUID_DEVCLASS_USB;
   m_diskEnumeration.InterfaceClass = platform::GUID_DEVINTERFACE_DISK;
   OpenEnumeration(m_volumeEnumeration);
 }

@@ -42,7 +42,6 @@ class StorageCache {
  private:
   struct InterfaceEnumeration {
     platform::DeviceSetHandle Set = platform::kInvalidHandle;
-    platform::Guid SetupClass{};  // kept, not used
     platform::Guid InterfaceClass{};
   };
 

@@ -6,7 +6,6 @@ void FailingRegistry::SetPlan(const RegistryFailurePlan& plan) {
   const std::lock_guard lock(m_mutex);
   m_plan = plan;
   m_calls = 0;
-  m_failures = 0;
 }
 
 std::uint64_t FailingRegistry::Calls() const {
@@ -14,16 +13,10 @@ std::uint64_t FailingRegistry::Calls() const {
   return m_calls;
 }
 
-std::uint64_t FailingRegistry::Failures() const {
-  const std::lock_guard lock(m_mutex);
-  return m_failures;
-}
-
 Status FailingRegistry::BeforeCall() noexcept {
   const std::lock_guard lock(m_mutex);
   ++m_calls;
   if (m_plan.onwards ? m_calls < m_plan.call : m_calls != m_plan.call) return Status::Success();
-  ++m_failures;
   return Status::Failure(m_plan.error);
 }
 

@@ -25,9 +25,8 @@ class FailingRegistry final : public Registry {
 
   // Starts counting anew under that plan.
   void SetPlan(const RegistryFailurePlan& plan);
-  // The calls counted, and those that failed, since the plan was set.
+  // The calls counted since the plan was set.
   std::uint64_t Calls() const;
-  std::uint64_t Failures() const;
 
   Status CreateKey(RegistryKeyHandle parent, const char16_t* path, std::uint32_t access,
                    RegistryKeyHandle& key, std::uint32_t& disposition) noexcept override;
@@ -50,7 +49,6 @@ class FailingRegistry final : public Registry {
   mutable std::mutex m_mutex;
   RegistryFailurePlan m_plan;
   std::uint64_t m_calls = 0;
-  std::uint64_t m_failures = 0;
 };
 
 }  // namespace platform::wrappers

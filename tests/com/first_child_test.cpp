@@ -54,6 +54,17 @@ TEST_F(FirstChildOfType, DepthIsNoLimit) {
   EXPECT_EQ(Search(Wrap(root).Get(), KUDTHubPort), "S_FALSE untouched");
 }
 
+// A list that is there and is none is an empty one.
+TEST_F(FirstChildOfType, AClientsNodeMayGiveNoListAndSayItDid) {
+  ClientNode leaf(KUDTHubPort), middle(KUDTHub, {&leaf}), last(KUDTHubPort), top(KUDTRoot, {&middle, &last});
+  middle.givesNoList = true;
+  IZKUMUsbTreeNode* found = nullptr;
+  EXPECT_EQ(searcher->get_FirstChildOfType(&top, KUDTHubPort, &found), S_OK);
+  EXPECT_EQ(found, &last);
+  last.Release();
+  EXPECT_EQ(searcher->get_FirstChildOfType(&middle, KUDTHubPort, &found), S_FALSE);
+}
+
 // The tree of a client: below top (root) are middle (hub), last (controller) and odd, below middle is leaf (port).
 TEST_F(FirstChildOfType, NodesOfAClientMayFailAnywhere) {
   ClientNode leaf(KUDTHubPort), middle(KUDTHub, {&leaf}), last(KUDTHostController), odd(KUDTUnknown),

@@ -22,6 +22,7 @@ class ClientNode final : public IZKUMUsbTreeNode, public IZKUMUsbTreeNodeEnumera
 
   std::function<HRESULT(Method)> before = [](Method) { return S_OK; };
   ULONG references = 1;
+  bool givesNoList = false;  // Childs answers S_OK all the same
 
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override {
     const bool node = iid == platform::IidOf<IZKUMUsbTreeNode>();
@@ -37,6 +38,8 @@ class ClientNode final : public IZKUMUsbTreeNode, public IZKUMUsbTreeNodeEnumera
   }
   HRESULT STDMETHODCALLTYPE get_Childs(IZKUMUsbTreeNodeEnumerator** out) override {
     return Answer(kChilds, [&] {
+      *out = nullptr;
+      if (givesNoList) return;
       m_current = 0;
       ++references;
       *out = this;

@@ -1,6 +1,13 @@
 #include "tests/support/failing_memory.h"
 
+#include <unwind.h>
+
+#include <map>
+#include <memory>
 #include <new>
+#include <set>
+#include <utility>
+#include <vector>
 
 #include "platform/heap.h"
 
@@ -8,7 +15,25 @@
 static thread_local std::uint64_t t_countdown = 0;
 static thread_local bool t_paused = false;
 
+// While set: the places of the allocations, hashed.
+static thread_local std::vector<std::uintptr_t>* t_places = nullptr;
+
+static _Unwind_Reason_Code AddFrame(_Unwind_Context* context, void* hash) {
+  auto& sum = *static_cast<std::uintptr_t*>(hash);
+  sum = (sum ^ static_cast<std::uintptr_t>(_Unwind_GetIP(context))) * 0x100000001B3U;
+  return _URC_NO_REASON;
+}
+
+static void RecordPlace() {
+  t_paused = true;
+  std::uintptr_t place = 14695981039346656037U & UINTPTR_MAX;
+  _Unwind_Backtrace(AddFrame, &place);
+  t_places->push_back(place);
+  t_paused = false;
+}
+
 void* operator new(std::size_t bytes) {
+  if (t_places != nullptr && !t_paused) RecordPlace();
   if (t_countdown != 0 && !t_paused && --t_countdown == 0) throw std::bad_alloc();
   if (void* memory = heap::Take(bytes)) return memory;
   throw std::bad_alloc();
@@ -24,6 +49,19 @@ void operator delete(void* memory) noexcept { heap::Give(memory); }
 void operator delete(void* memory, std::size_t) noexcept { heap::Give(memory); }
 
 namespace KelvoUHW {
+
+void BeginRecordingAllocations() { t_places = new std::vector<std::uintptr_t>; }
+
+std::vector<std::uint64_t> EndRecordingAllocations() {
+  const std::unique_ptr<std::vector<std::uintptr_t>> places(std::exchange(t_places, nullptr));
+  std::map<std::uintptr_t, std::pair<std::uint64_t, std::uint64_t>> firstAndLast;
+  for (std::size_t i = 0; i < places->size(); ++i) {
+    firstAndLast.try_emplace((*places)[i], i + 1, i + 1).first->second.second = i + 1;
+  }
+  std::set<std::uint64_t> distinct;
+  for (const auto& [place, both] : firstAndLast) distinct.insert({both.first, both.second});
+  return {distinct.begin(), distinct.end()};
+}
 
 FailingAllocation::FailingAllocation(std::uint64_t allocation) noexcept { t_countdown = allocation; }
 FailingAllocation::~FailingAllocation() { t_countdown = 0; }

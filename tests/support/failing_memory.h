@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <vector>
 
 #include "platform/wrappers/intercepting_host.h"
 
@@ -16,6 +17,9 @@ struct FailingAllocation {
   bool Failed() const noexcept;  // whether it came to the failure
 };
 
+void BeginRecordingAllocations();
+std::vector<std::uint64_t> EndRecordingAllocations();
+
 // What a call returns while its n-th allocation fails, and whether it came to that. With 0 none fails, and
 // `failed` says nothing.
 template <class Call>
@@ -24,6 +28,15 @@ auto WithoutAllocation(std::uint64_t allocation, bool& failed, Call call) {
   const auto result = call();
   failed = failing.Failed();
   return result;
+}
+
+// The allocations of one call by this thread that differ in where they are asked for: of those with the same calls
+// behind them the first and the last, counted from 1. What fails at one of them fails alike at those between.
+template <class Call>
+std::vector<std::uint64_t> DistinctAllocations(Call call) {
+  BeginRecordingAllocations();
+  call();
+  return EndRecordingAllocations();
 }
 
 // Platform calls of the component get their memory from the system: what a simulated PC allocates

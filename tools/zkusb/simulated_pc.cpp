@@ -94,10 +94,6 @@ void Pc::ApplyAll() {
 
 void Pc::Play(std::size_t step) {
   const platform::simulated::Step& played = m_state->script.at(step);
-  const std::uint64_t now = Now();
-  if (played.atMilliseconds > now) {
-    WaitFor(static_cast<std::uint32_t>(played.atMilliseconds - now));
-  }
   m_state->Refuse(step, platform::simulated::PlayStep(m_state->pc, m_state->desktop, played));
   WaitFor(0);
 }
