@@ -1,0 +1,69 @@
+#include "recorder/recorder.h"
+
+#include <iostream>
+
+#include "platform/wrappers/failing_host.h"
+#include "simulation/machine/generated.h"
+#include "tests/recorder/recordings.h"
+
+namespace recorder {
+namespace {
+
+using platform::simulated::SimulatedPc;
+
+Machine Recorded(const Machine& machine) {
+  SimulatedPc pc(machine);
+  Machine recorded = RecordMachine(pc);
+  EXPECT_EQ(pc.Open(), platform::simulated::OpenCounts());
+  EXPECT_TRUE(pc.Misuses().empty());
+  return recorded;
+}
+
+// The recording shows what the PC shows; read from its file it is the same recording.
+void ExpectSameBuild(const Machine& machine) {
+  const Machine recorded = Recorded(machine);
+  EXPECT_TRUE(recorded.notes.empty()) << platform::ToUtf8(recorded.notes.front());
+  const Machine read = ReadBack(recorded);
+  EXPECT_EQ(WriteMachine(read), WriteMachine(recorded));
+  EXPECT_EQ(BuildOver(read), BuildOver(machine));
+}
+
+TEST(Recorder, ShowsEveryMachineAsItIs) {
+  for (const char* name : kMachines) {
+    SCOPED_TRACE(name);
+    const Machine machine = LoadMachine(name);
+    ExpectSameBuild(machine);
+    // A file of its own says the same, too, and its recording has each interface, port and volume of it.
+    EXPECT_EQ(WriteMachine(ReadBack(machine)), WriteMachine(machine));
+    Machine recorded = Recorded(machine);
+    EXPECT_EQ(recorded.interfaces.size(), machine.interfaces.size());
+    EXPECT_EQ(recorded.hubs.size(), machine.hubs.size());
+    EXPECT_EQ(recorded.volumes.size(), machine.volumes.size());
+    EXPECT_EQ(recorded.storage.size(), machine.storage.size());
+  }
+  for (const auto shape : {platform::simulated::GeneratedShape::Wide, platform::simulated::GeneratedShape::Deep}) {
+    ExpectSameBuild(platform::simulated::GenerateMachine(shape, 120));
+  }
+}
+
+void ExpectSameBuilds(std::uint32_t firstSeed, std::uint32_t count) {
+  std::size_t devices = 0, volumes = 0;
+  for (std::uint32_t seed = firstSeed; seed < firstSeed + count; ++seed) {
+    SCOPED_TRACE("seed " + std::to_string(seed));
+    const Machine machine = RandomMachine(seed);
+    ExpectSameBuild(machine);
+    devices += machine.devices.size();
+    volumes += machine.volumes.size();
+    ASSERT_FALSE(testing::Test::HasFailure());
+  }
+  std::cout << "seeds " << firstSeed << " to " << firstSeed + count - 1 << ": " << devices << " devices, " << volumes
+            << " volumes\n";
+  EXPECT_GE(devices, 10u * count);
+  EXPECT_GE(volumes, count / 2);
+}
+
+TEST(Recorder, ShowsMadeUpPcsAsTheyAre) { ExpectSameBuilds(1, 40); }
+TEST(RecorderOverManyPcs, ShowsMadeUpPcsAsTheyAre) { ExpectSameBuilds(41, 960); }
+
+}  // namespace
+}  // namespace recorder
