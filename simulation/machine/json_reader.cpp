@@ -94,7 +94,7 @@ std::string ParserReason(std::string_view what) {
 // bounds what destroys and prints documents.
 class DocumentBuilder final : public nlohmann::json_sax<Json> {
  public:
-  DocumentBuilder(std::string_view bytes, const std::string& file) : m_bytes(bytes), m_file(file) {}
+  DocumentBuilder(std::string_view bytes, const FileReport& file) : m_bytes(bytes), m_file(file) {}
 
   Json Take() { return std::move(m_root); }
 
@@ -174,7 +174,7 @@ class DocumentBuilder final : public nlohmann::json_sax<Json> {
   }
 
   std::string_view m_bytes;
-  const std::string& m_file;
+  const FileReport& m_file;
   Json m_root;
   std::size_t m_values = 0;
   std::vector<Json*> m_open;  // stays valid: only the innermost container grows
@@ -213,7 +213,7 @@ std::string ReadFileBytes(const std::string& path) {
   return bytes;
 }
 
-Json ParseJson(std::string_view bytes, const std::string& file) {
+Json ParseJson(std::string_view bytes, const FileReport& file) {
   // The parser takes a zero byte for the end of the text.
   if (const std::size_t zero = bytes.find('\0'); zero != std::string_view::npos) {
     FailAt(file, LineAndColumn(bytes, zero), "unexpected zero byte");
@@ -223,14 +223,14 @@ Json ParseJson(std::string_view bytes, const std::string& file) {
   return builder.Take();
 }
 
-void FailAt(const std::string& file, const std::string& place, const std::string& reason) {
-  throw MachineFileError(file + ": " + (place.empty() ? "(file)" : place) + ": " + reason);
+void FailAt(const FileReport& file, const std::string& place, const std::string& reason) {
+  throw MachineFileError(file.Name() + ": " + (place.empty() ? "(file)" : place) + ": " + reason);
 }
 
 std::string Quoted(std::string_view utf8) { return std::string("\"") += Printable(utf8) + "\""; }
 std::string Quoted(std::u16string_view text) { return Quoted(ToUtf8(text)); }
 
-JsonValue::JsonValue(const Json& json, const std::string& file, std::string place)
+JsonValue::JsonValue(const Json& json, const FileReport& file, std::string place)
     : m_json(&json), m_file(&file), m_place(std::move(place)) {}
 
 void JsonValue::Fail(const std::string& reason) const { FailAt(*m_file, m_place, reason); }
@@ -320,12 +320,15 @@ std::string JsonObject::PlaceOf(std::string_view name) const {
 void JsonObject::Finish() const {
   for (const auto& [name, member] : m_value.Raw().items()) {
     if (name == "filledIn") {
-      CheckFilledIn();
+      m_value.File().Try([this] { CheckFilledIn(); });
     } else if (std::find(m_known.begin(), m_known.end(), name) == m_known.end()) {
-      m_value.Fail("unknown member " + Quoted(name));
+      m_value.File().Try(
+          [this, &unknown = name] { m_value.Fail("unknown member " + Quoted(unknown)); });
     }
   }
-  if (!m_missing.empty()) FailAt(m_value.File(), PlaceOf(m_missing), "is missing");
+  for (const std::string& missing : m_missing) {
+    m_value.File().Try([&] { FailAt(m_value.File(), PlaceOf(missing), "is missing"); });
+  }
 }
 
 void JsonObject::CheckFilledIn() const {

@@ -2,7 +2,8 @@
 // error that names file, place and reason.
 //
 // Pure functions and values, callable from every thread. A JsonValue refers to the parsed document
-// and to the file's name; both must outlive it. Every failure is a MachineFileError.
+// and to the FileReport; both must outlive it. Every failure is a MachineFileError, which ends the
+// reading or is collected by the FileReport.
 #pragma once
 
 #include <cstddef>
@@ -18,20 +19,54 @@
 #include <vector>
 
 #include "simulation/machine/machine.h"
+#include "simulation/machine/machine_file.h"
 
 namespace platform::simulated {
 
 using Json = nlohmann::json;
+
+// The file that is read, and where what is wrong in it goes.
+class FileReport {
+ public:
+  // Without `faults`, which this refers to, the first fault ends the reading.
+  explicit FileReport(std::string name, std::vector<std::string>* faults = nullptr)
+      : m_name(std::move(name)), m_faults(faults) {}
+
+  const std::string& Name() const noexcept { return m_name; }
+
+  // The faults collected so far.
+  std::size_t Count() const noexcept { return m_faults == nullptr ? 0 : m_faults->size(); }
+
+  // Runs a part of the reading; false where it met a fault and faults are collected. The thousandth
+  // ends the reading all the same.
+  template <class Part>
+  bool Try(Part part) const {
+    try {
+      part();
+      return true;
+    } catch (const MachineFileError& fault) {
+      if (m_faults == nullptr || m_faults->size() + 1 >= kMostFaults) throw;
+      m_faults->emplace_back(fault.what());
+      return false;
+    }
+  }
+
+ private:
+  static constexpr std::size_t kMostFaults = 1000;
+
+  std::string m_name;
+  std::vector<std::string>* m_faults;
+};
 
 // The bytes of a file of at most 64 MiB.
 std::string ReadFileBytes(const std::string& path);
 
 // Parses a whole file. Beyond what JSON itself asks for, two members of one name in an object and
 // more than 16 levels of nesting are refused.
-Json ParseJson(std::string_view bytes, const std::string& file);
+Json ParseJson(std::string_view bytes, const FileReport& file);
 
 // "FILE: PLACE: reason"; an empty place is "(file)".
-[[noreturn]] void FailAt(const std::string& file, const std::string& place,
+[[noreturn]] void FailAt(const FileReport& file, const std::string& place,
                          const std::string& reason);
 
 // In double quotes and fit for one line of a message: no control characters, cut when very long.
@@ -40,10 +75,10 @@ std::string Quoted(std::u16string_view text);
 
 class JsonValue {
  public:
-  JsonValue(const Json& json, const std::string& file, std::string place);
+  JsonValue(const Json& json, const FileReport& file, std::string place);
 
   const Json& Raw() const noexcept { return *m_json; }
-  const std::string& File() const noexcept { return *m_file; }
+  const FileReport& File() const noexcept { return *m_file; }
   const std::string& Place() const noexcept { return m_place; }
   [[noreturn]] void Fail(const std::string& reason) const;
 
@@ -59,7 +94,7 @@ class JsonValue {
   const std::string& AsUtf8() const;
 
   const Json* m_json;
-  const std::string* m_file;
+  const FileReport* m_file;
   std::string m_place;
 };
 
@@ -84,11 +119,13 @@ template <class T>
 void FromJson(const JsonValue& value, std::vector<T>& out) {
   const std::vector<JsonValue> elements = value.AsList();
   out.reserve(elements.size());
-  for (const JsonValue& element : elements) FromJson(element, out.emplace_back());
+  for (const JsonValue& element : elements) {
+    value.File().Try([&] { FromJson(element, out.emplace_back()); });
+  }
 }
 
 // An object whose members are asked for by name. Finish() refuses the members nobody asked for,
-// then reports the first one that was needed and not there: so a misspelt name is called unknown,
+// then reports those that were needed and are not there: so a misspelt name is called unknown,
 // not missing. "filledIn" is understood in every object.
 class JsonObject {
  public:
@@ -96,21 +133,20 @@ class JsonObject {
 
   const JsonValue& Value() const noexcept { return m_value; }
 
-  // Sets `out` and returns true; leaves it and returns false when there is no such member.
+  // Sets `out` and returns true; returns false when there is no such member or it does not fit, and
+  // leaves `out` where there is none.
   template <class T>
   bool Read(const char* name, T& out) {
     const std::optional<JsonValue> member = Find(name);
-    if (!member) return false;
-    FromJson(*member, out);
-    return true;
+    return member && Convert(*member, out);
   }
 
   // The same for a member that must be there; its absence is reported by Finish().
   template <class T>
   bool Need(const char* name, T& out) {
-    const bool found = Read(name, out);
-    if (!found && m_missing.empty()) m_missing = name;
-    return found;
+    const std::optional<JsonValue> member = Find(name);
+    if (!member) m_missing.emplace_back(name);
+    return member && Convert(*member, out);
   }
 
   // `name` must be a literal.
@@ -120,11 +156,15 @@ class JsonObject {
   void Finish() const;
 
  private:
+  template <class T>
+  bool Convert(const JsonValue& member, T& out) const {
+    return m_value.File().Try([&] { FromJson(member, out); });
+  }
   void CheckFilledIn() const;
 
   JsonValue m_value;
   std::vector<std::string_view> m_known;
-  std::string m_missing;
+  std::vector<std::string> m_missing;
 };
 
 }  // namespace platform::simulated

@@ -12,32 +12,35 @@ namespace {
 class Names {
  public:
   // `what` stands in the message: "device with the id".
-  Names(const char* what, const std::string& file) : m_what(what), m_file(file) {}
+  Names(const char* what, const FileReport& file) : m_what(what), m_file(file) {}
 
   void AddPresent(const Text& name) { m_places.emplace(ToLower(name), "there already"); }
 
   void Add(const Text& name, const std::string& owner, const std::string& place) {
+    if (name.empty()) return;
     const auto [entry, fresh] = m_places.emplace(ToLower(name), owner);
     if (fresh) return;
-    FailAt(m_file, place,
-           std::string("a second ") + m_what + " " + Quoted(name) + " (the first is " +
-               entry->second + ")");
+    m_file.Try([&, &first = entry->second] {
+      FailAt(
+          m_file, place,
+          std::string("a second ") + m_what + " " + Quoted(name) + " (the first is " + first + ")");
+    });
   }
 
   void MustHave(const Text& name, const std::string& place) const {
-    if (m_places.contains(ToLower(name))) return;
-    FailAt(m_file, place, std::string("no ") + m_what + " " + Quoted(name));
+    if (name.empty() || m_places.contains(ToLower(name))) return;
+    m_file.Try([&] { FailAt(m_file, place, std::string("no ") + m_what + " " + Quoted(name)); });
   }
 
  private:
   const char* m_what;
-  const std::string& m_file;
+  const FileReport& m_file;
   std::unordered_map<Text, std::string> m_places;
 };
 
 class Checker {
  public:
-  Checker(const Machine& there, const Machine& added, const std::string& file,
+  Checker(const Machine& there, const Machine& added, const FileReport& file,
           const std::string& prefix)
       : m_there(there), m_added(added), m_file(file), m_prefix(prefix) {}
 
@@ -77,7 +80,9 @@ class Checker {
       const Text& id = m_added.devices[i].id;
       const std::string place = At("devices", i);
       if (EqualIgnoringCase(id, kRootDeviceId)) {
-        FailAt(m_file, place + ".id", "is the root device, which is always there");
+        m_file.Try(
+            [&] { FailAt(m_file, place + ".id", "is the root device, which is always there"); });
+        continue;
       }
       m_devices.Add(id, place, place + ".id");
     }
@@ -103,7 +108,10 @@ class Checker {
         node = parent == indexes.end() ? kNone : parent->second;
       }
       if (node != kNone && reachedFrom[node] == start) {
-        FailAt(m_file, At("devices", node) + ".parent", "the parents of this device form a circle");
+        m_file.Try([&] {
+          FailAt(m_file, At("devices", node) + ".parent",
+                 "the parents of this device form a circle");
+        });
       }
     }
   }
@@ -161,14 +169,14 @@ class Checker {
 
   const Machine& m_there;
   const Machine& m_added;
-  const std::string& m_file;
+  const FileReport& m_file;
   const std::string& m_prefix;
   Names m_devices{"device with the id", m_file};
 };
 
 }  // namespace
 
-void CheckMachine(const Machine& there, const Machine& added, const std::string& file,
+void CheckMachine(const Machine& there, const Machine& added, const FileReport& file,
                   const std::string& prefix) {
   Checker(there, added, file, prefix).Run();
 }

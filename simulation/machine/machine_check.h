@@ -4,13 +4,15 @@
 
 #include <string>
 
+#include "simulation/machine/json_reader.h"
 #include "simulation/machine/machine.h"
 
 namespace platform::simulated {
 
-// Checks `added` on top of `there`, which is taken to be sound and may be empty. Throws a
-// MachineFileError that carries `file` and the place in `added`, with `prefix` before it.
-void CheckMachine(const Machine& there, const Machine& added, const std::string& file,
+// Checks `added` on top of `there`, which is taken to be sound and may be empty. What does
+// not hold goes to `file`, with the place in `added` and `prefix` before it. A record without a
+// name is one that could not be read, and is not asked for it.
+void CheckMachine(const Machine& there, const Machine& added, const FileReport& file,
                   const std::string& prefix);
 
 }  // namespace platform::simulated

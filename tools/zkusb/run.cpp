@@ -6,11 +6,13 @@
 
 #include "platform/console.h"
 #include "platform/text.h"
+#include "tools/zkusb/check_command.h"
 #include "tools/zkusb/command_line.h"
 #include "tools/zkusb/commands.h"
 #include "tools/zkusb/component.h"
 #include "tools/zkusb/device_facts.h"
 #include "tools/zkusb/pc.h"
+#include "tools/zkusb/record_command.h"
 #include "tools/zkusb/writer.h"
 
 namespace zkusb {
@@ -79,6 +81,12 @@ int RunCommand(const std::vector<std::string>& args, Writer& out, Writer& errors
   }
   const Options& options = *line.options;
   out.SetColumns(options.columns.value_or(platform::OutputColumns()));
+  // Neither needs the component.
+  if (options.command == Command::kCheck) return Check(options, out);
+  if (options.command == Command::kRecord) {
+    Record(options, out);
+    return kDone;
+  }
   Pc pc(options.machineFile, options.scriptFile);
   switch (options.command) {
     case Command::kWatch:

@@ -1,0 +1,200 @@
+#include "tools/zkusb/record_command.h"
+
+#include <chrono>
+#include <filesystem>
+#include <fstream>
+#include <optional>
+#include <stdexcept>
+#include <string_view>
+#include <thread>
+#include <utility>
+
+#include "platform/system.h"
+#include "platform/text.h"
+#include "recorder/anonymiser.h"
+#include "recorder/difference.h"
+#include "recorder/glance.h"
+#include "recorder/recorder.h"
+#include "simulation/machine/built_in_machine.h"
+#include "simulation/machine/machine_file.h"
+#include "simulation/machine/machine_writer.h"
+#include "simulation/pc/simulated_pc.h"
+#include "tools/zkusb/interrupt.h"
+
+namespace zkusb {
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+using platform::simulated::Machine;
+using platform::simulated::Script;
+
+// Between two looks at a real PC: a change is written down when two looks see the same.
+constexpr std::chrono::milliseconds kBetweenGlances{250};
+
+std::filesystem::path PathOf(const std::string& file) {
+  return std::filesystem::path(std::u8string(file.begin(), file.end()));  // UTF-8 on every system
+}
+
+void WriteFile(const std::string& file, const std::string& text) {
+  std::ofstream stream(PathOf(file), std::ios::binary | std::ios::trunc);
+  stream << text;
+  stream.flush();
+  if (!stream) throw std::runtime_error(file + ": cannot be written");
+}
+
+// "pc.json" has its script in "pc.script.json".
+std::string ScriptFileOf(const std::string& file) {
+  std::filesystem::path path = PathOf(file);
+  path.replace_extension(".script.json");
+  const std::u8string text = path.u8string();
+  return {text.begin(), text.end()};
+}
+
+// The PC that is recorded: a simulated one where a file names it or there is no other.
+class RecordedPc {
+ public:
+  explicit RecordedPc(const Options& options) {
+    if (options.machineFile.empty() && options.scriptFile.empty()) {
+      m_host = platform::CurrentSystem().host;
+    }
+    if (m_host != nullptr) return;
+    const Machine machine =
+        options.machineFile.empty()
+            ? platform::simulated::ParseMachine(platform::simulated::BuiltInMachine(),
+                                                platform::simulated::kBuiltInMachineName)
+            : platform::simulated::LoadMachine(options.machineFile);
+    if (!options.scriptFile.empty()) {
+      m_script = platform::simulated::LoadScript(options.scriptFile, machine);
+    }
+    m_host = &m_simulated.emplace(machine);
+  }
+
+  platform::Host& Host() const noexcept { return *m_host; }
+  bool IsSimulated() const noexcept { return m_simulated.has_value(); }
+  const Script& Steps() const noexcept { return m_script; }
+  // What is read from a script was carried out once already, so no step is refused.
+  void Apply(const platform::simulated::Step& step) { m_simulated->Apply(step); }
+
+ private:
+  platform::Host* m_host = nullptr;
+  std::optional<platform::simulated::SimulatedPc> m_simulated;
+  Script m_script;
+};
+
+std::u16string Counted(std::size_t number, std::u16string_view one) {
+  std::u16string text = platform::Decimal(static_cast<std::int32_t>(number)) + u" ";
+  text += one;
+  return number == 1 ? text : text + u"s";
+}
+
+class RecordCommand {
+ public:
+  RecordCommand(const Options& options, Writer& out)
+      : m_options(options), m_out(out), m_pc(options), m_scriptFile(ScriptFileOf(options.file)) {}
+
+  void Run() {
+    m_state = Look();
+    Machine written = m_state;
+    written.name = u"Recorded PC";
+    written.notes.insert(written.notes.begin(), Origin());
+    WriteChecked(written);
+    m_out.Line(platform::FromUtf8(m_options.file) + u": " +
+               Counted(written.devices.size(), u"device") + u", " +
+               Counted(written.hubs.size(), u"hub") + u", " +
+               Counted(written.volumes.size(), u"volume"));
+    for (const std::u16string& note : written.notes) m_out.Line(u"  " + note);
+    if (m_options.recordWatch) Watch();
+  }
+
+ private:
+  Machine Look() {
+    Machine machine = recorder::RecordMachine(m_pc.Host());
+    if (!m_options.withSerials) m_anonymiser.Anonymise(machine);
+    return machine;
+  }
+
+  std::u16string Origin() const {
+    return m_options.withSerials ? u"Recorded with its serial numbers. Nothing was replaced."
+                                 : m_anonymiser.Report();
+  }
+
+  // What cannot be read back is not worth a file.
+  void WriteChecked(const Machine& machine) const {
+    const std::string text = platform::simulated::WriteMachine(machine);
+    platform::simulated::ParseMachine(text, "what was recorded");
+    WriteFile(m_options.file, text);
+  }
+
+  void Watch() {
+    WriteScript();
+    m_out.Line(platform::FromUtf8(m_scriptFile) + u": what changes" +
+               (m_pc.IsSimulated() ? u"" : u", until Ctrl-C"));
+    if (m_pc.IsSimulated()) {
+      for (const auto& step : m_pc.Steps()) {
+        m_pc.Apply(step);
+        NoteChange(step.atMilliseconds);
+      }
+    } else {
+      WatchInRealTime();
+    }
+    m_out.Line(Counted(m_script.size(), u"step"));
+  }
+
+  void WatchInRealTime() {
+    const Interrupt interrupt;
+    const Clock::time_point start = Clock::now();
+    std::u16string seen = recorder::Glance(m_pc.Host());
+    std::optional<Clock::time_point> changed;
+    while (!Interrupt::Happened()) {
+      std::this_thread::sleep_for(kBetweenGlances);
+      std::u16string now = recorder::Glance(m_pc.Host());
+      if (now != seen) {
+        if (!changed) changed = Clock::now();
+      } else if (changed) {
+        NoteChange(static_cast<std::uint32_t>(
+            std::chrono::duration_cast<std::chrono::milliseconds>(*changed - start).count()));
+        changed.reset();
+      }
+      seen = std::move(now);
+    }
+  }
+
+  void NoteChange(std::uint32_t at) {
+    recorder::Difference difference = recorder::StepsBetween(m_state, Look(), at);
+    m_state = std::move(difference.after);
+    if (!difference.complete) ++m_incomplete;
+    if (difference.steps.empty()) return;
+    for (const auto& step : difference.steps) {
+      m_out.Line(u"  +" + platform::Decimal(static_cast<std::int32_t>(step.atMilliseconds)) +
+                 u" ms  " + step.name);
+    }
+    m_script.insert(m_script.end(), difference.steps.begin(), difference.steps.end());
+    WriteScript();
+  }
+
+  void WriteScript() const {
+    platform::simulated::ScriptText about{u"Recorded changes", {Origin()}};
+    about.notes.push_back(u"Runs over the machine file that was written with it.");
+    if (m_incomplete != 0) {
+      about.notes.push_back(Counted(m_incomplete, u"change") +
+                            u" told more than steps can say; that is left out.");
+    }
+    WriteFile(m_scriptFile, platform::simulated::WriteScript(m_script, about));
+  }
+
+  const Options& m_options;
+  Writer& m_out;
+  RecordedPc m_pc;
+  const std::string m_scriptFile;
+  recorder::Anonymiser m_anonymiser;
+  Machine m_state;  // as the script knows the PC
+  Script m_script;
+  std::size_t m_incomplete = 0;
+};
+
+}  // namespace
+
+void Record(const Options& options, Writer& out) { RecordCommand(options, out).Run(); }
+
+}  // namespace zkusb
