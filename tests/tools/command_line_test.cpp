@@ -110,7 +110,8 @@ TEST(CommandLine, TakesOptionsOnBothSidesOfTheCommandAndHelps) {
 
   EXPECT_THAT(Output({"--version"}), testing::MatchesRegex("zkusb .+\\..+\n"));
   const std::string help = Output({"--help"});
-  for (const std::string line : {"tree", "dump", "find", "volumes", "watch", "record", "check", "register", "unregister", "--json"}) {
+  for (const std::string line :
+       {"tree", "dump", "find", "volumes", "watch", "record", "check", "register", "unregister", "--json"}) {
     EXPECT_THAT(help, HasSubstr("  " + line));
   }
   EXPECT_THAT(Output({"find", "--help"}), HasSubstr("--product HEX"));

@@ -66,7 +66,7 @@ TEST(RecordCommand, WritesWhatChangesAsAScript) {
 TEST(RecordCommand, RefusesWhatCannotBeDone) {
   const std::tuple<Args, std::string> cases[] = {
       {{"record"}, "file is required"},
-      {{"record", "a", "--anonymous", "--with-serials"}, "--with-serials excludes --anonymous"},
+      {{"record", "a", "--anonymous", "--with-serials"}, "--anonymous excludes --with-serials"},
       {{"record", "/no/such/folder/file", "--machine", MachineFile("vmware-win7")}, "cannot be written"},
       {{"check"}, "file is required"},
       {{"check", "/no/such/file"}, "cannot be read"},

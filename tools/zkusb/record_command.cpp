@@ -145,16 +145,18 @@ class RecordCommand {
     const Interrupt interrupt;
     const Clock::time_point start = Clock::now();
     std::u16string seen = recorder::Glance(m_pc.Host());
-    std::optional<Clock::time_point> changed;
+    bool changing = false;
+    std::uint32_t changedAt = 0;
     while (!Interrupt::Happened()) {
       std::this_thread::sleep_for(kBetweenGlances);
       std::u16string now = recorder::Glance(m_pc.Host());
-      if (now != seen) {
-        if (!changed) changed = Clock::now();
-      } else if (changed) {
-        NoteChange(static_cast<std::uint32_t>(
-            std::chrono::duration_cast<std::chrono::milliseconds>(*changed - start).count()));
-        changed.reset();
+      if (now != seen && !changing) {
+        changing = true;
+        changedAt = static_cast<std::uint32_t>(
+            std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start).count());
+      } else if (now == seen && changing) {
+        NoteChange(changedAt);
+        changing = false;
       }
       seen = std::move(now);
     }

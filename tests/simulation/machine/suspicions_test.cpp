@@ -49,7 +49,7 @@ TEST(Suspicions, FallOnWhatNoPcSays) {
          pc.hubs[1].ports[0].driverKey.reset();
          pc.hubs[1].ports[0].status = 1;
        }},
-      {".driverKey: its device is on hubs[", [](Machine& pc) { pc.hubs.back().ports[1] = pc.hubs.back().ports[0]; }},
+      {".driverKey: its device is on hubs[", [](Machine& pc) { pc.hubs[5].ports.at(6) = pc.hubs[5].ports.at(0); }},
       {".hubName: no hub with the name \"HUB\"", [](Machine& pc) { pc.hubs[1].ports[0].hubName = u"HUB"; }},
       {".name: no device with such an id",
        [](Machine& pc) {
