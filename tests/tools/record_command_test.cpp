@@ -14,7 +14,7 @@ std::string TextOf(const std::filesystem::path& path) {
 }
 
 // The lines of a watch that tell events, in their order, without the moments.
-std::vector<std::string> Events(const std::string& transcript) {
+[[maybe_unused]] std::vector<std::string> Events(const std::string& transcript) {
   std::vector<std::string> events;
   for (const std::string& line : Lines(transcript)) {
     const std::size_t word = line.find("s  ");
@@ -107,6 +107,24 @@ TEST(CheckCommand, SaysEverythingThatIsWrong) {
   const ProgramResult json = RunClient({"check", machine.Path(), "--json"});
   EXPECT_EQ(json.code, kNothingFound);
   EXPECT_EQ(Json::parse(json.out).at("findings").size(), 5u);
+}
+
+// The page's first example is all that a person needs who wants to see a device, and nothing can be left out.
+TEST(CheckCommand, FindsNothingInTheSmallestUsefulFile) {
+  const std::string page = TextOf(std::filesystem::path(ZKUSB_SOURCE_DIR) / "docs" / "machine-file.md");
+  const std::size_t begin = page.find("```json\n") + 8;
+  const std::string example = page.substr(begin, page.find("```", begin) - begin);
+  const TemporaryFile smallest(example);
+  EXPECT_EQ(RunClient({"check", smallest.Path()}).code, kDone);
+  EXPECT_THAT(Output({"tree", "--machine", smallest.Path()}),
+              testing::AllOf(HasSubstr("USB Host Controller"), HasSubstr("046D:C077"), HasSubstr("USB Input Device")));
+  for (const char* part : {"&SUBSYS_1C268086", "&REV_05", ", \"description\": \"USB Host Controller\""}) {
+    std::string less = example;
+    for (std::size_t at; (at = less.find(part)) != std::string::npos;) less.erase(at, std::string(part).size());
+    const TemporaryFile file(less);
+    EXPECT_EQ(RunClient({"check", file.Path()}).code, kNothingFound) << part;
+    EXPECT_THAT(RunClient({"tree", "--machine", file.Path()}).out, Not(HasSubstr("046D:C077"))) << part;
+  }
 }
 
 TEST(CheckCommand, FindsNothingInTheMachinesAtHand) {
