@@ -159,9 +159,9 @@ OrderedJson DescriptorJson(const USB_DEVICE_DESCRIPTOR& descriptor) {
 OrderedJson JsonOf(const USB_PIPE_INFO& pipe) {
   const USB_ENDPOINT_DESCRIPTOR& endpoint = pipe.EndpointDescriptor;
   OrderedJson json = {{"bEndpointAddress", HexText(endpoint.bEndpointAddress)},
-               {"bmAttributes", endpoint.bmAttributes},
-               {"wMaxPacketSize", std::uint16_t{endpoint.wMaxPacketSize}},
-               {"bInterval", endpoint.bInterval}};
+                      {"bmAttributes", endpoint.bmAttributes},
+                      {"wMaxPacketSize", std::uint16_t{endpoint.wMaxPacketSize}},
+                      {"bInterval", endpoint.bInterval}};
   const std::uint32_t offset = pipe.ScheduleOffset;
   if (offset != 0) json["scheduleOffset"] = offset;
   return json;
@@ -238,7 +238,8 @@ OrderedJson JsonOf(const Volume& volume) {
 }
 
 OrderedJson JsonOf(const Drive& drive) {
-  OrderedJson json = {{"letter", JsonOf(Text(1, drive.letter))}, {"type", kDriveTypes.at(drive.type)}};
+  OrderedJson json = {{"letter", JsonOf(Text(1, drive.letter))},
+                      {"type", kDriveTypes.at(drive.type)}};
   Put(json, "dosDevice", drive.dosDevice);
   PutUnless(json, "device", drive.device, Text());
   return json;

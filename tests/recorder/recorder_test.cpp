@@ -12,7 +12,7 @@ namespace {
 
 using platform::simulated::SimulatedPc;
 
-Machine Recorded(const Machine& machine) {
+Machine RecordedCleanly(const Machine& machine) {
   SimulatedPc pc(machine);
   Machine recorded = RecordMachine(pc);
   EXPECT_EQ(pc.Open(), platform::simulated::OpenCounts());
@@ -22,7 +22,7 @@ Machine Recorded(const Machine& machine) {
 
 // The recording shows what the PC shows; read from its file it is the same recording.
 void ExpectSameBuild(const Machine& machine) {
-  const Machine recorded = Recorded(machine);
+  const Machine recorded = RecordedCleanly(machine);
   EXPECT_TRUE(recorded.notes.empty()) << platform::ToUtf8(recorded.notes.front());
   const Machine read = ReadBack(recorded);
   EXPECT_EQ(WriteMachine(read), WriteMachine(recorded));
@@ -36,7 +36,7 @@ TEST(Recorder, ShowsEveryMachineAsItIs) {
     ExpectSameBuild(machine);
     // A file of its own says the same, too, and its recording has each interface, port and volume of it.
     EXPECT_EQ(WriteMachine(ReadBack(machine)), WriteMachine(machine));
-    Machine recorded = Recorded(machine);
+    Machine recorded = RecordedCleanly(machine);
     EXPECT_EQ(recorded.interfaces.size(), machine.interfaces.size());
     EXPECT_EQ(recorded.hubs.size(), machine.hubs.size());
     EXPECT_EQ(recorded.volumes.size(), machine.volumes.size());

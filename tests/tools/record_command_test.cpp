@@ -8,7 +8,7 @@ namespace {
 using testing::HasSubstr;
 using testing::Not;
 
-std::string TextOf(const std::filesystem::path& path) {
+std::string FileText(const std::filesystem::path& path) {
   std::ifstream stream(path, std::ios::binary);
   return {std::istreambuf_iterator<char>(stream), {}};
 }
@@ -32,16 +32,16 @@ TEST(RecordCommand, WritesTheSamePcWithAndWithoutWhatLeadsToAPerson) {
                 HasSubstr("Nothing was replaced"));
     EXPECT_EQ(Output({"dump", "--machine", whole.Path()}), Output({"dump", "--machine", machine}));
     EXPECT_EQ(Output({"tree", "--json", "--machine", whole.Path()}), Output({"tree", "--json", "--machine", machine}));
-    EXPECT_THAT(TextOf(whole.Path()), HasSubstr(serial));
+    EXPECT_THAT(FileText(whole.Path()), HasSubstr(serial));
 
     EXPECT_THAT(Output({"record", anonymous.Path(), "--machine", machine}), HasSubstr("serial number"));
     const std::string dump = Output({"dump", "--machine", anonymous.Path()});
     EXPECT_EQ(dump.size(), Output({"dump", "--machine", machine}).size());
-    EXPECT_THAT(TextOf(anonymous.Path()), Not(HasSubstr(serial)));
-    EXPECT_THAT(TextOf(anonymous.Path()), HasSubstr("Replaced, equal ones by equal ones: "));
-    const std::string again = TextOf(anonymous.Path());
+    EXPECT_THAT(FileText(anonymous.Path()), Not(HasSubstr(serial)));
+    EXPECT_THAT(FileText(anonymous.Path()), HasSubstr("Replaced, equal ones by equal ones: "));
+    const std::string again = FileText(anonymous.Path());
     Output({"record", anonymous.Path(), "--anonymous", "--machine", machine});
-    EXPECT_EQ(TextOf(anonymous.Path()), again);
+    EXPECT_EQ(FileText(anonymous.Path()), again);
     // What was recorded gives nobody anything to find fault with.
     EXPECT_THAT(Output({"check", anonymous.Path()}), HasSubstr("nothing to find fault with"));
   }
@@ -111,7 +111,7 @@ TEST(CheckCommand, SaysEverythingThatIsWrong) {
 
 // The page's first example is all that a person needs who wants to see a device, and nothing can be left out.
 TEST(CheckCommand, FindsNothingInTheSmallestUsefulFile) {
-  const std::string page = TextOf(std::filesystem::path(ZKUSB_SOURCE_DIR) / "docs" / "machine-file.md");
+  const std::string page = FileText(std::filesystem::path(ZKUSB_SOURCE_DIR) / "docs" / "machine-file.md");
   const std::size_t begin = page.find("```json\n") + 8;
   const std::string example = page.substr(begin, page.find("```", begin) - begin);
   const TemporaryFile smallest(example);
