@@ -65,10 +65,10 @@ TEST(RecordCommand, WritesWhatChangesAsAScript) {
 
 TEST(RecordCommand, RefusesWhatCannotBeDone) {
   const std::tuple<Args, std::string> cases[] = {
-      {{"record"}, "file is required"},
+      {{"record"}, "is required"},
       {{"record", "a", "--anonymous", "--with-serials"}, "--anonymous excludes --with-serials"},
       {{"record", "/no/such/folder/file", "--machine", MachineFile("vmware-win7")}, "cannot be written"},
-      {{"check"}, "file is required"},
+      {{"check"}, "is required"},
       {{"check", "/no/such/file"}, "cannot be read"},
   };
   for (const auto& [args, reason] : cases) {
@@ -104,7 +104,7 @@ TEST(CheckCommand, SaysEverythingThatIsWrong) {
                            testing::StartsWith(inScript + "steps[3]: needs one of"),
                            testing::StartsWith(suspicious + "hubs[0].ports[0].driverKey: no device has the driver key"),
                            testing::StartsWith(suspicious + "drives[")));
-  const ProgramResult json = RunClient({"check", machine.Path(), "--json"});
+  const ProgramResult json = RunProgram(ZKUSB_PROGRAM, {"check", machine.Path(), "--json"});
   EXPECT_EQ(json.code, kNothingFound);
   EXPECT_EQ(Json::parse(json.out).at("findings").size(), 5u);
 }

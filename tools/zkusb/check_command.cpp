@@ -8,6 +8,7 @@
 #include "simulation/machine/machine_file.h"
 #include "simulation/machine/suspicions.h"
 #include "tools/zkusb/json.h"
+#include "tools/zkusb/json_document.h"
 #include "tools/zkusb/run.h"
 
 namespace zkusb {
@@ -31,7 +32,10 @@ class Findings {
 
   int Finish(const std::string& file) {
     if (m_json) {
-      m_out.Json({{"file", file}, {"findings", m_list}}, true);
+      Json document = DocumentHead("check");
+      document["file"] = file;
+      document["findings"] = m_list;
+      m_out.JsonLine(document);
     } else if (m_count == 0) {
       m_out.Line(platform::FromUtf8(file) + u": nothing to find fault with");
     }
