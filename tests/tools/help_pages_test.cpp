@@ -5,7 +5,8 @@ namespace {
 
 using testing::HasSubstr;
 
-const std::vector<std::string> kCommands{"tree", "dump", "find", "volumes", "page", "watch", "register", "unregister"};
+const std::vector<std::string> kCommands{"tree",   "dump",  "find",  "volumes",  "page",
+                                         "record", "check", "watch", "register", "unregister"};
 
 TEST(Help, NamesEveryCommandWithExamplesThatAreOnes) {
   const std::string help = Output({"--help"}), manual = Output({"--man-page"});

@@ -80,14 +80,6 @@ class Grammar {
         .add_option("OUTPUT", m_options.file, "The file to write, such as usb.html")
         ->type_name("")
         ->required();
-    m_for = Add("watch", Command::kWatch)
-                .add_option("--for", "End so long behind the script's end, or behind the start")
-                ->type_name("SECONDS")
-                ->check(CLI::Range(0.0, 86400.0).description(""))
-                // "nan" is neither below nor above it.
-                ->check([](const std::string& text) {
-                  return text.find_first_of("nN") == text.npos ? "" : text + " is not a number";
-                });
     CLI::App& record = Add("record", Command::kRecord);
     record.add_option("OUTPUT", m_options.file, "The machine file to write")
         ->type_name("")
@@ -103,6 +95,14 @@ class Grammar {
         .add_option("INPUT", m_options.file, "The machine file to read")
         ->type_name("")
         ->required();
+    m_for = Add("watch", Command::kWatch)
+                .add_option("--for", "End so long behind the script's end, or behind the start")
+                ->type_name("SECONDS")
+                ->check(CLI::Range(0.0, 86400.0).description(""))
+                // "nan" is neither below nor above it.
+                ->check([](const std::string& text) {
+                  return text.find_first_of("nN") == text.npos ? "" : text + " is not a number";
+                });
     Add("register", Command::kRegister);
     Add("unregister", Command::kUnregister);
   }
