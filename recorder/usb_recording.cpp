@@ -156,7 +156,9 @@ class UsbRecorder {
                        u" of hub " + hubName + u" does not answer the older request.");
     }
     const auto& info = answer.Info;
-    port.status = std::min<std::uint32_t>(info.ConnectionStatus, 255);
+    // A packed record's member binds to no reference.
+    const std::uint32_t status = info.ConnectionStatus;
+    port.status = std::min<std::uint32_t>(status, 255);
     port.speed = static_cast<platform::simulated::Speed>(std::min<std::uint8_t>(info.Speed, 3));
     port.isHub = info.DeviceIsHub != 0;
     if (port.status != platform::NoDeviceConnected) {

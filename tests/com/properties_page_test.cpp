@@ -100,7 +100,8 @@ TEST(PropertiesPage, IsTrueOfFourPcs) {
 
 // No device shows more than full speed.
 TEST(PropertiesPage, SpeedIsLowOrFull) {
-  for (const std::string& speed : Read().at("port device | Speed")) EXPECT_TRUE(speed == "0" || speed == "1") << speed;
+  const auto read = Read();
+  for (const std::string& speed : read.at("port device | Speed")) EXPECT_TRUE(speed == "0" || speed == "1") << speed;
 }
 
 // docs/identifiers.md has the classes as they are registered.

@@ -157,7 +157,8 @@ void RandomPc::ChangeCard(Gadget& gadget) {
 void RandomPc::MountOrDismount() {
   const Machine machine = m_pc->Snapshot();
   if (machine.volumes.empty()) return;
-  const Volume& volume = machine.volumes[Below(static_cast<std::uint32_t>(machine.volumes.size()))];
+  const platform::simulated::Volume& volume =
+      machine.volumes[Below(static_cast<std::uint32_t>(machine.volumes.size()))];
   if (!volume.paths.empty()) {
     return Apply({0, {}, Dismount{volume.name, volume.paths[0]}}, "dismount", volume.name);
   }

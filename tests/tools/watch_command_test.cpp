@@ -103,7 +103,7 @@ TEST(WatchCommand, TellsTheEventsThatAreKept) {
     for (const Json& line :
          JsonLines(Output({"watch", "--json", "--machine", MachineFile(expected.at("machine")), "--script", file}))) {
       if (line.contains("event") && !line.at("event").is_null()) {
-        told.push_back({line.at("event"), line.at("InstanceId"), line.value("MountPoints", Json())});
+        told.push_back({line.at("event"), line.at("InstanceId"), line.value("mountPoints", Json())});
       }
     }
     EXPECT_EQ(told.dump(1), expected.at("events").dump(1)) << script;

@@ -97,7 +97,7 @@ TEST(ScriptFile, ReadyMadeScriptsEndWhereTheyBegin) {
   const std::string path = ZKUSB_SOURCE_DIR "/docs/machine-file.md";
   std::ifstream file(path);
   const std::string text((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
-  const std::size_t start = text.find("```json\n");
+  const std::size_t start = text.rfind("```json\n", text.find("\"steps\""));
   ASSERT_NE(start, std::string::npos);
   const std::string example = text.substr(start + 8, text.find("\n```", start) - start - 8);
   EXPECT_EQ(ParseScript(example, path, LoadMachine(folder + "dell-precision.json")).size(), 2u);
