@@ -25,7 +25,7 @@ class CZKUMInterfaceDevice : public CZKUMUsbTreeNode, public IZKUMInterfaceDevic
   HRESULT STDMETHODCALLTYPE get_MountPoint(BSTR* pVal) override;
   // Refills the one collection of this object, also for a null pointer, and raises E_OUTOFMEMORY
   // when a text cannot be copied. The enumerator keeps the record, but the object must be kept for
-  // as long as the enumerator is used: it owns the collection. All of it is meant.
+  // as long as the enumerator is used: it owns the collection. All of this is deliberate.
   HRESULT STDMETHODCALLTYPE get_MountPoints(IEnumVARIANT** ppIUsbTreeNode) override;
 
  private:

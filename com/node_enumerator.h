@@ -26,7 +26,7 @@ class CZKUMNodeEnumerator : public ObjectRoot, public IZKUMUsbTreeNodeEnumerator
   using Interfaces = InterfaceMap<IZKUMUsbTreeNodeEnumerator>;
 
   // The pointer is not tested, and the position grows with every call, also behind the end. Both
-  // are meant.
+  // are deliberate.
   HRESULT STDMETHODCALLTYPE MoveNext(VARIANT_BOOL* pbSuccess) noexcept override;
   // E_FAIL for an element without object and outside the list.
   HRESULT STDMETHODCALLTYPE GetCurrent(IZKUMUsbTreeNode** ppIUsbTreeNode) noexcept override;

@@ -16,7 +16,7 @@ namespace KelvoUHW {
 namespace {
 
 // A copy of the text with no test of the allocation: a null text and S_OK when memory runs out.
-// This is meant.
+// This is deliberate.
 HRESULT CopyUntested(const std::u16string& text, BSTR* out) noexcept {
   *out = platform::MakeBstr(platform::UpToZero(text));
   return S_OK;
@@ -42,9 +42,9 @@ HRESULT CZKUMUsbTreeNode::get_Type(TUsbDeviceType* pType) noexcept {
 }
 
 // The object made here owns the parent record together with nobody: when the caller releases it,
-// the record is destroyed while the tree still refers to it. This is meant. What refers to it holds
-// nothing from then on. Nothing is destroyed between the look at the link and the handle, since
-// whoever destroys waits for readers.
+// the record is destroyed while the tree still refers to it. This is deliberate. What refers to it
+// holds nothing from then on. Nothing is destroyed between the look at the link and the handle,
+// since whoever destroys waits for readers.
 HRESULT CZKUMUsbTreeNode::get_Parent(IZKUMUsbTreeNode** ppIUsbTreeNode) noexcept {
   return Guarded([&] {
     if (ppIUsbTreeNode == nullptr) return E_POINTER;
@@ -152,7 +152,7 @@ HRESULT CZKUMUsbTreeNode::get_Product(BSTR* pVal) {
 }
 
 // The owner that the enumerator keeps alive is a second object on the same record, not this one.
-// This is meant: whoever holds the enumerator holds the record, and keeps this object himself.
+// Deliberate: whoever holds the enumerator holds the record, and keeps this object himself.
 HRESULT CZKUMUsbTreeNode::MakeCollection(IEnumVARIANT** out,
                                          const VariantVector& items) const noexcept {
   ComPtr<IZKUMUsbTreeNode> owner;

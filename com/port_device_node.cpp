@@ -66,7 +66,7 @@ HRESULT CZKUMPortDevice::get_InterfaceDescriptors(IEnumVARIANT** ppIIiterfaceDes
   });
 }
 
-// This is meant: the node tested is the one passed in and not this object, and when it is itself of
+// Deliberate: the node tested is the one passed in and not this object, and when it is itself of
 // the kind it is handed back without a reference and without a test of the out pointer.
 HRESULT CZKUMPortDevice::get_FirstChildOfType(IZKUMUsbTreeNode* pNode, TUsbDeviceType nType,
                                               IZKUMUsbTreeNode** ppNodeOfType) noexcept {

@@ -26,7 +26,7 @@ class CZKUMPortDevice
   HRESULT STDMETHODCALLTYPE get_NumberInterfaces(BYTE* pVal) noexcept override;
   // Refills the one collection of this object, also for a null pointer. The enumerator keeps the
   // record, but the object must be kept for as long as the enumerator is used: it owns the
-  // collection. All of it is meant.
+  // collection. All of this is deliberate.
   HRESULT STDMETHODCALLTYPE
   get_InterfaceDescriptors(IEnumVARIANT** ppIIiterfaceDescr) noexcept override;
   HRESULT STDMETHODCALLTYPE get_FirstChildOfType(IZKUMUsbTreeNode* pNode, TUsbDeviceType nType,

@@ -11,8 +11,8 @@
 namespace KelvoUHW {
 
 // A text is first made into a BSTR of its own, which raises E_OUTOFMEMORY when it cannot be, and
-// only then is the out pointer tested. Both are meant: callers see the exception also where they
-// pass null.
+// only then is the out pointer tested. Both are deliberate: callers see the exception also where
+// they pass null.
 class IntermediateBstr {
  public:
   explicit IntermediateBstr(std::u16string_view text);

@@ -39,7 +39,7 @@ std::vector<NodePtr> PortDevices(const NodePtr& root, Passes passes) {
 }
 
 // Appends a new object for each device that passes. One that cannot be made is appended all the
-// same, as a null pointer: this is meant, the list tells how many there are.
+// same, as a null pointer: by design, the list tells how many there are.
 template <class Passes>
 void AppendDevices(const NodePtr& root, VariantVector& items, Passes passes) {
   for (const NodePtr& device : PortDevices(root, passes)) {

@@ -207,8 +207,9 @@ void InfoDeviceCache::KeepAsNewUnlessPrevious(const InfoDevicePtr& record) {
 void InfoDeviceCache::CreateDiskDriveRecords() {
   CommonParent common(m_current);
   for (const DeviceNodeRecord& drive : m_diskDrives) {
-    // This is meant, though it reads the wrong way round: a drive gets a record of its own only
-    // when every current record lies below it (or there is none), not when it has no record yet.
+    // This is deliberate, though it reads the wrong way round: a drive gets a record of its own
+    // only when every current record lies below it (or there is none), not when it has no record
+    // yet.
     if (!common.AllName(drive.InstanceId)) continue;
     const InfoDevicePtr record = MakeRecord<CZKUMInfoDeviceImpl>();
     record->SetInstanceId(drive.InstanceId);

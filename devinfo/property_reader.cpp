@@ -23,7 +23,7 @@ constexpr std::uint32_t kMostInstanceIdChars = 1U << 16;
 // More than the 200 characters that an id has at most; others are asked for twice.
 constexpr std::uint32_t kFirstInstanceIdChars = 256;
 
-// This is meant: services are compared ignoring case, classes exactly.
+// Deliberate: services are compared ignoring case, classes exactly.
 bool IsExcludedService(std::u16string_view service) noexcept {
   return std::ranges::any_of(kExcludedServices, [&](std::u16string_view excluded) {
     return platform::EqualIgnoringCase(service, excluded);

@@ -98,9 +98,9 @@ bool ReadClass(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
 bool ReadService(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
                  CZKUMInfoDeviceImpl& record);
 
-// The elements that were passed over since the last one that got a record. This is meant: a new
-// record shows what they have and it lacks itself. Which of their properties that are is known only
-// then, so nothing else of them is ever read.
+// The elements that were passed over since the last one that got a record. Deliberate: a new record
+// shows what they have and it lacks itself. Which of their properties that are is known only then,
+// so nothing else of them is ever read.
 //
 // An element that is excluded leaves all its properties. One that is rejected for its parent leaves
 // location, enumerator and serial number, and nothing of those before it but the same three.
@@ -135,7 +135,7 @@ class PassedElements {
 // Stores all other properties of an element; one that neither the element nor those passed over
 // have leaves its field as it was.
 //
-// This is meant: LegacyBusType and UiNumber take the registry data type of their property (4 for an
+// Deliberate: LegacyBusType and UiNumber take the registry data type of their property (4 for an
 // ordinary node), not its value.
 void ReadOtherProperties(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
                          PassedElements& passed, CZKUMInfoDeviceImpl& record);

@@ -39,7 +39,7 @@ void StorageCache::OpenEnumeration(InterfaceEnumeration& enumeration) {
   DeviceSet set(m_host);
   set.Open(&enumeration.InterfaceClass,
            platform::kDIGCF_PRESENT | platform::kDIGCF_DEVICEINTERFACE);
-  // This is meant: the earlier set is not destroyed, its handle is only overwritten.
+  // Deliberate: the earlier set is not destroyed, its handle is only overwritten.
   enumeration.Set = set.Release();
 }
 
@@ -67,7 +67,7 @@ RingPtr<CZKUMInterfaceDeviceImpl> StorageCache::ReadInterface(
   }
   record->Detail = GetInterfaceDetail(m_host, m_host, enumeration.Set, &record->InterfaceData,
                                       &record->DeviceData);
-  // This is meant: an unreadable detail ends the enumeration, whatever would come behind it.
+  // Deliberate: an unreadable detail ends the enumeration, whatever would come behind it.
   if (!record->Detail) return {};
   return record;
 }

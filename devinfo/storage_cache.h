@@ -18,9 +18,9 @@ namespace KelvoUHW {
 // and each pass; a pass makes new ones and does not touch those of the pass before.
 class StorageCache {
  public:
-  // `host` must outlive the cache. This is meant: a volume set is opened here already, and no set
-  // of the cache is ever destroyed. A pass overwrites the handles of the one before and adds two
-  // sets to those that are open.
+  // `host` must outlive the cache. Deliberate: a volume set is opened here already, and no set of
+  // the cache is ever destroyed. A pass overwrites the handles of the one before and adds two sets
+  // to those that are open.
   explicit StorageCache(platform::Host& host) : StorageCache(host, host) {}
   // Ids and parents of device-manager nodes are asked of `nodes`, which must outlive the cache too.
   StorageCache(platform::Host& host, platform::DeviceManager& nodes);
@@ -57,7 +57,7 @@ class StorageCache {
   InterfaceEnumeration m_volumeEnumeration;
   std::vector<NodePtr> m_volumes;
   std::size_t m_acceptedVolumes = 0;  // the first ones of m_volumes
-  // This is meant: both spare lists are emptied by each pass, and nothing fills them.
+  // Deliberate: both spare lists are emptied by each pass, and nothing fills them.
   std::vector<NodePtr> m_spare;
   InterfaceEnumeration m_diskEnumeration;
   std::vector<NodePtr> m_disks;

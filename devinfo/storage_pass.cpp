@@ -73,9 +73,8 @@ StorageOutcome StoragePass::PrepareDiskRecord(CZKUMInterfaceDeviceImpl& record) 
 
 bool StoragePass::KeepsDisk(CZKUMInterfaceDeviceImpl& record) {
   record.DeviceHandle.reset();
-  // This is meant: a disk is kept when its query does not succeed. The handle was just closed, so
-  // the query always fails: every disk is kept, without descriptor, and leaves a line of
-  // diagnostics.
+  // Deliberate: a disk is kept when its query does not succeed. The handle was just closed, so the
+  // query always fails: every disk is kept, without descriptor, and leaves a line of diagnostics.
   return QueryStorageProperties(m_host, m_host, record, m_diagnostics) != KStorageAccepted;
 }
 

@@ -15,8 +15,8 @@ namespace {
 
 constexpr std::size_t kMediaSerialBytes = 800;
 constexpr std::size_t kMediaSerialTextOffset = 16;
-// This is meant: four bytes are asked for although there is room for 800. A system that keeps to
-// the size sends no text, and the media serial number stays empty.
+// Deliberate: four bytes are asked for although there is room for 800. A system that keeps to the
+// size sends no text, and the media serial number stays empty.
 constexpr std::uint32_t kMediaSerialBytesAsked = 4;
 
 constexpr std::uint32_t kVolumeTextChars = 512;
@@ -72,7 +72,7 @@ StorageOutcome QueryStorageProperties(platform::DeviceIo& io, platform::VolumeMa
     return KStorageRejected;
   }
   ParseDescriptor(record);
-  // This is meant: CD and DVD drives are no volumes of ours.
+  // Deliberate: CD and DVD drives are no volumes of ours.
   if (record.m_strDeviceDescr == StorageDeviceTypeName(kCdromDeviceType)) return KStorageRejected;
 
   const platform::FileHandle device =
@@ -116,8 +116,8 @@ std::uint32_t QueryVolumeSerialNumber(platform::VolumeManager& volumes,
   std::array<char16_t, kVolumeTextChars> fileSystem{};
   std::uint32_t serialNumber = kUnknownVolumeSerialNumber;
   std::uint32_t fileSystemFlags = 0;
-  // This is meant: the path goes in as it is, without the backslash at its end that the call asks
-  // for, so a strict system tells no serial number.
+  // Deliberate: the path goes in as it is, without the backslash at its end that the call asks for,
+  // so a strict system tells no serial number.
   const platform::Status status =
       volumes.VolumeInformation(devicePath.c_str(), label.data(), kVolumeTextChars, serialNumber,
                                 fileSystemFlags, fileSystem.data(), kVolumeTextChars);

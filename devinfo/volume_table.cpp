@@ -116,7 +116,7 @@ class VolumeTableBuilder {
       if (!text) return;
       const std::u16string path = root + *text;
       const auto mounted = VolumeNameOf(m_volumes, path);
-      // This is meant: a folder whose volume is not known ends the search of this volume.
+      // Deliberate: a folder whose volume is not known ends the search of this volume.
       if (!mounted) return;
       if (!Enter(path, *mounted)) return;
       folder.fill(u'\0');
@@ -193,8 +193,8 @@ void MountPointFinder::Fill() {
 
 void MountPointFinder::EnterDriveRoots() {
   for (const std::u16string& root : ReadDriveRoots(m_volumes)) {
-    // This is meant, here and for path names: volumes on drives that call themselves fixed, USB
-    // hard disks among them, get no mount points.
+    // This is deliberate, here and for path names: volumes on drives that call themselves fixed,
+    // USB hard disks among them, get no mount points.
     if (m_volumes.DriveType(root.c_str()) != platform::kDRIVE_REMOVABLE) continue;
     if (const auto name = VolumeNameOf(m_volumes, root)) {
       m_mountPoints[platform::ToLower(*name)].push_back(root);

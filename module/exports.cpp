@@ -51,7 +51,7 @@ ZKUSB_EXPORT HRESULT STDAPICALLTYPE DllGetClassObject(REFCLSID clsid, REFIID iid
   return g_module->GetClassObject(clsid, iid, out);
 }
 
-// Nothing is done with either argument. This is meant.
+// Nothing is done with either argument. This is deliberate.
 ZKUSB_EXPORT HRESULT STDAPICALLTYPE DllInstall(BOOL, const OLECHAR*) { return S_OK; }
 
 ZKUSB_EXPORT HRESULT STDAPICALLTYPE DllRegisterServer() { return g_module->RegisterServer(); }

@@ -16,7 +16,7 @@ using platform::FromSystemGuid;
 // is unloaded.
 //
 // The tree is registered as "ZKUMUsbTree Class" although the type library calls the same class "USB
-// Tree". Both are published and meant.
+// Tree". Both are published and deliberate.
 const std::array kClasses = {
     RegisteredClass{FromSystemGuid(CLSID_ZKUMUsbTree), RegistryScript(ScriptResource::UsbTree),
                     u"KelvoUsbMonitor.UsbTree", u"1", u"ZKUMUsbTree Class", u"Free"},

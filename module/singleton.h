@@ -55,7 +55,7 @@ class CSingletonExComObject2 final : public T {
     return QueryByMap<T>(this, iid, out);
   }
   ULONG STDMETHODCALLTYPE AddRef() noexcept override { return static_cast<ULONG>(++this->m_nRef); }
-  // 0 when it destroyed the object, else 255 and not the count that is left. This is meant.
+  // 0 when it destroyed the object, else 255 and not the count that is left. This is deliberate.
   ULONG STDMETHODCALLTYPE Release() noexcept override {
     using State = SingletonState<T, Base>;
     platform::CriticalSection& lock = State::Lock();

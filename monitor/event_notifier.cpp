@@ -16,7 +16,7 @@ using KelvoUHW::NodePtr;
 namespace {
 
 // The lists in the order in which they are fired: what was attached before what is connected. This
-// is meant.
+// is deliberate.
 constexpr std::array<TDeviceEventType, 4> kFiringOrder{KDeviceAttached, KDeviceConnected,
                                                        KDeviceRemoved, KDeviceModified};
 
@@ -57,7 +57,7 @@ HRESULT CZKUMEventNotifier::FinalConstruct() noexcept {
       result = self->QueryInterface(platform::IidOf<IZKUMPrivateNotifier>(), target.PutVoid());
     }
     // Started also without a target, and whether it could be started is nobody's business: both are
-    // meant.
+    // deliberate.
     m_receiver.Start(target.Get());
     return result;
   });
@@ -160,7 +160,7 @@ HRESULT CZKUMEventNotifier::FireDeviceEvent(TDeviceEventType kind, const NodePtr
     const ComPtr<IUnknown> data = node.As<IUnknown>();
     return Fire_OnDeviceChanged(kind, data.Get(), filter);
   } catch (...) {
-    // Nothing ends, whatever the text says, and the next device is fired. This is meant.
+    // Nothing ends, whatever the text says, and the next device is fired. This is deliberate.
     std::printf("Error caught\t-\tterminating");
     return S_FALSE;
   }

@@ -15,8 +15,8 @@
 // unadvise and ask whatever it likes from inside the call.
 //
 // From the end of its construction the notifier holds a reference to itself, through the receiver's
-// target: it lives until the module is unloaded, whoever releases it. This is meant; it keeps the
-// one window thread and its registrations alive.
+// target: it lives until the module is unloaded, whoever releases it. This is deliberate; it keeps
+// the one window thread and its registrations alive.
 class CZKUMEventNotifier : public KelvoUHW::ObjectRoot,
                            public ISupportErrorInfo,
                            public IConnectionPointContainer,
@@ -35,7 +35,7 @@ class CZKUMEventNotifier : public KelvoUHW::ObjectRoot,
   void FinalRelease() noexcept;
 
   // S_OK for IZKUMEventNotifier alone, though no operation ever sets error information. This is
-  // meant.
+  // deliberate.
   HRESULT STDMETHODCALLTYPE InterfaceSupportsErrorInfo(REFIID riid) noexcept override;
 
   HRESULT STDMETHODCALLTYPE EnumConnectionPoints(IEnumConnectionPoints** ppEnum) noexcept override;

@@ -111,7 +111,7 @@ void WinBaseO::FatalError(std::uint32_t code) {
 platform::LResult WinBaseO::WndProc(platform::WindowHandle window, std::uint32_t message,
                                     platform::WParam wParam, platform::LParam lParam) {
   // An exception neither reaches the system's dispatch nor shows anything: the texts are made and
-  // dropped. It is meant so.
+  // dropped. This is deliberate.
   try {
     try {
       return OnMessage(window, message, wParam, lParam);

@@ -15,7 +15,7 @@ namespace KelvoUHW {
 //
 // The destructor frees the array and not the sinks that are still in it: at that time the process
 // ends or the module is unloaded, and nobody knows whether their code is still there. This is
-// meant.
+// deliberate.
 class SinkSlots {
  public:
   struct Connection {

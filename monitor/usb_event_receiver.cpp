@@ -20,8 +20,8 @@ namespace {
 constexpr std::uint32_t kWindowPollMilliseconds = 10;
 // So long for the window once its object is there. Where none comes the process is about to end.
 constexpr std::uint32_t kLongestWindowWaitMilliseconds = 5000;
-// A watched device's removal is looked at late, its arrival and every volume at once: it is meant
-// so.
+// A watched device's removal is looked at late, its arrival and every volume at once: this is
+// deliberate.
 constexpr std::uint32_t kRemovalDelayMilliseconds = 3000;
 
 // The prefix of a device-interface path; whatever stands there is skipped unseen.

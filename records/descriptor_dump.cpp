@@ -82,8 +82,8 @@ void DumpConfigurationDescriptor(DescriptorWriter writer, const StringDescriptor
   }
   if (const auto attributes = writer.Byte(7)) {
     writer.Line(u"bmAttributes:         0x", Hex(*attributes, 2), u" (");
-    // Each word carries the prefix although it stands within the line: meant
-    // so, readers of dumps know the line in this form.
+    // Each word carries the prefix although it stands within the line: by design, since readers of
+    // dumps know the line in this form.
     if (*attributes & 0x80) writer.Line(u"Bus Powered ");
     if (*attributes & 0x40) writer.Line(u"Self Powered ");
     if (*attributes & 0x20) writer.Line(u"Remote Wakeup");

@@ -113,12 +113,12 @@ void NodeIdentity::ParseInstanceId() {
     if (!FindField(id, u"VEN_", u'&', field)) return;
     m_strVendor = field.text;
     m_strProduct.clear();
-    // The product name runs up to the backslash, revision included. This is meant: it is the name
+    // The product name runs up to the backslash, revision included. Deliberate: it is the name
     // under which storage devices are told apart.
     if (!FindField(field.rest, u"PROD_", u'\\', field)) return;
     m_strProduct = field.text;
   }
-  // The whole last component, a trailing "&0" included, is meant to be the serial number.
+  // The serial number is deliberately the whole last component, including a trailing "&0".
   SetSerialNumber(std::u16string(id.substr(id.rfind(u'\\') + 1)));
 }
 
@@ -152,8 +152,8 @@ platform::Guid ParseGuidText(const char16_t* text) noexcept {
                                                   {2, u"", 32},
                                                   {2, u"", 34},
                                                   {2, u"", 36}}};
-  // This is meant: the first three numbers stay when the text is broken behind them, or when a
-  // group is shorter than it should be. Only the eight bytes wait for the whole text to be right.
+  // Deliberate: the first three numbers stay when the text is broken behind them, or when a group
+  // is shorter than it should be. Only the eight bytes wait for the whole text to be right.
   std::array<std::uint8_t, 8> bytes{};
   bool inPlace = true;
   Scanner scanner(text + 1);

@@ -55,7 +55,7 @@ struct NodeIdentity {
 std::uint32_t ParseHexField(const char16_t* text, std::size_t count) noexcept;
 
 // A GUID in registry form. The first character, expected to be a brace, is skipped unseen. A text
-// that is broken after its first groups gives those groups and zeros: it is meant so.
+// that is broken after its first groups gives those groups and zeros: this is deliberate.
 platform::Guid ParseGuidText(const char16_t* text) noexcept;
 
 // "USB#ROOT_HUB20#4&2f5a2f0&0#{...}" becomes "USB\ROOT_HUB20\4&2F5A2F0&0": cut at the last #, the

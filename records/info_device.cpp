@@ -9,9 +9,8 @@ namespace KelvoUHW {
 
 namespace {
 
-// Bus types from -1 up. The last name, for 17, is no bus type but the first excluded service: this
-// is meant, the dump has always let that value through and shown the text that lies behind the
-// table.
+// Bus types from -1 up. The last name, for 17, is no bus type but the first excluded service: by
+// design, the dump has always let that value through and shown the text that lies behind the table.
 constexpr std::array<std::u16string_view, 19> kBusTypeNames{u"InterfaceTypeUndefined",
                                                             u"Internal",
                                                             u"Isa",
@@ -57,7 +56,7 @@ void CZKUMInfoDeviceImpl::OwnLines(std::u16string& out, const std::u16string& in
 
   AppendLine(out, indent, u" Info ------------------------------------------");
   BaseToString(out, indent);
-  // This is meant: the class name decides about the line, the text of its GUID is what it shows.
+  // Deliberate: the class name decides about the line, the text of its GUID is what it shows.
   if (!DevClass.empty()) AppendLine(out, indent, u"SPDRP_CLASS: ", ClassGuidText);
   if (ClassGuid != platform::kNullGuid) {
     AppendLine(out, indent, u"SPDRP_CLASS: ", platform::GuidText(ClassGuid));

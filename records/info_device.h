@@ -15,7 +15,7 @@ class CZKUMInfoDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   CZKUMInfoDeviceImpl();
   void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
-  // Makes the record ready for the next node. Serial number, Location and EnumName are meant to
+  // Makes the record ready for the next node. Serial number, Location and EnumName deliberately
   // stay: a node that lacks them shows those of the node read before it.
   void Reset();
 

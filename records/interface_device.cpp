@@ -20,7 +20,7 @@ constexpr std::array<std::u16string_view, 16> kDeviceTypeNames{
     u"Optical Disk",
     u"Media Changer",
     u"Comm. Device",
-    // This is meant: types 10 and 11 share one name.
+    // Deliberate: types 10 and 11 share one name.
     u"ASCIT8",
     u"ASCIT8",
     u"Array Device",
@@ -50,7 +50,7 @@ platform::STORAGE_DEVICE_DESCRIPTOR CZKUMInterfaceDeviceImpl::DescriptorHeader()
 
 void CZKUMInterfaceDeviceImpl::DevicePropertiesToString(std::u16string& out,
                                                         const std::u16string& indent) const {
-  // This is meant: the lines stand in every dump, also in that of a disk, whose descriptor is never
+  // Deliberate: the lines stand in every dump, also in that of a disk, whose descriptor is never
   // received and so reads as a fixed direct-access device without texts.
   const platform::STORAGE_DEVICE_DESCRIPTOR header = DescriptorHeader();
   AppendLine(out, indent, u"Device Properties:");
@@ -76,7 +76,7 @@ void CZKUMInterfaceDeviceImpl::OwnLines(std::u16string& out, const std::u16strin
   BaseToString(out, indent);
   DevicePropertiesToString(out, indent);
   AppendLine(out, indent, u"DevicePath: ", DevicePath());
-  // This is meant: the number is printed signed, so an unknown one reads -1.
+  // Deliberate: the number is printed signed, so an unknown one reads -1.
   AppendLine(out, indent, u"Volume serial number: ",
              platform::Decimal(static_cast<std::int32_t>(VolumeSerialNumber)));
   if (!MediaSerialNumber.empty()) {

@@ -85,7 +85,7 @@ void CZKUMUsbTreeNodeImpl::ToString(std::u16string& out, std::u16string indent) 
   std::vector<Level> path;
   const auto enter = [&](const CZKUMUsbTreeNodeImpl& node) {
     node.OwnLines(out, indent);
-    // The number is the constant 0 and not the count of children. This is meant: readers of dumps
+    // The number is the constant 0 and not the count of children. Deliberate: readers of dumps
     // depend on the line as it is.
     out += u"childvector size0\r\n";
     path.push_back({&node, 0});

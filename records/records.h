@@ -39,7 +39,7 @@ class CZKUMHubDeviceImpl final : public CZKUMUsbTreeNodeImpl {
  public:
   CZKUMHubDeviceImpl() noexcept : CZKUMUsbTreeNodeImpl(KUDTHub) {}
   // The connection record stays allocated for the life of the process: it is handed on, not freed.
-  // Only the string list and the port information are freed. This is meant.
+  // Only the string list and the port information are freed. This is deliberate.
   ~CZKUMHubDeviceImpl() override;
   void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 

@@ -102,7 +102,7 @@ std::vector<DeviceNodeRecord> DeviceRecordReader::Read() {
     DeviceNodeRecord record;
     record.DevInst = data.DevInst;
     if (!m_answers.GetParent(data.DevInst, record.ParentDevInst)) {
-      // Everything read so far is dropped and the set stays open. This is meant: a PC that shows a
+      // Everything read so far is dropped and the set stays open. Deliberate: a PC that shows a
       // device without parent has no device-manager side at all.
       m_set.Release();
       return {};
@@ -281,7 +281,7 @@ void AddController(const DeviceNodeRecord& record, CZKUMUsbTreeNodeImpl& root) {
       port->SetInstanceId(deviceRecord.InstanceId + u" port 0");
       port->SetParentInstanceId(deviceRecord.ParentInstanceId);
       AddChild(port, hub.Get());
-      // The class name stands where a driver key belongs. This is meant.
+      // The class name stands where a driver key belongs. This is deliberate.
       AddChild(MakeRecord<CZKUMPortDeviceImpl>(deviceRecord.DevInst, nullptr, nullptr, nullptr,
                                                deviceRecord.ClassName, deviceRecord.Name,
                                                deviceRecord.InstanceId),
@@ -318,7 +318,7 @@ std::vector<DeviceNodeRecord> ReadDeviceForest(platform::Host& host, DeviceAnswe
 void AddForestNodes(const std::vector<DeviceNodeRecord>& forest, CZKUMUsbTreeNodeImpl& root) {
   VisitForest(forest, [&root](const DeviceNodeRecord& record) {
     // Anywhere in the id and exact in case; whatever the class, it becomes a controller. This is
-    // meant.
+    // deliberate.
     if (record.InstanceId.find(u"PCI\\") == std::u16string::npos) return true;
     AddController(record, root);
     return false;

@@ -24,7 +24,8 @@ class DeviceRecordReader {
 
   // Handles, class and element of every device, in the system's order. A device without parent ends
   // the reading at once with nothing read, and the device-information set stays open: this is
-  // meant. A failing set or image list gives an empty result. The records have no children yet.
+  // deliberate. A failing set or image list gives an empty result. The records have no children
+  // yet.
   std::vector<DeviceNodeRecord> Read();
   // Fills the texts of a record that Read gave.
   void Complete(DeviceNodeRecord& record);

@@ -98,7 +98,7 @@ std::u16string GetHcdDriverKeyName(platform::DeviceIo& io, platform::FileHandle 
 }
 
 std::u16string GetRootHubName(platform::DeviceIo& io, platform::FileHandle controller) {
-  // No input and no test of the size, unlike the other name queries. This is meant: the controller
+  // No input and no test of the size, unlike the other name queries. Deliberate: the controller
   // driver takes nothing in.
   return AskForName(io, controller, platform::kIOCTL_USB_GET_ROOT_HUB_NAME, platform::UsbNameHead{},
                     false, 0);
@@ -138,7 +138,7 @@ bool GetConnectionInformation(platform::DeviceIo& io, platform::FileHandle hub, 
   record.Info.DeviceDescriptor = from.DeviceDescriptor;
   record.Info.CurrentConfigurationValue = from.CurrentConfigurationValue;
   // A device never shows more than full speed: the older request knows low speed or not. This is
-  // meant, as is discarding the newer answer, which would know.
+  // deliberate, as is discarding the newer answer, which would know.
   record.Info.Speed = from.LowSpeed == 0 ? platform::UsbFullSpeed : platform::UsbLowSpeed;
   record.Info.DeviceIsHub = from.DeviceIsHub;
   record.Info.DeviceAddress = from.DeviceAddress;

@@ -78,8 +78,7 @@ void CZKUMTopologyWalker::AddLegacyControllers() {
 
 void CZKUMTopologyWalker::AddInterfaceControllers() {
   // The all-zero class is no controller's class, so this source finds nothing on an ordinary PC.
-  // This is meant: the interface class of host controllers would bring each of them in a second
-  // time.
+  // Deliberate: the interface class of host controllers would bring each of them in a second time.
   DeviceSet set(m_host);
   if (!set.Open(&platform::kNullGuid,
                 platform::kDIGCF_PRESENT | platform::kDIGCF_DEVICEINTERFACE)) {
@@ -94,7 +93,7 @@ void CZKUMTopologyWalker::AddInterfaceControllers() {
       OpenController(detail.DevicePath());
     }
     // The shared query without an element to fill gives nothing, so nothing more is opened. This is
-    // meant.
+    // deliberate.
     if (const InterfaceDetail more =
             GetInterfaceDetail(m_host, m_host, set.Get(), &data, nullptr)) {
       OpenController(more.DevicePath());

@@ -95,7 +95,7 @@ TEST_F(InfoDeviceCacheTest, AdmitsByTheStartOfTheParentId) {
             "V\\_??_SCSI#DISK#1#{x} _USB\\P _USBSTOR\\P _IUSB\\P _SD\\P _SDX\\P _PCI\\P _SCSI\\P");
 }
 
-// This is meant: what an excluded or a rejected node leaves in the record, the next node shows.
+// Deliberate: what an excluded or a rejected node leaves in the record, the next node shows.
 TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
   Device excluded = BareDevice(u"USB\\P");
   excluded.friendlyName = excluded.location = excluded.enumerator = excluded.manufacturer = u"other";
@@ -176,7 +176,7 @@ TEST_F(InfoDeviceCacheTest, WhatPassesReport) {
   EXPECT_EQ(Ids(cache->Pending()), "USB\\D");
 }
 
-// This is meant: a drive gets a record only when every current record names it as its parent.
+// Deliberate: a drive gets a record only when every current record names it as its parent.
 TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
   const auto drive = [](const char16_t* id, const char16_t* parent) {
     DeviceNodeRecord record;

@@ -129,7 +129,7 @@ TEST(InfoDeviceProperties, FillTheirFields) {
   for (const auto& [property, field] : fields) {
     sets.values[property].text = u"{0000000A " + std::u16string(property, u'x');
   }
-  // This is meant: the registry data types are stored, not the values.
+  // Deliberate: the registry data types are stored, not the values.
   sets.values[kSPDRP_LEGACYBUSTYPE] = {.text = u"\x05", .type = kREG_DWORD};
   sets.values[kSPDRP_UI_NUMBER] = {.text = u"\x09", .type = kREG_MULTI_SZ};
   ASSERT_TRUE(Read(sets, record));

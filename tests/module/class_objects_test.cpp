@@ -317,7 +317,7 @@ TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {
       }
       EXPECT_FALSE(HasInstance(CLSID_ZKUMEventNotifier) || HasInstance(CLSID_ZKUMUsbTree));
       EXPECT_EQ(ModuleLockCount(), 0);
-      // Whether its code is still there is not known, so it is not released. This is meant.
+      // Whether its code is still there is not known, so it is not released. This is deliberate.
       EXPECT_EQ(sink.References(), 2);
       EXPECT_EQ(plug(u"S3", 3, u'G'), told);
       EXPECT_EQ(process.desktop.Calls(DesktopCall::StartThread), threads);

@@ -48,7 +48,7 @@ TEST_F(EventRuns, AdvisingAnotherInsideACall) {
     pc.a.keeps = nullptr;
     EXPECT_EQ(pc.point->Unadvise(2), S_OK);
     // Both the advise and the run settled what was found, after which nothing counts as known: the next run tells of
-    // all that is there as attached. It is meant so.
+    // all that is there as attached. This is deliberate.
     for (const char* told : {test.after, ""}) {
       EXPECT_EQ(pc.Notify(), S_OK);
       EXPECT_EQ(Taken(pc.log), told);
@@ -77,7 +77,7 @@ TEST_F(EventRuns, TellEachSinkWhatItIsMeantToHear) {
          "B 3 CR"}}},
       {"on an unchanged PC a new sink is told what the last change left connected, and nobody else is called",
        {{{}, kAdviseB, "B 0 S1, B 0 CR"}, {{}, kRun, ""}, {{}, kUnadviseB, ""}, {{}, kAdviseB, "B 0 S1, B 0 CR"}}},
-      {"a reader whose card is taken out counts as removed with it, and comes back with the next run: it is meant so",
+      {"a reader whose card is taken out counts as removed with it, and comes back with the next run: by design",
        {{{Volume(DiskId(u"CR", 0), u'K')}, kRun, "A 0 S1, A 0 CR, A 3 S1, A 3 CR, A 3 CR"},
         {{}, kRun, ""},
         {{Unplug{VolumeId(DiskId(u"CR", 0))}}, kRun, "A 0 S1, A 2 CR, A 3 S1"},

@@ -42,7 +42,7 @@ std::string DumpWith(const std::string& classLine, const std::string& busType) {
 TEST(InfoDevice, DumpsEveryFieldAndResetLeavesThree) {
   CZKUMInfoDeviceImpl device;
   FillEveryField(device);
-  // The class name decides about the first class line and is not in it: this is meant.
+  // The class name decides about the first class line and is not in it: this is deliberate.
   EXPECT_EQ(DumpOf(device, u"> "), Golden("info-device"));
   device.m_nVendorId = device.m_nProductId = 1;
   device.Reset();
@@ -60,7 +60,7 @@ TEST(InfoDevice, ClassLinesAndBusTypes) {
   const std::string undefined = "InterfaceTypeUndefined";
   EXPECT_EQ(DumpOf(named, u"> "), DumpWith("> SPDRP_CLASS: text\r\n", undefined));
   EXPECT_EQ(DumpOf(withGuid, u"> "), DumpWith("> SPDRP_CLASS: {00000001-0000-0000-0000-000000000000}\r\n", undefined));
-  // That names reach one too far, to 17, is meant, and so is the name of 17.
+  // That names reach one too far, to 17, is deliberate, and so is the name of 17.
   std::istringstream names(
       "InterfaceTypeUndefined Internal Isa Eisa MicroChannel TurboChannel PCIBus VMEBus NuBus PCMCIABus CBus MPIBus "
       "MPSABus ProcessorInternal InternalPowerBus PNPISABus PNPBus MaximumInterfaceType usbhub");

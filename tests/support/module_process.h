@@ -37,7 +37,7 @@ class ModuleProcess : public MonitorProcess {
     CoUninitialize();
     EXPECT_EQ(CurrentModule(), nullptr);
     EXPECT_EQ(ModuleLockCount(), 0);
-    // Each tree leaves a set of volume interfaces open, which is meant.
+    // Each tree leaves a set of volume interfaces open, which is deliberate.
     EXPECT_EQ(pc.Open().files + pc.Open().imageLists + pc.Open().searches, 0u);
     EXPECT_TRUE(pc.Misuses().empty());
   }

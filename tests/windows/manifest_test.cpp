@@ -156,7 +156,7 @@ TEST(Manifest, ServesBothApartmentsAndAWatcher) {
   const auto sink = inWindow.Sink();
   ASSERT_EQ(point->Advise(sink.Get(), &cookie), S_OK);
   EXPECT_EQ(inWindow.Count(KDeviceConnected), 3);
-  // Through the proxy properties come, and what has no direction does not. It is published and meant.
+  // Through the proxy properties come, and what has no direction does not. It is published and deliberate.
   ASSERT_TRUE(window.Root());
   EXPECT_EQ(zkum::TypeOf(window.Root()), KUDTRoot);
   EXPECT_EQ(window.Undirected(), (std::vector<std::size_t>{0, 0, 0}));

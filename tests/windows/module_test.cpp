@@ -316,7 +316,7 @@ TEST_F(Client, HearsOfDevicesAndReadsTheTreeFromBothApartments) {
       ComPtr<IZKUMUsbTreeNodeEnumerator> childs;
       ASSERT_EQ(remote->get_Childs(childs.Put()), S_OK);
       EXPECT_GT(CountNodes(childs), 0u);
-      // Through a proxy, a parameter without direction brings nothing back. This is published and meant.
+      // Through a proxy, a parameter without direction brings nothing back. This is published and deliberate.
       EXPECT_EQ(CallUndirected(*proxy.Get(), *remote.Get()), (std::array<std::size_t, 3>{}));
     });
     EXPECT_EQ(point->Unadvise(cookie), S_OK);

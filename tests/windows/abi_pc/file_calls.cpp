@@ -231,7 +231,7 @@ BOOL WINAPI Control(HANDLE handle, DWORD code, LPVOID in, DWORD inBytes, LPVOID 
   const Call call("DeviceIoControl");
   call.Want(overlapped == nullptr, "an overlapped request");
   if (!call.Want(returned != nullptr, "nowhere to say how much was returned")) return call.Refuse(ERROR_NOACCESS);
-  // The component asks a disk for its property when it has just closed it. That is published, and meant.
+  // The component asks a disk for its property when it has just closed it. That is published, and deliberate.
   if (handle == INVALID_HANDLE_VALUE && code == IOCTL_STORAGE_QUERY_PROPERTY) return call.Refuse(ERROR_INVALID_HANDLE);
   const File* const file = call.Find<File>(handle);
   if (file == nullptr) return call.Refuse(ERROR_INVALID_HANDLE);

@@ -147,8 +147,8 @@ BOOL WINAPI Information(LPCWSTR path, LPWSTR label, DWORD labelChars, LPDWORD se
   Spoil(serial, longest, flags);
   SpoilBytes(label, labelChars * sizeof(wchar_t));
   SpoilBytes(kind, kindChars * sizeof(wchar_t));
-  // The component asks with the path of a volume's device interface as it is. That is published, and meant: the serial
-  // number stays unknown.
+  // The component asks with the path of a volume's device interface as it is. That is published, and deliberate: the
+  // serial number stays unknown.
   const std::u16string place = Lowered(Units(path));
   if (!place.ends_with(u'\\')) {
     call.Want(place.starts_with(u"\\\\?\\"), "no backslash at the end");
