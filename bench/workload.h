@@ -1,4 +1,5 @@
-// What is measured: walks and builds over generated PCs.
+// The work that the benchmarks measure: walks and builds over generated PCs. The programs here
+// print costs in platform calls (costs.cpp) and times, and tests pin counts of calls.
 #pragma once
 
 #include <cstddef>

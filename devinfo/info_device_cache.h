@@ -1,4 +1,6 @@
-// The device-manager nodes below USB, PCI, SCSI and SD parents, compared from pass to pass.
+// Change detection for device-manager nodes: which devices below USB, PCI, SCSI and SD parents have
+// arrived or been removed since the last pass. A build makes one pass. StorageCache
+// (devinfo/storage_cache.h) does the same for disks and volumes.
 #pragma once
 
 #include <cstdint>

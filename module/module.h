@@ -1,4 +1,6 @@
-// The module: its class objects, its lock count, its end.
+// The module, that is the DLL as COM sees it: the class objects of its two classes, the count of
+// locks that keep it loaded, registration, and the order in which an unload destroys things. The
+// five exported functions are in exports.cpp.
 #pragma once
 
 #include <array>

@@ -1,4 +1,7 @@
-// The event notifier: tells sinks which USB devices came and went.
+// The event notifier: the COM object that tells sinks (client objects that advised on its
+// connection point) which USB devices have arrived or been removed. A device message starts an
+// event thread (usb_event_receiver.h); that thread calls NotifyDeviceChange, which has the tree
+// rebuilt and, when something changed, calls the sinks.
 #pragma once
 
 #include <vector>

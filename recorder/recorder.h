@@ -1,5 +1,6 @@
-// Writes down the PC that is there: asks what the component asks, call by call, and keeps the
-// answers.
+// Records a PC as the data of a machine file: makes the platform calls that the component makes and
+// keeps the answers. Removing what identifies a person, and turning later changes into steps of a
+// script, are separate files of this room.
 #pragma once
 
 #include "platform/host.h"

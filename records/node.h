@@ -1,4 +1,5 @@
-// The base of all records: one node of the topology snapshot.
+// The base of all records. A record is the data of one node of the USB tree: controller, hub, port,
+// device or volume. A tree of records is a snapshot; clients read it through the objects in com/.
 //
 // Records are plain data, filled by one thread and read by many once published. They carry no lock.
 // Device records (info devices) are the exception: they live on from tree to tree, and each build

@@ -1,4 +1,7 @@
-// Builds snapshots of the USB topology and says what changed.
+// Builds snapshots of the USB topology and says what changed. A build walks controllers, hubs and
+// ports (topology_walker.h), reads the device-manager nodes (device_forest.h), compares devices,
+// disks and volumes with the build before (devinfo/), and publishes a new tree when something
+// changed (publication.h).
 #pragma once
 
 #include <cstddef>

@@ -1,4 +1,6 @@
-// The PC that the program runs on, behind the seam.
+// The seam (platform/host.h) implemented with Windows' own calls: the PC that the program runs on.
+// This room has such a class for each interface of the seam. Besides it only platform/com.h
+// includes windows.h in the component.
 #pragma once
 
 #include "platform/host.h"

@@ -1,4 +1,6 @@
-// A host around a host: asks before each call and may refuse it.
+// A host (platform/host.h) around another host. Before each platform call it asks whether to make
+// it, and may refuse. The other wrappers in this room count calls, log them, or fail the n-th.
+// Tests, benchmarks and fuzz targets use them; the component knows none of them.
 #pragma once
 
 #include <cstddef>

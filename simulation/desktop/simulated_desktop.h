@@ -1,4 +1,6 @@
 // A process in memory: its threads, its clock, its windows, and the device messages it receives.
+// It implements platform/desktop.h, on virtual time (waiting takes no real time, and every
+// repetition gives the same result) or on the real clock.
 //
 // One SimulatedDesktop is one process from its start to its end. Everything in it may be used from
 // every thread; one lock guards it, which is never held while a window procedure or a thread's

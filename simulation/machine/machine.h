@@ -1,5 +1,6 @@
-// A PC written down: what its operating system would answer. Read from a machine file (see
-// docs/machine-file.md, which describes every member) or built by a program.
+// A PC as data: what its operating system would answer to the component's questions. It is read
+// from a machine file (docs/machine-file.md describes every member) or built by a program.
+// SimulatedPc (simulation/pc/simulated_pc.h) is a PC that gives these answers.
 #pragma once
 
 #include <cstdint>

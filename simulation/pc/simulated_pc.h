@@ -1,4 +1,6 @@
-// A PC in memory that answers the platform calls byte for byte as Windows would.
+// A PC in memory that answers the platform calls byte for byte as Windows would. It is made from a
+// Machine, the data of a machine file, and takes the place of the operating system's devices in
+// tests, in zkusb and in the simulated module. A Step of a script changes it while it is in use.
 #pragma once
 
 #include <cstddef>

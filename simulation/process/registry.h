@@ -1,4 +1,6 @@
-// A registry in memory that answers the registry calls as the system would.
+// A registry in memory that answers the registry calls (platform/registry.h) as the system would.
+// Beside it in this room are the rest of what a process has for registration: type libraries, and
+// what a module knows about itself.
 #pragma once
 
 #include <cstddef>

@@ -1,9 +1,10 @@
-// A simulated PC in the place of the one that the program runs on. COM, registry, windows and
-// threads stay the system's own.
+// The one function in which ZKUsbMonitorSimulated.dll differs from ZKUsbMonitor.dll: it returns a
+// simulated PC instead of the one that the program runs on. COM, registry, windows and threads are
+// the system's own in both.
 //
-// The environment says which: ZKUSB_MACHINE names a machine file (else it is the built-in one) and
-// ZKUSB_SCRIPT a script, which is played on a thread of its own in real time, from the moment the
-// process has the window that hears of devices.
+// Two environment variables choose the PC. ZKUSB_MACHINE names a machine file (without it, the
+// built-in machine is used) and ZKUSB_SCRIPT a script. A thread of its own plays the script in real
+// time, beginning when the process has the window that receives device messages.
 #include <windows.h>
 
 #include <cstdio>

@@ -1,4 +1,5 @@
-// What a type library says, as text.
+// The contents of a type library as text: what the program zkusb_typelib prints. Comparing two such
+// texts shows whether the interfaces that client programs are compiled against have changed.
 #pragma once
 
 #include <string>

@@ -1,4 +1,6 @@
-// The whole program but for its main function.
+// zkusb, the command-line client: the whole program except its main function. Each command is a
+// file NAME_command.cpp here. It creates the component's classes through COM and reads the tree
+// through their interfaces (node_reader.h), as any client would.
 #pragma once
 
 #include <ostream>
