@@ -27,7 +27,9 @@ CZKUMUsbTreeNodeImpl* g_keptForUses = nullptr;
 
 }  // namespace
 
+// As a reader: a deletion that has begun ends first, and the next one sees the count.
 RecordsInUse::RecordsInUse() noexcept {
+  const RecordReadLock reading;
   const std::lock_guard lock(g_usesLock);
   ++g_nUses;
 }
@@ -51,10 +53,6 @@ void CZKUMUsbTreeNodeImpl::DeleteLater(CZKUMUsbTreeNodeImpl* record,
 }
 
 void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
-  {
-    const std::lock_guard lock(g_usesLock);
-    if (g_nUses > 0 && record->IsHeld()) return DeleteLater(record, g_keptForUses);
-  }
   DeleteLater(record, t_deletions.waiting);
   if (t_deletions.running) return;
   // Whoever reads follows links to records that it does not hold, a build while it joins them and a
@@ -63,6 +61,14 @@ void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
   t_deletions.running = true;
   while (CZKUMUsbTreeNodeImpl* next = t_deletions.waiting) {
     t_deletions.waiting = next->m_pNextToDelete;
+    {
+      // Asked with the lock held: a build may have begun while this thread waited for it.
+      const std::lock_guard uses(g_usesLock);
+      if (g_nUses > 0 && next->IsHeld()) {
+        DeleteLater(next, g_keptForUses);
+        continue;
+      }
+    }
     next->LetAllGo();
     delete next;
   }

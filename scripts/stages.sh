@@ -79,7 +79,7 @@ stage_reproducible() { scripts/check-reproducible.sh && outcome 1 0 0; }
 # The last step that a log tells of: "[12/57]" of a build, "12/270 Test" of a test run.
 progress_of() {
   tail -c 4000 "$1" 2>/dev/null | grep -aoE '^\[[0-9]+/[0-9]+\]|^ *[0-9]+/[0-9]+ Test' | tail -1 |
-    sed -E 's/^\[(.*)\]/building \1/; s/^ *([0-9]+\/[0-9]+) Test/testing \1/'
+    sed -E 's/^\[(.*)\]/building \1, /; s/^ *([0-9]+\/[0-9]+) Test/testing \1, /' || true
 }
 
 # Runs one stage with a line of progress, on a terminal anew each second, else once a minute.
@@ -98,7 +98,7 @@ run_stage() { # NUMBER OF NAME
   local process=$!
   while kill -0 "$process" 2>/dev/null; do
     sleep 1
-    line="      $(progress_of "$log"), $((SECONDS - started)) s"
+    line="      $(progress_of "$log")$((SECONDS - started)) s"
     if [ -t 1 ]; then
       printf '\r\033[K%s' "$line"
     elif [ $(((SECONDS - started) % 60)) -eq 59 ]; then

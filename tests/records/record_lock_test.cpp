@@ -4,6 +4,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <optional>
 #include <thread>
 
 #include "records/node.h"
@@ -96,6 +97,22 @@ TEST(RecordLock, RecordsInUseOutliveTheObjectOfTheirParent) {
   }
   EXPECT_FALSE(shared);
   EXPECT_EQ(child->m_pParent, nullptr);
+}
+
+// A deletion that waits for readers meets a build that began meanwhile.
+TEST(RecordLock, RecordsInUseOutliveADeletionThatHasToWait) {
+  NodePtr shared = MakeRecord<CZKUMUsbTreeNodeImpl>();
+  NodePtr own = NodePtr::InARingOfItsOwn(shared.Get());
+  std::optional<RecordReadLock> reading(std::in_place);
+  std::thread deleting([&] { own.Reset(); });
+  std::this_thread::sleep_for(std::chrono::milliseconds(50));  // until it waits
+  {
+    const RecordsInUse build;
+    reading.reset();
+    deleting.join();
+    EXPECT_TRUE(shared);
+  }
+  EXPECT_FALSE(shared);
 }
 
 }  // namespace
