@@ -65,6 +65,8 @@ make_wine_prefix() {
   timeout 180 wineboot -i || return 1
   # Windows that no display has to show.
   timeout 60 wine reg add 'HKCU\Software\Wine\Drivers' /v Graphics /d null /f || return 1
+  # A program that crashes ends, and waits for no debugger.
+  timeout 60 wine reg add 'HKLM\Software\Microsoft\Windows NT\CurrentVersion\AeDebug' /v Debugger /d 'cmd /c exit' /f || return 1
   # The desktop that is there already has looked for a display, and would refuse every window.
   stop_wine
   timeout 30 wineserver -p || return 1
