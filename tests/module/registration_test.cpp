@@ -62,10 +62,13 @@ struct Pc {
   SimulatedModuleEnvironment environment;
 };
 
-// All that registering writes into an empty registry: a listing with three places left open.
+// All that registering writes into an empty registry: a listing with four places left open.
 Lines RegisteredLines(const std::string& module, const std::string& libraryFile, const std::string& helpDirectory) {
   const std::pair<std::string, std::string> places[] = {
-      {"<MODULE>", module}, {"<LIBRARY>", libraryFile}, {"<HELP>", helpDirectory}};
+      {"<MODULE>", module},
+      {"<PLATFORM>", ModuleTypeLibrary().attributes.syskind == platform::kSYS_WIN64 ? "win64" : "win32"},
+      {"<LIBRARY>", libraryFile},
+      {"<HELP>", helpDirectory}};
   std::istringstream file(testing_support::Golden("registered-keys"));
   Lines lines;
   for (std::string line; std::getline(file, line); lines.push_back(line)) {

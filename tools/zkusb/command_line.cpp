@@ -37,6 +37,8 @@ class Grammar {
   Grammar() : m_app(FindHelp("").summary, "zkusb") {
     // That there is one is checked below: here, a misspelt one would not be named.
     m_app.require_subcommand(0, 1);
+    // Options look alike on every system, and a path may begin with a slash.
+    m_app.allow_windows_style_options(false);
     m_app.footer(ExamplesText(FindHelp("")));
     m_app.get_formatter()->label("SUBCOMMAND", "COMMAND");
     m_app.get_formatter()->label("Subcommands", "Commands");
