@@ -22,5 +22,6 @@ test_packages=(libgtest-dev libgmock-dev libbenchmark-dev clang-14 libclang-rt-1
 windows_build_packages=("${build_packages[@]}" g++-mingw-w64-i686-posix g++-mingw-w64-x86-64-posix
   mingw-w64-tools googletest perl)
 windows_run_packages=(wine wine64)
-# Beyond those, for ./test all.
+# Beyond those, for ./test all. Without a browser and without a typesetter the tests that use them are skipped, aloud.
 all_packages=(clang-tidy-14)
+browser_packages=(chromium groff-base)
