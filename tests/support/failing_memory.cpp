@@ -16,17 +16,17 @@ static thread_local std::uint64_t t_countdown = 0;
 static thread_local bool t_paused = false;
 
 // While set: the places of the allocations, hashed.
-static thread_local std::vector<std::uintptr_t>* t_places = nullptr;
+static thread_local std::vector<std::uint64_t>* t_places = nullptr;
 
 static _Unwind_Reason_Code AddFrame(_Unwind_Context* context, void* hash) {
-  auto& sum = *static_cast<std::uintptr_t*>(hash);
-  sum = (sum ^ static_cast<std::uintptr_t>(_Unwind_GetIP(context))) * 0x100000001B3U;
+  auto& sum = *static_cast<std::uint64_t*>(hash);
+  sum = (sum ^ static_cast<std::uint64_t>(_Unwind_GetIP(context))) * 0x100000001B3U;
   return _URC_NO_REASON;
 }
 
 static void RecordPlace() {
   t_paused = true;
-  std::uintptr_t place = 14695981039346656037U & UINTPTR_MAX;
+  std::uint64_t place = 14695981039346656037U;
   _Unwind_Backtrace(AddFrame, &place);
   t_places->push_back(place);
   t_paused = false;
@@ -50,11 +50,11 @@ void operator delete(void* memory, std::size_t) noexcept { heap::Give(memory); }
 
 namespace KelvoUHW {
 
-void BeginRecordingAllocations() { t_places = new std::vector<std::uintptr_t>; }
+void BeginRecordingAllocations() { t_places = new std::vector<std::uint64_t>; }
 
 std::vector<std::uint64_t> EndRecordingAllocations() {
-  const std::unique_ptr<std::vector<std::uintptr_t>> places(std::exchange(t_places, nullptr));
-  std::map<std::uintptr_t, std::pair<std::uint64_t, std::uint64_t>> firstAndLast;
+  const std::unique_ptr<std::vector<std::uint64_t>> places(std::exchange(t_places, nullptr));
+  std::map<std::uint64_t, std::pair<std::uint64_t, std::uint64_t>> firstAndLast;
   for (std::size_t i = 0; i < places->size(); ++i) {
     firstAndLast.try_emplace((*places)[i], i + 1, i + 1).first->second.second = i + 1;
   }

@@ -385,6 +385,8 @@ void PrintTo(const Counts& counts, std::ostream* out) {
 std::atomic<int> g_allocationsLeft = INT_MAX;
 void* __cdecl FailingMalloc(std::size_t bytes) { return --g_allocationsLeft == 0 ? nullptr : std::malloc(bytes); }
 
+DWORD WINAPI ReadOnce(void* module) { return !static_cast<LoadedModule*>(module)->Picture().empty(); }
+
 // One load: a tree, queries, from another thread too, and every other time an exception inside.
 void LoadOnce(int cycle) {
   const LoadedModule module;
@@ -398,8 +400,7 @@ void LoadOnce(int cycle) {
   module.Build();
   if (cycle % 3 == 0) {
     // One of the system's: those of the run-time keep handles for the next.
-    const auto read = [](void* argument) -> DWORD { return !static_cast<LoadedModule*>(argument)->Picture().empty(); };
-    const HANDLE thread = CreateThread(nullptr, 0, read, const_cast<LoadedModule*>(&module), 0, nullptr);
+    const HANDLE thread = CreateThread(nullptr, 0, ReadOnce, const_cast<LoadedModule*>(&module), 0, nullptr);
     DWORD shown = 0;
     WaitForSingleObject(thread, INFINITE);
     GetExitCodeThread(thread, &shown);
