@@ -53,7 +53,8 @@ struct Event {
 // program's threads may be in any apartment, or in none. It is made, used and destroyed by one thread of the program.
 //
 // The first events, "connected", come before the constructor returns, for each device that is there; all others when
-// something happens. docs/contract.md says when which.
+// something happens. docs/contract.md says when which. In a single-threaded apartment the constructor, Run, Devices and
+// the destructor let other objects of that apartment be called while they wait.
 class Watcher {
  public:
   using Function = std::function<void(const Event&)>;
@@ -75,7 +76,7 @@ class Watcher {
     }
     if (m_thread) {
       SetEvent(m_end);
-      WaitForSingleObject(m_thread, INFINITE);
+      WaitFor(m_thread);
       CloseHandle(m_thread);
     }
     if (m_end) CloseHandle(m_end);
@@ -109,7 +110,7 @@ class Watcher {
     Job job{&use, m_tree.Get()};
     HANDLE thread = reinterpret_cast<HANDLE>(_beginthreadex(nullptr, 0, &Job::Thread, &job, 0, nullptr));
     if (thread == nullptr) return;
-    WaitForSingleObject(thread, INFINITE);
+    WaitFor(thread);
     CloseHandle(thread);
   }
 
@@ -193,6 +194,13 @@ class Watcher {
     std::deque<Event> queue;
   };
 
+  // A thread of the single-threaded apartment takes calls while it waits: a sink of its own may be called meanwhile, and
+  // what is waited for waits for the end of that call.
+  static void WaitFor(HANDLE handle) {
+    DWORD index = 0;
+    if (CoWaitForMultipleHandles(0, INFINITE, 1, &handle, &index) != S_OK) WaitForSingleObject(handle, INFINITE);
+  }
+
   void Start() {
     m_end = CreateEventW(nullptr, TRUE, FALSE, nullptr);
     m_started = CreateEventW(nullptr, TRUE, FALSE, nullptr);
@@ -200,7 +208,7 @@ class Watcher {
       m_thread = reinterpret_cast<HANDLE>(_beginthreadex(nullptr, 0, &Watcher::Thread, this, 0, nullptr));
     }
     if (m_thread) {
-      WaitForSingleObject(m_started, INFINITE);
+      WaitFor(m_started);
     } else {
       m_error = E_OUTOFMEMORY;
     }
