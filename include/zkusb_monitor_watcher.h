@@ -194,8 +194,8 @@ class Watcher {
     std::deque<Event> queue;
   };
 
-  // A thread of the single-threaded apartment takes calls while it waits: a sink of its own may be called meanwhile, and
-  // what is waited for waits for the end of that call.
+  // A thread of the single-threaded apartment takes calls while it waits: a sink of its own may be called meanwhile,
+  // and what is waited for waits for the end of that call.
   static void WaitFor(HANDLE handle) {
     DWORD index = 0;
     if (CoWaitForMultipleHandles(0, INFINITE, 1, &handle, &index) != S_OK) WaitForSingleObject(handle, INFINITE);

@@ -7,7 +7,7 @@ set -euo pipefail
 cd "$(dirname "$0")/.."
 
 sources() {
-  git ls-files '*.cpp' | grep -vE '^(tests|bench|fuzz|samples|platform/windows|simulation/windows|tools/type_library)/|windows_pc\.cpp$'
+  git ls-files '*.cpp' | grep -vE '^(tests|bench|fuzz|samples|platform/windows|simulation/(windows|abi)|tools/type_library)/|windows_pc\.cpp$'
 }
 if [ "${1:-}" = --all ]; then
   files=$(sources)

@@ -7,7 +7,7 @@
 #include "com/private_interfaces.h"
 #include "com/zkusb_monitor.h"
 #include "platform/text.h"
-#include "tests/windows/abi_pc/abi_pc.h"
+#include "simulation/abi/abi_pc.h"
 #include "tests/windows/module_files.h"
 
 namespace abi_pc {

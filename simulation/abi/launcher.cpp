@@ -1,5 +1,6 @@
-// Starts a program with a DLL in it: zkusb_launcher DLL [NAME=VALUE...] PROGRAM [ARGUMENT...]. Each word is quoted and
-// holds no quotation mark. Ends with the program's code, or with 125 where it could not be started so.
+// Starts a program with a DLL in it: zkusb_launcher DLL [NAME=VALUE...] PROGRAM [ARGUMENT...]. Each
+// word is quoted and holds no quotation mark. Ends with the program's code, or with 125 where it
+// could not be started so.
 #include <windows.h>
 
 #include <cstdio>
@@ -23,8 +24,10 @@ std::wstring TakeWord(const wchar_t*& line) {
 // Has the process load the DLL, on a thread that ends with it.
 bool Load(HANDLE process, const std::wstring& dll) {
   const SIZE_T bytes = (dll.size() + 1) * sizeof(wchar_t);
-  void* const text = VirtualAllocEx(process, nullptr, bytes, MEM_COMMIT | MEM_RESERVE, PAGE_READWRITE);
-  if (text == nullptr || !WriteProcessMemory(process, text, dll.c_str(), bytes, nullptr)) return false;
+  void* const text =
+      VirtualAllocEx(process, nullptr, bytes, MEM_COMMIT | MEM_RESERVE, PAGE_READWRITE);
+  if (text == nullptr || !WriteProcessMemory(process, text, dll.c_str(), bytes, nullptr))
+    return false;
   // The system's own DLLs stand at one address in all programs of a width.
   const auto load = reinterpret_cast<LPTHREAD_START_ROUTINE>(
       reinterpret_cast<void*>(GetProcAddress(GetModuleHandleW(L"kernel32.dll"), "LoadLibraryW")));
@@ -55,8 +58,8 @@ int main() {
   start.hStdOutput = GetStdHandle(STD_OUTPUT_HANDLE);
   start.hStdError = GetStdHandle(STD_ERROR_HANDLE);
   PROCESS_INFORMATION process{};
-  if (!CreateProcessW(nullptr, program.data(), nullptr, nullptr, TRUE, CREATE_SUSPENDED, nullptr, nullptr, &start,
-                      &process)) {
+  if (!CreateProcessW(nullptr, program.data(), nullptr, nullptr, TRUE, CREATE_SUSPENDED, nullptr,
+                      nullptr, &start, &process)) {
     std::fprintf(stderr, "the program cannot be started: %lu\n", GetLastError());
     return kNotStarted;
   }

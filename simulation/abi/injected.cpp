@@ -1,10 +1,12 @@
-// The PC inside a program that knows nothing of it: loaded before the program's first instruction, it loads the module
-// that ships and stands in its import table. The environment says which PC it is, and where to write what was wrong:
+// The PC inside a program that knows nothing of it: loaded before the program's first instruction,
+// it loads the module that ships and stands in its import table. The environment says which PC it
+// is, and where to write what was wrong:
 //
 //   ABI_PC_MODULE   the module
 //   ABI_PC_MACHINE  the machine file
-//   ABI_PC_SCRIPT   a script, played in real time with the system's own messages; not set: nothing changes
-//   ABI_PC_REPORT   the report: one line for each breach, then one with what is open and one with the starts
+//   ABI_PC_SCRIPT   a script, played in real time with the system's own messages; not set: nothing
+//   changes ABI_PC_REPORT   the report: one line for each breach, then one with what is open and
+//   one with the starts
 #include <windows.h>
 
 #include <dbt.h>
@@ -12,9 +14,9 @@
 #include <fstream>
 
 #include "platform/text.h"
+#include "simulation/abi/abi_pc.h"
 #include "simulation/machine/machine_file.h"
 #include "simulation/pc/play_step.h"
-#include "tests/windows/abi_pc/abi_pc.h"
 
 namespace {
 
@@ -30,7 +32,8 @@ std::string Variable(const char* name) {
 }
 
 HWND Receiver() {
-  for (HWND window = nullptr; (window = FindWindowExW(nullptr, window, L"MsgReceiver", nullptr)) != nullptr;) {
+  for (HWND window = nullptr;
+       (window = FindWindowExW(nullptr, window, L"MsgReceiver", nullptr)) != nullptr;) {
     DWORD process = 0;
     GetWindowThreadProcessId(window, &process);
     if (process == GetCurrentProcessId()) return window;
@@ -46,7 +49,8 @@ void Send(const sim::DeviceBroadcast& broadcast) {
     return;
   }
   SendMessageTimeoutW(Receiver(), WM_DEVICECHANGE, broadcast.event,
-                      broadcast.record.empty() ? 0 : reinterpret_cast<LPARAM>(record), SMTO_BLOCK, 5000, nullptr);
+                      broadcast.record.empty() ? 0 : reinterpret_cast<LPARAM>(record), SMTO_BLOCK,
+                      5000, nullptr);
 }
 
 DWORD WINAPI Play(void*) {
@@ -62,7 +66,8 @@ DWORD WINAPI Play(void*) {
         abi_pc::Change(pc.Snapshot());
         Send(broadcast);
       };
-      *g_trouble += platform::ToUtf8(sim::PlayStep(pc, step, send, [] { Sleep(sim::kRealLeadMilliseconds); }));
+      *g_trouble += platform::ToUtf8(
+          sim::PlayStep(pc, step, send, [] { Sleep(sim::kRealLeadMilliseconds); }));
       abi_pc::Change(pc.Snapshot());
     }
   } catch (const std::exception& error) {
@@ -77,7 +82,8 @@ bool Enter() {
     const HMODULE module = LoadLibraryA(Variable("ABI_PC_MODULE").c_str());
     if (module == nullptr) return false;
     abi_pc::Attach(module);
-    if (!Variable("ABI_PC_SCRIPT").empty()) CloseHandle(CreateThread(nullptr, 0, Play, nullptr, 0, nullptr));
+    if (!Variable("ABI_PC_SCRIPT").empty())
+      CloseHandle(CreateThread(nullptr, 0, Play, nullptr, 0, nullptr));
     return true;
   } catch (const std::exception& error) {
     OutputDebugStringA(error.what());

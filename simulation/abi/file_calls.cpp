@@ -4,23 +4,25 @@
 
 #include <algorithm>
 
-#include "tests/windows/abi_pc/state.h"
+#include "simulation/abi/state.h"
 
 namespace abi_pc {
 namespace {
 
 // The records' sizes as the drivers' documentation has them, of both widths.
-static_assert(sizeof(USB_NODE_CONNECTION_INFORMATION_EX) == 35 && sizeof(USB_NODE_INFORMATION) == 76);
+static_assert(sizeof(USB_NODE_CONNECTION_INFORMATION_EX) == 35 &&
+              sizeof(USB_NODE_INFORMATION) == 76);
 static_assert(sizeof(USB_DEVICE_DESCRIPTOR) == 18 && sizeof(USB_PIPE_INFO) == 11);
-static_assert(offsetof(USB_ROOT_HUB_NAME, RootHubName) == 4 && offsetof(USB_NODE_CONNECTION_NAME, NodeName) == 8);
+static_assert(offsetof(USB_ROOT_HUB_NAME, RootHubName) == 4 &&
+              offsetof(USB_NODE_CONNECTION_NAME, NodeName) == 8);
 static_assert(sizeof(STORAGE_DEVICE_DESCRIPTOR) == 40 &&
               offsetof(STORAGE_DEVICE_DESCRIPTOR, RawDeviceProperties) == 36);
 static_assert(sizeof(STORAGE_DEVICE_NUMBER) == 12);
 constexpr std::size_t kSerialNumberOffset = 16;  // of the characters in MEDIA_SERIAL_NUMBER_DATA
 constexpr DWORD kMediaSerialNumber = 0x2D0C10;
 
-// What a driver has of a request: one buffer for input and output, as long as the longer of them. What is beyond the
-// input was never cleared.
+// What a driver has of a request: one buffer for input and output, as long as the longer of them.
+// What is beyond the input was never cleared.
 struct Request {
   DWORD code;
   std::string buffer;
@@ -56,11 +58,13 @@ Answer AnswerName(Request& request, std::size_t head, const std::u16string& name
 }
 
 Answer AnswerController(const sim::HostController& controller, Request& request) {
-  const auto& name = request.code == IOCTL_USB_GET_ROOT_HUB_NAME ? controller.rootHub : controller.driverKey;
+  const auto& name =
+      request.code == IOCTL_USB_GET_ROOT_HUB_NAME ? controller.rootHub : controller.driverKey;
   if (request.code != IOCTL_USB_GET_ROOT_HUB_NAME && request.code != IOCTL_GET_HCD_DRIVERKEY_NAME) {
     return Refused(ERROR_INVALID_FUNCTION);
   }
-  return name ? AnswerName(request, offsetof(USB_ROOT_HUB_NAME, RootHubName), *name) : Refused(ERROR_INVALID_PARAMETER);
+  return name ? AnswerName(request, offsetof(USB_ROOT_HUB_NAME, RootHubName), *name)
+              : Refused(ERROR_INVALID_PARAMETER);
 }
 
 Answer AnswerNode(const sim::Hub& hub, Request& request) {
@@ -76,7 +80,8 @@ Answer AnswerNode(const sim::Hub& hub, Request& request) {
 }
 
 Answer AnswerConnection(const sim::Port& port, ULONG number, Request& request) {
-  if (request.out < sizeof(USB_NODE_CONNECTION_INFORMATION_EX)) return Refused(ERROR_INSUFFICIENT_BUFFER);
+  if (request.out < sizeof(USB_NODE_CONNECTION_INFORMATION_EX))
+    return Refused(ERROR_INSUFFICIENT_BUFFER);
   USB_NODE_CONNECTION_INFORMATION_EX head{};
   head.ConnectionIndex = number;
   std::memcpy(&head.DeviceDescriptor, &port.descriptor, sizeof head.DeviceDescriptor);
@@ -93,7 +98,8 @@ Answer AnswerConnection(const sim::Port& port, ULONG number, Request& request) {
   head.DeviceAddress = port.address;
   head.NumberOfOpenPipes = static_cast<ULONG>(port.pipes.size());
   request.Write(0, &head, sizeof head);
-  const std::size_t pipes = std::min(port.pipes.size(), (request.out - sizeof head) / sizeof(USB_PIPE_INFO));
+  const std::size_t pipes =
+      std::min(port.pipes.size(), (request.out - sizeof head) / sizeof(USB_PIPE_INFO));
   request.Write(sizeof head, port.pipes.data(), pipes * sizeof(USB_PIPE_INFO));
   return {0, sizeof head + pipes * sizeof(USB_PIPE_INFO)};
 }
@@ -115,7 +121,8 @@ Answer AnswerHub(const sim::Hub& hub, Request& request) {
     case IOCTL_USB_GET_NODE_CONNECTION_NAME:
       return AnswerName(request, kHead, port.hubName.value_or(std::u16string()));
     case IOCTL_USB_GET_NODE_CONNECTION_DRIVERKEY_NAME:
-      return port.driverKey ? AnswerName(request, kHead, *port.driverKey) : Refused(ERROR_INVALID_PARAMETER);
+      return port.driverKey ? AnswerName(request, kHead, *port.driverKey)
+                            : Refused(ERROR_INVALID_PARAMETER);
     default:
       return AnswerConnection(port, number, request);
   }
@@ -183,12 +190,14 @@ Answer AnswerStorage(const sim::Storage& storage, Request& request) {
 Answer AnswerFile(const Now& now, const File& file, Request& request) {
   switch (file.kind) {
     case FileKind::Controller:
-      return AnswerController(now.machine.hostControllers[now.index.Controller(file.name)], request);
+      return AnswerController(now.machine.hostControllers[now.index.Controller(file.name)],
+                              request);
     case FileKind::Hub:
       return AnswerHub(now.machine.hubs[now.index.Hub(file.name)], request);
     default:
       const Position storage = now.index.Storage(file.name);
-      return storage == kNone ? Refused(ERROR_INVALID_FUNCTION) : AnswerStorage(now.machine.storage[storage], request);
+      return storage == kNone ? Refused(ERROR_INVALID_FUNCTION)
+                              : AnswerStorage(now.machine.storage[storage], request);
   }
 }
 
@@ -197,48 +206,58 @@ std::optional<File> Named(const Index& index, const std::u16string& name, DWORD 
   if (index.Controller(name) != kNone) return File{FileKind::Controller, name, access};
   const std::u16string symbolic = name.substr(std::min<std::size_t>(4, name.size()));
   if (index.Hub(symbolic) != kNone) return File{FileKind::Hub, symbolic, access};
-  const bool storage = index.Interface(name) != kNone || (sim::IsDriveName(name) && index.Drive(name[4]) != kNone);
+  const bool storage =
+      index.Interface(name) != kNone || (sim::IsDriveName(name) && index.Drive(name[4]) != kNone);
   return storage ? std::optional(File{FileKind::Storage, name, access}) : std::nullopt;
 }
 
-HANDLE WINAPI OpenFile(LPCWSTR path, DWORD access, DWORD share, LPSECURITY_ATTRIBUTES security, DWORD disposition,
-                       DWORD attributes, HANDLE pattern) {
+HANDLE WINAPI OpenFile(LPCWSTR path, DWORD access, DWORD share, LPSECURITY_ATTRIBUTES security,
+                       DWORD disposition, DWORD attributes, HANDLE pattern) {
   const Call call("CreateFileW");
   const auto refuse = [&](DWORD code) { return call.Refuse(code), INVALID_HANDLE_VALUE; };
   const std::u16string name = Lowered(Units(path));
   call.Want(disposition == 3, "the disposition is not OPEN_EXISTING");
-  call.Want(security == nullptr && attributes == 0 && pattern == nullptr, "security, attributes or a template");
+  call.Want(security == nullptr && attributes == 0 && pattern == nullptr,
+            "security, attributes or a template");
   if (call.Fails()) return refuse(ERROR_GEN_FAILURE);
   const std::optional<File> file = Named(call.Machine().index, name, access);
   if (!file) {
     call.Want(name.starts_with(u"\\\\.\\") || name.starts_with(u"\\\\?\\"), "not a device");
     return refuse(ERROR_FILE_NOT_FOUND);
   }
-  // USB drivers are opened for writing and shared for writing, disks for nothing and shared for all: the system itself
-  // has them open, and who is no administrator may not do more.
+  // USB drivers are opened for writing and shared for writing, disks for nothing and shared for
+  // all: the system itself has them open, and who is no administrator may not do more.
   const Position entry = call.Machine().index.Interface(name);
-  const bool disk = entry != kNone && call.Machine().machine.interfaces[entry].interfaceClass.Data1 >> 8 == 0x53F563;
+  const bool disk = entry != kNone &&
+                    call.Machine().machine.interfaces[entry].interfaceClass.Data1 >> 8 == 0x53F563;
   const bool usb = file->kind != FileKind::Storage && !(disk && access == 0);
   if (share != (usb ? 2u : 3u)) return call.Breach("the share"), refuse(ERROR_SHARING_VIOLATION);
-  if (access != (usb ? 0x40000000u : 0u)) return call.Breach("the access"), refuse(ERROR_ACCESS_DENIED);
+  if (access != (usb ? 0x40000000u : 0u))
+    return call.Breach("the access"), refuse(ERROR_ACCESS_DENIED);
   return call.Opened(*file);
 }
 
-bool IsOurs(HANDLE handle) { return reinterpret_cast<std::uintptr_t>(handle) - kFirstHandle < 0x1000000; }
+bool IsOurs(HANDLE handle) {
+  return reinterpret_cast<std::uintptr_t>(handle) - kFirstHandle < 0x1000000;
+}
 
-BOOL WINAPI Control(HANDLE handle, DWORD code, LPVOID in, DWORD inBytes, LPVOID out, DWORD outBytes, LPDWORD returned,
-                    LPOVERLAPPED overlapped) {
+BOOL WINAPI Control(HANDLE handle, DWORD code, LPVOID in, DWORD inBytes, LPVOID out, DWORD outBytes,
+                    LPDWORD returned, LPOVERLAPPED overlapped) {
   const Call call("DeviceIoControl");
   call.Want(overlapped == nullptr, "an overlapped request");
-  if (!call.Want(returned != nullptr, "nowhere to say how much was returned")) return call.Refuse(ERROR_NOACCESS);
-  // The component asks a disk for its property when it has just closed it. That is published, and deliberate.
-  if (handle == INVALID_HANDLE_VALUE && code == IOCTL_STORAGE_QUERY_PROPERTY) return call.Refuse(ERROR_INVALID_HANDLE);
+  if (!call.Want(returned != nullptr, "nowhere to say how much was returned"))
+    return call.Refuse(ERROR_NOACCESS);
+  // The component asks a disk for its property when it has just closed it. That is published, and
+  // deliberate.
+  if (handle == INVALID_HANDLE_VALUE && code == IOCTL_STORAGE_QUERY_PROPERTY)
+    return call.Refuse(ERROR_INVALID_HANDLE);
   const File* const file = call.Find<File>(handle);
   if (file == nullptr) return call.Refuse(ERROR_INVALID_HANDLE);
   // The lowest two bits say how buffers go, bits 14 and 15 for what the file must have been opened.
   call.Want((code & 3) == 0, "a method that is not buffered");
   const bool reads = (code & 0x4000) != 0, writes = (code & 0x8000) != 0;
-  if ((reads && (file->access & GENERIC_READ) == 0) || (writes && (file->access & GENERIC_WRITE) == 0)) {
+  if ((reads && (file->access & GENERIC_READ) == 0) ||
+      (writes && (file->access & GENERIC_WRITE) == 0)) {
     return call.Misused(ERROR_ACCESS_DENIED, "a request for which the file was not opened");
   }
   if ((in == nullptr && inBytes != 0) || (out == nullptr && outBytes != 0)) {
@@ -246,7 +265,8 @@ BOOL WINAPI Control(HANDLE handle, DWORD code, LPVOID in, DWORD inBytes, LPVOID 
   }
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (file->gone) return call.Refuse(ERROR_DEVICE_NOT_CONNECTED);
-  Request request{code, std::string(std::max(inBytes, outBytes), static_cast<char>(kGarbage)), inBytes, outBytes};
+  Request request{code, std::string(std::max(inBytes, outBytes), static_cast<char>(kGarbage)),
+                  inBytes, outBytes};
   if (inBytes != 0) std::memcpy(request.buffer.data(), in, inBytes);
   const Answer answer = AnswerFile(call.Machine(), *file, request);
   if (answer.error != 0) return call.Refuse(answer.error);
@@ -267,7 +287,9 @@ BOOL WINAPI Close(HANDLE handle) {
 }  // namespace
 
 Functions FileFunctions() {
-  return {{"CreateFileW", Address(OpenFile)}, {"DeviceIoControl", Address(Control)}, {"CloseHandle", Address(Close)}};
+  return {{"CreateFileW", Address(OpenFile)},
+          {"DeviceIoControl", Address(Control)},
+          {"CloseHandle", Address(Close)}};
 }
 
 }  // namespace abi_pc

@@ -1,5 +1,5 @@
 // The configuration manager, and device notifications, which are looked on.
-#include "tests/windows/abi_pc/state.h"
+#include "simulation/abi/state.h"
 
 #include <dbt.h>
 
@@ -20,7 +20,8 @@ CONFIGRET WINAPI Locate(PDEVINST node, DEVINSTID_W id, ULONG flags) {
 }
 
 // A step from a node to another one.
-CONFIGRET Step(const Call& call, PDEVINST to, DEVINST from, ULONG flags, Position (Index::*step)(Position) const) {
+CONFIGRET Step(const Call& call, PDEVINST to, DEVINST from, ULONG flags,
+               Position (Index::*step)(Position) const) {
   WantNoFlags(call, flags);
   Spoil(to);
   if (call.Fails()) return CR_FAILURE;
@@ -49,16 +50,19 @@ CONFIGRET WINAPI DeviceId(DEVINST node, PWCHAR buffer, ULONG chars, ULONG flags)
   if (call.Fails()) return CR_FAILURE;
   const Position here = call.Machine().index.DeviceByNumber(node);
   if (here == kNone) return CR_INVALID_DEVNODE;
-  const std::u16string_view id = here == Index::kRoot ? std::u16string_view(sim::kRootDeviceId)
-                                                      : std::u16string_view(call.Machine().machine.devices[here].id);
+  const std::u16string_view id = here == Index::kRoot
+                                     ? std::u16string_view(sim::kRootDeviceId)
+                                     : std::u16string_view(call.Machine().machine.devices[here].id);
   return GiveText(id, buffer, chars) ? CR_SUCCESS : CR_BUFFER_SMALL;
 }
 
-CONFIGRET WINAPI RegistryProperty(DEVINST node, ULONG property, PULONG type, PVOID buffer, PULONG bytes, ULONG flags) {
+CONFIGRET WINAPI RegistryProperty(DEVINST node, ULONG property, PULONG type, PVOID buffer,
+                                  PULONG bytes, ULONG flags) {
   const Call call("CM_Get_DevNode_Registry_PropertyW");
   WantNoFlags(call, flags);
   const ULONG offered = *bytes;
-  if (!call.Want(buffer != nullptr || offered == 0, "a size without a buffer")) return CR_INVALID_POINTER;
+  if (!call.Want(buffer != nullptr || offered == 0, "a size without a buffer"))
+    return CR_INVALID_POINTER;
   Spoil(type, bytes);
   SpoilBytes(buffer, offered);
   if (call.Fails()) return CR_FAILURE;
@@ -87,7 +91,8 @@ HDEVNOTIFY WINAPI RegisterNotification(HANDLE recipient, LPVOID filter, DWORD fl
             "not the component's window");
   // DEVICE_NOTIFY_WINDOW_HANDLE | DEVICE_NOTIFY_ALL_INTERFACE_CLASSES
   call.Want(flags == 4, "flags");
-  call.Want(record.dbcc_size == 32 && record.dbcc_devicetype == DBT_DEVTYP_DEVICEINTERFACE && record.dbcc_reserved == 0,
+  call.Want(record.dbcc_size == 32 && record.dbcc_devicetype == DBT_DEVTYP_DEVICEINTERFACE &&
+                record.dbcc_reserved == 0,
             "the filter");
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE), nullptr;
   return call.Opened(Notification{});
@@ -100,9 +105,12 @@ BOOL WINAPI UnregisterNotification(HDEVNOTIFY handle) {
 }  // namespace
 
 Functions NodeFunctions() {
-  return {{"CM_Locate_DevNodeW", Address(Locate)},  {"CM_Get_Parent", Address(Parent)},
-          {"CM_Get_Child", Address(Child)},         {"CM_Get_Sibling", Address(Sibling)},
-          {"CM_Get_Device_IDW", Address(DeviceId)}, {"CM_Get_DevNode_Registry_PropertyW", Address(RegistryProperty)}};
+  return {{"CM_Locate_DevNodeW", Address(Locate)},
+          {"CM_Get_Parent", Address(Parent)},
+          {"CM_Get_Child", Address(Child)},
+          {"CM_Get_Sibling", Address(Sibling)},
+          {"CM_Get_Device_IDW", Address(DeviceId)},
+          {"CM_Get_DevNode_Registry_PropertyW", Address(RegistryProperty)}};
 }
 
 Functions NotificationFunctions() {

@@ -1,10 +1,12 @@
-// A PC in the system's own ABI: functions that stand in a module's import table before those of SetupAPI, the
-// configuration manager, files, volumes and device notifications, and answer out of a machine file.
+// A PC in the system's own ABI: functions that stand in a module's import table before those of
+// SetupAPI, the configuration manager, files, volumes and device notifications, and answer out of a
+// machine file.
 //
-// Layouts and codes come from the SDK's headers, or from numbers written beside them, and never from platform/. It is
-// stricter than the systems we know: it says so (a *breach*) when a size field, an access, a flag or a handle is not
-// exactly what the documentation asks for, leaves a mark as the last error after each success, overwrites what a failed
-// call may overwrite and all of a buffer that is offered, and answers requests in one uncleared buffer.
+// Layouts and codes come from the SDK's headers, or from numbers written beside them, and never
+// from platform/. It is stricter than the systems we know: it says so (a *breach*) when a size
+// field, an access, a flag or a handle is not exactly what the documentation asks for, leaves a
+// mark as the last error after each success, overwrites what a failed call may overwrite and all of
+// a buffer that is offered, and answers requests in one uncleared buffer.
 //
 // One PC in a process. Every function is callable from every thread.
 #pragma once
@@ -28,8 +30,8 @@ void Begin(const Machine& machine);
 // The same PC has changed. What was opened of a device that went answers no more.
 void Change(const Machine& machine);
 
-// Puts the functions into the module's import table. What the module imports of SetupAPI, the configuration manager and
-// volumes, and is not known here, is a breach.
+// Puts the functions into the module's import table. What the module imports of SetupAPI, the
+// configuration manager and volumes, and is not known here, is a breach.
 void Attach(HMODULE module);
 // Puts one function there; whether the module imports it.
 bool Replace(HMODULE module, const std::string& function, void* with);

@@ -13,8 +13,8 @@
 #include <optional>
 #include <variant>
 
+#include "simulation/abi/abi_pc.h"
 #include "simulation/machine/machine_index.h"
-#include "tests/windows/abi_pc/abi_pc.h"
 
 namespace abi_pc {
 
@@ -31,7 +31,8 @@ inline constexpr std::uintptr_t kFirstHandle = 0x5A000000;
 
 // The machine as it is now, and the tables to look it up in.
 struct Now {
-  Now(Machine now, sim::DeviceNumbers& numbers) : machine(std::move(now)), index(machine, numbers) {}
+  Now(Machine now, sim::DeviceNumbers& numbers)
+      : machine(std::move(now)), index(machine, numbers) {}
   const Machine machine;
   const Index index;
 };
@@ -75,7 +76,9 @@ class Call {
  public:
   explicit Call(const char* function);
   bool Fails() const { return m_fails; }
-  void Breach(const std::string& what) const { m_pc.breaches.push_back(std::string(m_function) + ": " + what); }
+  void Breach(const std::string& what) const {
+    m_pc.breaches.push_back(std::string(m_function) + ": " + what);
+  }
   // Says so unless it holds.
   bool Want(bool holds, const std::string& what) const {
     if (!holds) Breach(what);
@@ -114,17 +117,23 @@ class Call {
 
 template <class... Value>
 void Spoil(Value*... values) {
-  ((values != nullptr ? static_cast<void>(std::memset(values, kGarbage, sizeof *values)) : void()), ...);
+  ((values != nullptr ? static_cast<void>(std::memset(values, kGarbage, sizeof *values)) : void()),
+   ...);
 }
 // All that is offered, which the caller therefore must own.
 inline void SpoilBytes(void* buffer, std::size_t bytes) {
   if (buffer != nullptr) std::memset(buffer, kGarbage, bytes);
 }
-inline const char16_t* Units(const wchar_t* text) { return reinterpret_cast<const char16_t*>(text); }
-inline const platform::Guid& AsKey(const GUID& guid) { return reinterpret_cast<const platform::Guid&>(guid); }
+inline const char16_t* Units(const wchar_t* text) {
+  return reinterpret_cast<const char16_t*>(text);
+}
+inline const platform::Guid& AsKey(const GUID& guid) {
+  return reinterpret_cast<const platform::Guid&>(guid);
+}
 std::u16string Lowered(std::u16string_view text);
 
-// A text and its zero into a buffer counted in characters; false, with the buffer spoilt, where it does not fit.
+// A text and its zero into a buffer counted in characters; false, with the buffer spoilt, where it
+// does not fit.
 bool GiveText(std::u16string_view text, wchar_t* buffer, std::size_t chars);
 // The bytes of a registry property and its type; nothing where the device has none of that number.
 std::optional<std::pair<DWORD, std::string>> PropertyOf(const sim::Device& device, DWORD property);

@@ -1,5 +1,5 @@
 // Volumes, drive letters and mount points.
-#include "tests/windows/abi_pc/state.h"
+#include "simulation/abi/state.h"
 
 namespace abi_pc {
 namespace {
@@ -21,7 +21,8 @@ const sim::Volume* VolumeAt(const Call& call, const std::u16string& place) {
   if (found == kNone) found = index.VolumeByPath(place);
   if (found == kNone) {
     const Position entry = index.Interface(place.substr(0, place.size() - 1));
-    constexpr GUID kVolumes = {0x53F5630D, 0xB6BF, 0x11D0, {0x94, 0xF2, 0x00, 0xA0, 0xC9, 0x1E, 0xFB, 0x8B}};
+    constexpr GUID kVolumes = {
+        0x53F5630D, 0xB6BF, 0x11D0, {0x94, 0xF2, 0x00, 0xA0, 0xC9, 0x1E, 0xFB, 0x8B}};
     if (entry != kNone && machine.interfaces[entry].interfaceClass == AsKey(kVolumes)) {
       found = index.VolumeByDevice(Lowered(machine.interfaces[entry].device));
     }
@@ -40,31 +41,36 @@ HANDLE FirstOf(const Call& call, Search search, wchar_t* buffer, DWORD chars) {
   const auto refuse = [&](DWORD code) { return call.Refuse(code), INVALID_HANDLE_VALUE; };
   if (call.Fails()) return refuse(ERROR_GEN_FAILURE);
   if (search.names.empty()) return refuse(ERROR_NO_MORE_FILES);
-  if (!GiveText(search.names[search.next++], buffer, chars)) return refuse(ERROR_FILENAME_EXCED_RANGE);
+  if (!GiveText(search.names[search.next++], buffer, chars))
+    return refuse(ERROR_FILENAME_EXCED_RANGE);
   return call.Opened(std::move(search));
 }
 
 BOOL NextOf(const Call& call, bool volumes, HANDLE handle, wchar_t* buffer, DWORD chars) {
   SpoilBytes(buffer, chars * sizeof(wchar_t));
   Search* const search = call.Find<Search>(handle);
-  if (search == nullptr || search->volumes != volumes) return call.Misused(ERROR_INVALID_HANDLE, "another search");
+  if (search == nullptr || search->volumes != volumes)
+    return call.Misused(ERROR_INVALID_HANDLE, "another search");
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (search->next == search->names.size()) return call.Refuse(ERROR_NO_MORE_FILES);
-  if (!GiveText(search->names[search->next], buffer, chars)) return call.Refuse(ERROR_FILENAME_EXCED_RANGE);
+  if (!GiveText(search->names[search->next], buffer, chars))
+    return call.Refuse(ERROR_FILENAME_EXCED_RANGE);
   ++search->next;
   return call.Done();
 }
 
 BOOL CloseOf(const Call& call, bool volumes, HANDLE handle) {
   const Search* const search = call.Find<Search>(handle);
-  if (search == nullptr || search->volumes != volumes) return call.Misused(ERROR_INVALID_HANDLE, "another search");
+  if (search == nullptr || search->volumes != volumes)
+    return call.Misused(ERROR_INVALID_HANDLE, "another search");
   return call.Close<Search>(handle);
 }
 
 HANDLE WINAPI FirstVolume(LPWSTR buffer, DWORD chars) {
   const Call call("FindFirstVolumeW");
   Search search{true, {}};
-  for (const sim::Volume& volume : call.Machine().machine.volumes) search.names.push_back(volume.name);
+  for (const sim::Volume& volume : call.Machine().machine.volumes)
+    search.names.push_back(volume.name);
   return FirstOf(call, std::move(search), buffer, chars);
 }
 BOOL WINAPI NextVolume(HANDLE handle, LPWSTR buffer, DWORD chars) {
@@ -77,13 +83,16 @@ HANDLE WINAPI FirstMountPoint(LPCWSTR name, LPWSTR buffer, DWORD chars) {
   const Position volume = call.Machine().index.Volume(PlaceOf(call, name));
   if (volume == kNone) return call.Refuse(ERROR_FILE_NOT_FOUND), INVALID_HANDLE_VALUE;
   Search search{false, {}};
-  for (const auto& mount : call.Machine().machine.volumes[volume].folderMounts) search.names.push_back(mount.folder);
+  for (const auto& mount : call.Machine().machine.volumes[volume].folderMounts)
+    search.names.push_back(mount.folder);
   return FirstOf(call, std::move(search), buffer, chars);
 }
 BOOL WINAPI NextMountPoint(HANDLE handle, LPWSTR buffer, DWORD chars) {
   return NextOf(Call("FindNextVolumeMountPointW"), false, handle, buffer, chars);
 }
-BOOL WINAPI CloseMountPoints(HANDLE handle) { return CloseOf(Call("FindVolumeMountPointClose"), false, handle); }
+BOOL WINAPI CloseMountPoints(HANDLE handle) {
+  return CloseOf(Call("FindVolumeMountPointClose"), false, handle);
+}
 
 BOOL WINAPI PathNames(LPCWSTR name, LPWCH buffer, DWORD chars, PDWORD required) {
   const Call call("GetVolumePathNamesForVolumeNameW");
@@ -93,7 +102,8 @@ BOOL WINAPI PathNames(LPCWSTR name, LPWCH buffer, DWORD chars, PDWORD required) 
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (volume == kNone) return call.Refuse(ERROR_FILE_NOT_FOUND);
   std::u16string list;
-  for (const std::u16string& path : call.Machine().machine.volumes[volume].paths) list += path + u'\0';
+  for (const std::u16string& path : call.Machine().machine.volumes[volume].paths)
+    list += path + u'\0';
   *required = static_cast<DWORD>(list.size() + 1);
   return GiveText(list, buffer, chars) ? call.Done() : call.Refuse(ERROR_MORE_DATA);
 }
@@ -105,7 +115,8 @@ BOOL WINAPI NameOf(LPCWSTR place, LPWSTR buffer, DWORD chars) {
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (volume == nullptr) return call.Refuse(ERROR_FILE_NOT_FOUND);
   // The documentation's "reasonable size" is 50 characters.
-  return GiveText(volume->name, buffer, chars) ? call.Done() : call.Refuse(ERROR_FILENAME_EXCED_RANGE);
+  return GiveText(volume->name, buffer, chars) ? call.Done()
+                                               : call.Refuse(ERROR_FILENAME_EXCED_RANGE);
 }
 
 DWORD WINAPI DriveStrings(DWORD chars, LPWSTR buffer) {
@@ -114,7 +125,8 @@ DWORD WINAPI DriveStrings(DWORD chars, LPWSTR buffer) {
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE), 0;
   std::u16string list;
   for (char16_t letter = u'A'; letter <= u'Z'; ++letter) {
-    if (call.Machine().index.Drive(letter) != kNone) list += std::u16string(1, letter) + u":\\" + u'\0';
+    if (call.Machine().index.Drive(letter) != kNone)
+      list += std::u16string(1, letter) + u":\\" + u'\0';
   }
   call.Done();
   // Without the last zero where it fits, with it where it does not.
@@ -135,20 +147,22 @@ UINT WINAPI DriveType(LPCWSTR path) {
     above.pop_back();
     above.resize(above.rfind(u'\\') + 1);
     const Position volume = call.Machine().index.VolumeByPath(above);
-    if (volume != kNone && above.size() > 3) return call.Machine().machine.volumes[volume].driveType;
-    if (const sim::Drive* const drive = above.size() == 3 ? DriveOf(call, above) : nullptr) return drive->type;
+    if (volume != kNone && above.size() > 3)
+      return call.Machine().machine.volumes[volume].driveType;
+    if (const sim::Drive* const drive = above.size() == 3 ? DriveOf(call, above) : nullptr)
+      return drive->type;
   }
   return DRIVE_NO_ROOT_DIR;
 }
 
-BOOL WINAPI Information(LPCWSTR path, LPWSTR label, DWORD labelChars, LPDWORD serial, LPDWORD longest, LPDWORD flags,
-                        LPWSTR kind, DWORD kindChars) {
+BOOL WINAPI Information(LPCWSTR path, LPWSTR label, DWORD labelChars, LPDWORD serial,
+                        LPDWORD longest, LPDWORD flags, LPWSTR kind, DWORD kindChars) {
   const Call call("GetVolumeInformationW");
   Spoil(serial, longest, flags);
   SpoilBytes(label, labelChars * sizeof(wchar_t));
   SpoilBytes(kind, kindChars * sizeof(wchar_t));
-  // The component asks with the path of a volume's device interface as it is. That is published, and deliberate: the
-  // serial number stays unknown.
+  // The component asks with the path of a volume's device interface as it is. That is published,
+  // and deliberate: the serial number stays unknown.
   const std::u16string place = Lowered(Units(path));
   if (!place.ends_with(u'\\')) {
     call.Want(place.starts_with(u"\\\\?\\"), "no backslash at the end");

@@ -1,4 +1,4 @@
-#include "tests/windows/abi_pc/state.h"
+#include "simulation/abi/state.h"
 
 #include <sstream>
 
@@ -73,15 +73,16 @@ std::vector<std::string> Breaches() {
 Open OpenNow() {
   const std::lock_guard lock(Pc().mutex);
   Open open;
-  std::size_t* const kinds[] = {&open.files, &open.sets, &open.imageLists, &open.searches, &open.notifications};
+  std::size_t* const kinds[] = {&open.files, &open.sets, &open.imageLists, &open.searches,
+                                &open.notifications};
   for (const auto& entry : Pc().open) ++*kinds[entry.second.index()];
   return open;
 }
 
 std::string TextOf(const Open& open) {
   std::ostringstream text;
-  text << open.files << " files, " << open.sets << " sets, " << open.imageLists << " image lists, " << open.searches
-       << " searches, " << open.notifications << " notifications";
+  text << open.files << " files, " << open.sets << " sets, " << open.imageLists << " image lists, "
+       << open.searches << " searches, " << open.notifications << " notifications";
   return text.str();
 }
 
@@ -122,7 +123,8 @@ std::string BytesOf(const Number& number) {
 }  // namespace
 
 std::optional<std::pair<DWORD, std::string>> PropertyOf(const sim::Device& device, DWORD property) {
-  const auto value = [](DWORD type, const auto& member) -> std::optional<std::pair<DWORD, std::string>> {
+  const auto value = [](DWORD type,
+                        const auto& member) -> std::optional<std::pair<DWORD, std::string>> {
     if (!member) return std::nullopt;
     return std::pair(type, BytesOf(*member));
   };
@@ -166,12 +168,15 @@ void VisitImports(HMODULE module, Visit visit) {
   auto* const base = reinterpret_cast<unsigned char*>(module);
   const auto* const dos = reinterpret_cast<const IMAGE_DOS_HEADER*>(base);
   const auto* const headers = reinterpret_cast<const IMAGE_NT_HEADERS*>(base + dos->e_lfanew);
-  const DWORD place = headers->OptionalHeader.DataDirectory[IMAGE_DIRECTORY_ENTRY_IMPORT].VirtualAddress;
-  for (auto* dll = reinterpret_cast<const IMAGE_IMPORT_DESCRIPTOR*>(base + place); dll->Name != 0; ++dll) {
+  const DWORD place =
+      headers->OptionalHeader.DataDirectory[IMAGE_DIRECTORY_ENTRY_IMPORT].VirtualAddress;
+  for (auto* dll = reinterpret_cast<const IMAGE_IMPORT_DESCRIPTOR*>(base + place); dll->Name != 0;
+       ++dll) {
     const auto* name = reinterpret_cast<const IMAGE_THUNK_DATA*>(base + dll->OriginalFirstThunk);
     auto* slot = reinterpret_cast<IMAGE_THUNK_DATA*>(base + dll->FirstThunk);
     for (; name->u1.AddressOfData != 0; ++name, ++slot) {
-      const auto* const entry = reinterpret_cast<const IMAGE_IMPORT_BY_NAME*>(base + name->u1.AddressOfData);
+      const auto* const entry =
+          reinterpret_cast<const IMAGE_IMPORT_BY_NAME*>(base + name->u1.AddressOfData);
       visit(std::string(reinterpret_cast<const char*>(base + dll->Name)),
             std::string(reinterpret_cast<const char*>(entry->Name)), slot);
     }
@@ -189,15 +194,21 @@ void Put(IMAGE_THUNK_DATA* slot, void* function) {
 
 void Attach(HMODULE module) {
   Functions functions = SetupFunctions();
-  for (const Functions& more : {NodeFunctions(), FileFunctions(), VolumeFunctions(), NotificationFunctions()}) {
+  for (const Functions& more :
+       {NodeFunctions(), FileFunctions(), VolumeFunctions(), NotificationFunctions()}) {
     functions.insert(more.begin(), more.end());
   }
-  VisitImports(module, [&](const std::string& dll, const std::string& function, IMAGE_THUNK_DATA* slot) {
-    if (const auto own = functions.find(function); own != functions.end()) return Put(slot, own->second);
-    const bool machine = _stricmp(dll.c_str(), "SETUPAPI.dll") == 0 || _stricmp(dll.c_str(), "cfgmgr32.dll") == 0 ||
-                         function.find("Volume") != function.npos || function.find("Drive") != function.npos;
-    if (machine) Pc().breaches.push_back(dll + " " + function + ": imported, and not known here");
-  });
+  VisitImports(module,
+               [&](const std::string& dll, const std::string& function, IMAGE_THUNK_DATA* slot) {
+                 if (const auto own = functions.find(function); own != functions.end())
+                   return Put(slot, own->second);
+                 const bool machine = _stricmp(dll.c_str(), "SETUPAPI.dll") == 0 ||
+                                      _stricmp(dll.c_str(), "cfgmgr32.dll") == 0 ||
+                                      function.find("Volume") != function.npos ||
+                                      function.find("Drive") != function.npos;
+                 if (machine)
+                   Pc().breaches.push_back(dll + " " + function + ": imported, and not known here");
+               });
 }
 
 bool Replace(HMODULE module, const std::string& function, void* with) {
