@@ -306,17 +306,23 @@ void Anonymiser::Replace(Machine& machine) {
   }
 }
 
+ReplacedCounts Anonymiser::Counts() const noexcept {
+  return {m_serials,   m_guids,          m_volumeSerials.size(),
+          m_addresses, m_folders.Size(), m_names.Size()};
+}
+
 Text Anonymiser::Report() const {
   const auto count = [](std::size_t number, const char16_t* one, const char16_t* many) {
     return platform::Decimal(static_cast<std::int32_t>(number)) + u" " + (number == 1 ? one : many);
   };
+  const ReplacedCounts counts = Counts();
   return u"Replaced, equal ones by equal ones: " +
-         count(m_serials, u"serial number", u"serial numbers") + u", " +
-         count(m_guids, u"volume GUID or other id", u"volume GUIDs and other ids") + u", " +
-         count(m_volumeSerials.size(), u"volume serial number", u"volume serial numbers") + u", " +
-         count(m_addresses, u"Bluetooth address", u"Bluetooth addresses") + u", " +
-         count(m_folders.Size(), u"folder name", u"folder names") + u", " +
-         count(m_names.Size(), u"word", u"words") + u" of names that people gave.";
+         count(counts.serialNumbers, u"serial number", u"serial numbers") + u", " +
+         count(counts.ids, u"volume GUID or other id", u"volume GUIDs and other ids") + u", " +
+         count(counts.volumeSerialNumbers, u"volume serial number", u"volume serial numbers") +
+         u", " + count(counts.bluetoothAddresses, u"Bluetooth address", u"Bluetooth addresses") +
+         u", " + count(counts.folderNames, u"folder name", u"folder names") + u", " +
+         count(counts.nameWords, u"word", u"words") + u" of names that people gave.";
 }
 
 }  // namespace recorder

@@ -12,6 +12,16 @@
 
 namespace recorder {
 
+// How many different texts of each kind were replaced.
+struct ReplacedCounts {
+  std::size_t serialNumbers = 0;
+  std::size_t ids = 0;  // volume GUIDs, and others that stand for one installation
+  std::size_t volumeSerialNumbers = 0;
+  std::size_t bluetoothAddresses = 0;
+  std::size_t folderNames = 0;
+  std::size_t nameWords = 0;  // of names that people gave
+};
+
 // Replaces what could lead to a person or to one thing of theirs: serial numbers of devices and
 // disks, GUIDs and serial numbers of volumes, other ids that stand for one installation, Bluetooth
 // addresses, names of folders, and names that people give (to phones, headsets, printers). What
@@ -23,7 +33,9 @@ namespace recorder {
 class Anonymiser {
  public:
   void Anonymise(platform::simulated::Machine& machine);
-  // What was replaced so far, in a sentence for people.
+  // What was replaced so far.
+  ReplacedCounts Counts() const noexcept;
+  // The same in a sentence for people.
   Text Report() const;
 
  private:

@@ -68,5 +68,32 @@ TEST(Recorder, ShowsMadeUpPcsAsTheyAre) {
   ExpectSameBuilds(1, many == nullptr ? 30 : static_cast<std::uint32_t>(std::strtoul(many, nullptr, 10)));
 }
 
+// What failed is left out, and what is there can be read, built over and recorded again; nothing stays open.
+TEST(Recorder, WritesWhatItGetsWhenCallsFail) {
+  const Machine machine = RandomMachine(7);
+  const std::string whole = WriteMachine(RecordedCleanly(machine));
+  SimulatedPc pc(machine);
+  platform::wrappers::FailingHost host(pc);
+  RecordMachine(host);
+  const std::uint64_t calls = host.Calls();
+  std::uint64_t partial = 0, tried = 0;
+  for (std::uint64_t call = 1; call <= calls && !testing::Test::HasFailure(); call += 3) {
+    SCOPED_TRACE("call " + std::to_string(call));
+    host.SetPlan({.call = call, .onwards = call % 2 == 0});
+    const Machine recorded = RecordMachine(host);
+    EXPECT_GE(host.Failures(), 1u);
+    EXPECT_EQ(pc.Open(), platform::simulated::OpenCounts());
+    EXPECT_LE(recorded.devices.size(), machine.devices.size());
+    const Machine read = ReadBack(recorded);  // throws for a file that could not be read
+    EXPECT_EQ(WriteMachine(read), WriteMachine(recorded));
+    EXPECT_NE(BuildOver(read), "");
+    partial += WriteMachine(recorded) != whole ? 1 : 0;
+    ++tried;
+  }
+  EXPECT_TRUE(pc.Misuses().empty());
+  std::cout << tried << " failures, " << partial << " partial recordings\n";
+  EXPECT_GT(partial, tried / 2);
+}
+
 }  // namespace
 }  // namespace recorder

@@ -30,7 +30,7 @@ inline std::vector<std::string> Lines(const std::string& text) {
   return lines;
 }
 
-// All JSON that any test makes is held against the schema: that of watch line by line.
+// All JSON that any test makes is held against the schema: that of watch and record line by line.
 inline void CheckJson(const std::string& text, bool byLine) {
   for (const std::string& part : byLine ? Lines(text) : std::vector{text}) {
     const Json json = Json::parse(part, nullptr, false);
@@ -43,7 +43,8 @@ inline ProgramResult RunClient(const Args& args) {
   ProgramResult result = RunProgram(ZKUSB_PROGRAM, args);
   const bool help = std::ranges::count(args, "--help") != 0;
   const bool json = std::ranges::count(args, "--json") == 1 && result.code != kRefused && !help;
-  if (json) CheckJson(result.out, std::ranges::count(args, "watch") == 1);
+  const auto byLine = [](const std::string& arg) { return arg == "watch" || arg == "record"; };
+  if (json) CheckJson(result.out, std::ranges::any_of(args, byLine));
   return result;
 }
 

@@ -1,5 +1,13 @@
-#include <gmock/gmock.h>
+#include "tools/zkusb/record_command.h"
 
+#include <csignal>
+#include <thread>
+
+#include "platform/console.h"
+#include "platform/system.h"
+#include "simulation/machine/machine_file.h"
+#include "simulation/machine/machine_writer.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/tools/client.h"
 
 namespace zkusb {
@@ -60,12 +68,88 @@ TEST(RecordCommand, WritesWhatChangesAsAScript) {
   EXPECT_GE(events.size(), 4u);
   EXPECT_EQ(Events(Output({"watch", "--machine", file.Path(), "--script", recorded})), events);
 #endif
+  // Both together make a page with the events; one of a recording names nobody where the recording does not.
+  Output({"record", file.Path(), "--watch", "--script", script});
+  const TemporaryFile page("");
+  Output({"page", page.Path(), "--machine", file.Path(), "--script", recorded});
+  const std::string html = FileText(page.Path());
+  EXPECT_THAT(html, testing::AllOf(HasSubstr("KDeviceModified"), Not(HasSubstr("AA010603160707470215")),
+                                   Not(HasSubstr("60A44C413FD1B2A1C9A60135"))));
+  std::filesystem::remove(recorded);
+}
+
+// Pulls out and plugs in what a script says, each time as soon as the recording has the step before, then presses
+// Ctrl-C.
+void PlayInRealTime(platform::simulated::SimulatedPc& pc, const platform::simulated::Script& script,
+                    const std::string& recorded) {
+  const auto steps = [&] {
+    const Json json = Json::parse(FileText(recorded), nullptr, false);
+    return json.is_discarded() ? 0 : json.at("steps").size();
+  };
+  const auto waitFor = [](const auto& holds) {
+    for (int waited = 0; waited < 30'000 && !holds(); waited += 20) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    }
+    EXPECT_TRUE(holds());
+  };
+  waitFor([&] { return std::filesystem::exists(recorded); });
+  for (const platform::simulated::Step& step : script) {
+    const std::string before = WriteMachine(pc.Snapshot());
+    const std::size_t stepsBefore = steps();
+    EXPECT_EQ(pc.Apply(step), u"");
+    if (WriteMachine(pc.Snapshot()) != before) waitFor([&] { return steps() > stepsBefore; });
+  }
+#ifdef _WIN32
+  platform::Interrupt();  // these tests have no console to press it in
+#else
+  std::raise(SIGINT);
+#endif
+}
+
+// Over a PC that stands in for the one the program runs on, in this process: only such a one is watched in real time.
+TEST(RecordCommand, WatchesInRealTimeUntilCtrlC) {
+  const std::string scriptFile = (MachinesFolder() / "scripts" / "stick-comes-and-goes.json").string();
+  const auto machine = platform::simulated::LoadMachine(MachineFile("dell-precision"));
+  const auto script = platform::simulated::LoadScript(scriptFile, machine);
+  platform::simulated::SimulatedPc pc(machine);
+  Options options;
+  options.command = Command::kRecord;
+  options.json = options.withSerials = options.recordWatch = true;
+  options.file = UniquePath(u8".json");
+  std::string recorded = options.file;
+  recorded.replace(recorded.size() - 5, 5, ".script.json");
+  const platform::System system = platform::CurrentSystem();
+  platform::SetCurrentSystem({.host = &pc});
+  std::thread player([&] { PlayInRealTime(pc, script, recorded); });
+  std::ostringstream text;
+  Writer out(text);
+  Record(options, out);
+  player.join();
+  platform::SetCurrentSystem(system);
+
+  EXPECT_TRUE(pc.Misuses().empty());
+  EXPECT_EQ(pc.Open(), platform::simulated::OpenCounts());
+  CheckJson(text.str(), true);
+  const std::vector<std::string> lines = Lines(text.str());
+  std::string told;
+  for (const std::string& line : lines) told += Json::parse(line).at("line").get<std::string>() + " ";
+  EXPECT_EQ(told, "file script step step end ");
+  EXPECT_EQ(Json::parse(lines.at(0)).at("devices"), machine.devices.size());
+  EXPECT_EQ(Json::parse(lines.at(0)).at("replaced").at("serialNumbers"), 0);
+  EXPECT_EQ(Json::parse(lines.back()).at("incomplete"), 0);
+#ifndef _WIN32  // in real time, where events wander from step to step
+  const auto events = Events(Output({"watch", "--script", scriptFile}));
+  EXPECT_GE(events.size(), 4u);
+  EXPECT_EQ(Events(Output({"watch", "--machine", options.file, "--script", recorded})), events);
+#endif
+  std::filesystem::remove(options.file);
   std::filesystem::remove(recorded);
 }
 
 TEST(RecordCommand, RefusesWhatCannotBeDone) {
   const std::tuple<Args, std::string> cases[] = {
       {{"record"}, "is required"},
+      {{"record", "a", "--for", "1"}, "--for requires --watch"},
       {{"record", "a", "--anonymous", "--with-serials"}, "--anonymous excludes --with-serials"},
       {{"record", "/no/such/folder/file", "--machine", MachineFile("vmware-win7")}, "cannot be written"},
       {{"check"}, "is required"},
@@ -104,7 +188,7 @@ TEST(CheckCommand, SaysEverythingThatIsWrong) {
                            testing::StartsWith(inScript + "steps[3]: needs one of"),
                            testing::StartsWith(suspicious + "hubs[0].ports[0].driverKey: no device has the driver key"),
                            testing::StartsWith(suspicious + "drives[")));
-  const ProgramResult json = RunProgram(ZKUSB_PROGRAM, {"check", machine.Path(), "--json"});
+  const ProgramResult json = RunClient({"check", machine.Path(), "--json"});
   EXPECT_EQ(json.code, kNothingFound);
   EXPECT_EQ(Json::parse(json.out).at("findings").size(), 5u);
 }

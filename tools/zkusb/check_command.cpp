@@ -30,10 +30,11 @@ class Findings {
     }
   }
 
-  int Finish(const std::string& file) {
+  int Finish(const std::string& file, const std::string& script) {
     if (m_json) {
       Json document = DocumentHead("check");
       document["file"] = file;
+      document["script"] = script;
       document["findings"] = m_list;
       m_out.JsonLine(document);
     } else if (m_count == 0) {
@@ -64,7 +65,7 @@ int Check(const Options& options, Writer& out) {
   for (const std::string& suspicion : platform::simulated::Suspicions(machine)) {
     findings.Tell("suspicious", options.file + ": " + suspicion);
   }
-  return findings.Finish(options.file);
+  return findings.Finish(options.file, options.scriptFile);
 }
 
 }  // namespace zkusb

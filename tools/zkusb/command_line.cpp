@@ -91,20 +91,17 @@ class Grammar {
                         "Replace serial numbers and what else leads to a person (the default)");
     record.add_flag("--with-serials", m_options.withSerials, "Replace nothing")
         ->excludes(anonymous);
-    record.add_flag("--watch", m_options.recordWatch,
-                    "Go on until Ctrl-C, and write each change into the file's script");
+    CLI::Option* const watch =
+        record.add_flag("--watch", m_options.recordWatch,
+                        "Go on until Ctrl-C, and write each change into the file's script");
+    m_recordFor = &AddFor(record, "End --watch after so long");
+    m_recordFor->needs(watch);
     Add("check", Command::kCheck)
         .add_option("INPUT", m_options.file, "The machine file to read")
         ->type_name("")
         ->required();
-    m_for = Add("watch", Command::kWatch)
-                .add_option("--for", "End so long behind the script's end, or behind the start")
-                ->type_name("SECONDS")
-                ->check(CLI::Range(0.0, 86400.0).description(""))
-                // "nan" is neither below nor above it.
-                ->check([](const std::string& text) {
-                  return text.find_first_of("nN") == text.npos ? "" : text + " is not a number";
-                });
+    m_watchFor = &AddFor(Add("watch", Command::kWatch),
+                         "End so long behind the script's end, or behind the start");
     Add("register", Command::kRegister);
     Add("unregister", Command::kUnregister);
   }
@@ -130,8 +127,9 @@ class Grammar {
       }
       if (std::ranges::count(m_options.terms, std::string()) != 0) Refuse("TERM: is empty");
     }
-    if (!m_for->empty()) {
-      m_options.watchMilliseconds = static_cast<std::uint32_t>(m_for->as<double>() * 1000);
+    for (const CLI::Option* seconds : {m_watchFor, m_recordFor}) {
+      if (seconds->empty()) continue;
+      m_options.watchMilliseconds = static_cast<std::uint32_t>(seconds->as<double>() * 1000);
     }
     return {m_options, {}};
   }
@@ -144,6 +142,16 @@ class Grammar {
     sub->footer(ExamplesText(help));
     sub->callback([this, value] { m_options.command = value; });
     return *sub;
+  }
+
+  static CLI::Option& AddFor(CLI::App& command, const std::string& meaning) {
+    return *command.add_option("--for", meaning)
+                ->type_name("SECONDS")
+                ->check(CLI::Range(0.0, 86400.0).description(""))
+                // "nan" is neither below nor above it.
+                ->check([](const std::string& text) {
+                  return text.find_first_of("nN") == text.npos ? "" : text + " is not a number";
+                });
   }
 
   // What is no command and no option came here, wherever it stood.
@@ -167,7 +175,8 @@ class Grammar {
   CLI::Option* m_letter = nullptr;
   CLI::Option* m_vendor = nullptr;
   CLI::Option* m_product = nullptr;
-  CLI::Option* m_for = nullptr;
+  CLI::Option* m_watchFor = nullptr;
+  CLI::Option* m_recordFor = nullptr;
 };
 
 }  // namespace

@@ -28,8 +28,9 @@ struct Options {
   std::string machineFile;  // empty: this PC or the built-in machine
   std::string scriptFile;   // empty: none
   bool json = false;
-  std::optional<std::size_t> columns;              // of --width; 0 is without limit
-  std::optional<std::uint32_t> watchMilliseconds;  // of watch: how long behind the script's end
+  std::optional<std::size_t> columns;  // of --width; 0 is without limit
+  // Of watch: how long behind the script's end. Of record: how long it watches.
+  std::optional<std::uint32_t> watchMilliseconds;
   std::vector<std::string> terms;  // of find, with vendor and product: all must hold
   std::optional<std::uint16_t> vendor;
   std::optional<std::uint16_t> product;

@@ -46,16 +46,24 @@ const std::vector<CommandHelp>& AllHelp() {
       {"page",
        "Write the PC as one HTML file to look at and to send",
        "One file that needs no network: the topology, the volumes and, with a script, the events. "
-       "It opens in any browser. It holds serial numbers, as the PC has them.",
+       "It opens in any browser. It holds serial numbers and names as the PC has them; a page of a "
+       "recording holds what the recording holds, which is without serial numbers by default.",
        {{"page usb.html", "the PC as it stands"},
         {"page usb.html --script machines/scripts/card-in-slot.json --machine "
          "machines/hp-cardreader.json",
-         "with the events of a script"}}},
+         "with the events of a script"},
+        {"page usb.html --machine pc.json --script pc.script.json",
+         "of what record --watch has written, without serial numbers"}}},
       {"record",
        "Write the PC into a machine file",
-       "What leads to a person is replaced, equal by equal, unless --with-serials keeps it.",
+       "What leads to a person is replaced, equal by equal, unless --with-serials keeps it. The "
+       "file "
+       "says what was replaced. With --watch it goes on, and writes each change into a script "
+       "beside "
+       "the file, which it writes anew each time.",
        {{"record pc.json", "the PC, without serial numbers"},
-        {"record --watch pc.json", "and then each change, as a step of pc.script.json"}}},
+        {"record --watch pc.json", "and then each change, as a step of pc.script.json"},
+        {"record --watch --for 60 pc.json", "the same for a minute"}}},
       {"check",
        "What is wrong or suspicious in a machine file, or in the script over it",
        "One line for each fault. It exits with 1 where there is one.",

@@ -9,6 +9,7 @@
 #include <thread>
 #include <utility>
 
+#include "platform/console.h"
 #include "platform/system.h"
 #include "platform/text.h"
 #include "recorder/anonymiser.h"
@@ -19,7 +20,7 @@
 #include "simulation/machine/machine_file.h"
 #include "simulation/machine/machine_writer.h"
 #include "simulation/pc/simulated_pc.h"
-#include "tools/zkusb/interrupt.h"
+#include "tools/zkusb/json_document.h"
 
 namespace zkusb {
 
@@ -88,22 +89,90 @@ std::u16string Counted(std::size_t number, std::u16string_view one) {
   return number == 1 ? text : text + u"s";
 }
 
+// Tells what is written, to people or as JSON Lines.
+class Report {
+ public:
+  Report(const Options& options, Writer& out) : m_options(options), m_out(out) {
+    if (options.recordWatch) out.FlushEachLine();
+  }
+
+  void TellFile(const Machine& machine, const recorder::ReplacedCounts& replaced) {
+    if (!m_options.json) {
+      m_out.Line(platform::FromUtf8(m_options.file) + u": " +
+                 Counted(machine.devices.size(), u"device") + u", " +
+                 Counted(machine.hubs.size(), u"hub") + u", " +
+                 Counted(machine.volumes.size(), u"volume"));
+      for (const std::u16string& note : machine.notes) m_out.Line(u"  " + note);
+      return;
+    }
+    TellJson("file", {{"file", m_options.file},
+                      {"devices", machine.devices.size()},
+                      {"hubs", machine.hubs.size()},
+                      {"volumes", machine.volumes.size()},
+                      {"notes", TextsJson(machine.notes)},
+                      {"replaced",
+                       {{"serialNumbers", replaced.serialNumbers},
+                        {"ids", replaced.ids},
+                        {"volumeSerialNumbers", replaced.volumeSerialNumbers},
+                        {"bluetoothAddresses", replaced.bluetoothAddresses},
+                        {"folderNames", replaced.folderNames},
+                        {"nameWords", replaced.nameWords}}}});
+  }
+
+  void TellScript(const std::string& file, bool inRealTime) {
+    if (m_options.json) return TellJson("script", {{"file", file}});
+    const bool untilCtrlC = inRealTime && !m_options.watchMilliseconds;
+    m_out.Line(platform::FromUtf8(file) + u": what changes" +
+               (untilCtrlC ? u", until Ctrl-C" : u""));
+  }
+
+  void TellStep(const platform::simulated::Step& step) {
+    if (m_options.json) {
+      return TellJson("step", {{"at", step.atMilliseconds}, {"step", TextJson(step.name)}});
+    }
+    m_out.Line(u"  +" + platform::Decimal(static_cast<std::int32_t>(step.atMilliseconds)) +
+               u" ms  " + step.name);
+  }
+
+  void TellEnd(std::size_t steps, std::size_t incomplete) {
+    if (m_options.json) return TellJson("end", {{"steps", steps}, {"incomplete", incomplete}});
+    m_out.Line(Counted(steps, u"step"));
+  }
+
+  bool IsHeard() const { return m_out.Good(); }
+
+ private:
+  void TellJson(const char* line, const Json& members) {
+    Json document = DocumentHead("record");
+    document["line"] = line;
+    document.update(members);
+    m_out.JsonLine(document);
+  }
+
+  const Options& m_options;
+  Writer& m_out;
+};
+
 class RecordCommand {
  public:
   RecordCommand(const Options& options, Writer& out)
-      : m_options(options), m_out(out), m_pc(options), m_scriptFile(ScriptFileOf(options.file)) {}
+      : m_options(options),
+        m_report(options, out),
+        m_pc(options),
+        m_scriptFile(ScriptFileOf(options.file)) {}
 
   void Run() {
+    // A change during the recording is one that comes after it.
+    if (!m_pc.IsSimulated() && m_options.recordWatch) {
+      platform::CatchInterrupts();
+      m_seen = recorder::Glance(m_pc.Host());
+    }
     m_state = Look();
     Machine written = m_state;
     written.name = u"Recorded PC";
     written.notes.insert(written.notes.begin(), Origin());
     WriteChecked(written);
-    m_out.Line(platform::FromUtf8(m_options.file) + u": " +
-               Counted(written.devices.size(), u"device") + u", " +
-               Counted(written.hubs.size(), u"hub") + u", " +
-               Counted(written.volumes.size(), u"volume"));
-    for (const std::u16string& note : written.notes) m_out.Line(u"  " + note);
+    m_report.TellFile(written, m_anonymiser.Counts());
     if (m_options.recordWatch) Watch();
   }
 
@@ -128,8 +197,7 @@ class RecordCommand {
 
   void Watch() {
     WriteScript();
-    m_out.Line(platform::FromUtf8(m_scriptFile) + u": what changes" +
-               (m_pc.IsSimulated() ? u"" : u", until Ctrl-C"));
+    m_report.TellScript(m_scriptFile, !m_pc.IsSimulated());
     if (m_pc.IsSimulated()) {
       for (const auto& step : m_pc.Steps()) {
         m_pc.Apply(step);
@@ -138,27 +206,34 @@ class RecordCommand {
     } else {
       WatchInRealTime();
     }
-    m_out.Line(Counted(m_script.size(), u"step"));
+    m_report.TellEnd(m_script.size(), m_incomplete);
   }
 
   void WatchInRealTime() {
-    const Interrupt interrupt;
     const Clock::time_point start = Clock::now();
-    std::u16string seen = recorder::Glance(m_pc.Host());
+    const auto milliseconds = [&] {
+      return static_cast<std::uint32_t>(
+          std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start).count());
+    };
     bool changing = false;
     std::uint32_t changedAt = 0;
-    while (!Interrupt::Happened()) {
+    bool ends = false;
+    while (!ends) {
       std::this_thread::sleep_for(kBetweenGlances);
+      // What has changed by then is written down, be it over or not.
+      ends = platform::Interrupted() || !m_report.IsHeard() ||
+             (m_options.watchMilliseconds && milliseconds() >= *m_options.watchMilliseconds);
       std::u16string now = recorder::Glance(m_pc.Host());
-      if (now != seen && !changing) {
+      const bool same = now == m_seen;
+      if (!same && !changing) {
         changing = true;
-        changedAt = static_cast<std::uint32_t>(
-            std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start).count());
-      } else if (now == seen && changing) {
+        changedAt = milliseconds();
+      }
+      if (changing && (same || ends)) {
         NoteChange(changedAt);
         changing = false;
       }
-      seen = std::move(now);
+      m_seen = std::move(now);
     }
   }
 
@@ -167,10 +242,7 @@ class RecordCommand {
     m_state = std::move(difference.after);
     if (!difference.complete) ++m_incomplete;
     if (difference.steps.empty()) return;
-    for (const auto& step : difference.steps) {
-      m_out.Line(u"  +" + platform::Decimal(static_cast<std::int32_t>(step.atMilliseconds)) +
-                 u" ms  " + step.name);
-    }
+    for (const auto& step : difference.steps) m_report.TellStep(step);
     m_script.insert(m_script.end(), difference.steps.begin(), difference.steps.end());
     WriteScript();
   }
@@ -186,11 +258,12 @@ class RecordCommand {
   }
 
   const Options& m_options;
-  Writer& m_out;
+  Report m_report;
   RecordedPc m_pc;
   const std::string m_scriptFile;
   recorder::Anonymiser m_anonymiser;
-  Machine m_state;  // as the script knows the PC
+  std::u16string m_seen;  // at the last look in real time
+  Machine m_state;        // as the script knows the PC
   Script m_script;
   std::size_t m_incomplete = 0;
 };
