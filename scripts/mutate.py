@@ -1,20 +1,26 @@
 #!/usr/bin/env python3
 """Makes one-token mutants of the sources, builds and tests each, and lists those that survive.
 
-    scripts/mutate.py --seed N --count N --build DIR --targets "T..." --tests "COMMAND" FOLDER...
+    scripts/mutate.py --seed N [--count N] [--first N] [--minutes N] FOLDER...
 
-Works in a copy of the repository beside the build (DIR/mutants), so sources stay as they are. A mutant that
-does not compile counts as none. Each line of the output is one mutant: caught or SURVIVED, where, and what was
-changed; the last lines are the counts. The same seed makes the same mutants of the same sources.
+Works in a copy of the repository in build/mutants, so sources stay as they are. Each source is compiled alone
+and each test program linked only when its turn comes: those of the mutant's own room first, then the cheapest
+first, until one fails, crashes or hangs. A mutant that does not compile counts as none. Each line of the output
+is one mutant: caught or SURVIVED, where, what was changed, and the program that saw it; the last lines are the
+counts. The same seed makes the same mutants of the same sources.
 """
 import argparse
+import json
+import os
 import pathlib
 import random
 import re
-import shlex
+import resource
 import shutil
+import signal
 import subprocess
 import sys
+import time
 
 SWAPS = [("==", "!="), ("!=", "=="), ("<=", "<"), (">=", ">"), (" < ", " <= "), (" > ", " >= "), ("&&", "||"),
          ("||", "&&"), (" + ", " - "), (" - ", " + "), ("true", "false"), ("false", "true"), ("++", "--"),
@@ -43,26 +49,58 @@ def places(text):
                 at = text.find(old, at + 1, end)
 
 
+PROGRAM_LIMIT = 4 << 30  # bytes of address space: a mutant may ask for memory without end
+
+
+class Tests:
+    """The test programs of a build, cheapest first; those of the mutant's own room before all others."""
+
+    def __init__(self, build, seconds):
+        self.build, self.seconds = build, seconds
+        listed = subprocess.run(["ninja", "-C", str(build), "-t", "targets", "all"], check=True, capture_output=True, text=True)
+        self.names = sorted(set(re.findall(r"^(zkusb_\w+_tests|zkusb_growth): phony", listed.stdout, re.M)))
+        self.cost = {}
+
+    def make(self, targets):
+        return run(["ninja", "-C", str(self.build), "-j2", *targets], self.build, self.seconds)
+
+    def passes(self, name):
+        begun = time.monotonic()
+        limit = max(self.seconds, 10 * self.cost.get(name, 0))
+        code = run([str(self.build / "bin" / name), "--gtest_fail_fast", "--gtest_brief=1"], self.build, limit)
+        self.cost.setdefault(name, time.monotonic() - begun)
+        return code == 0
+
+    def in_order_for(self, room):
+        def rank(name):
+            near = name.startswith(f"zkusb_{room}_") or (room, name) == ("monitor", "zkusb_notifier_tests")
+            return (not near, self.cost[name])
+        return sorted(self.names, key=rank)
+
+    def verdict(self, room):
+        """caught or SURVIVED with the program that says so; "not built" where the compiler refuses the mutant."""
+        for number, name in enumerate(self.in_order_for(room)):
+            if self.make([name]) != 0:
+                return "not built", name if number else ""
+            if not self.passes(name):
+                return "caught", name
+        return "SURVIVED", ""
+
+
 def run(command, folder, seconds):
-    try:
-        return subprocess.run(command, cwd=folder, shell=isinstance(command, str), timeout=seconds,
-                              stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL).returncode
-    except subprocess.TimeoutExpired:
-        return -1
+    def bound():
+        resource.setrlimit(resource.RLIMIT_AS, (PROGRAM_LIMIT, PROGRAM_LIMIT))
+        signal.signal(signal.SIGHUP, signal.SIG_DFL)  # ignored in what runs in the background
+    with subprocess.Popen(command, cwd=folder, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, preexec_fn=bound,
+                          start_new_session=True) as process:
+        try:
+            return process.wait(seconds)
+        except subprocess.TimeoutExpired:
+            os.killpg(process.pid, signal.SIGKILL)  # and what it has started
+            return -1
 
 
-def main():
-    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
-    parser.add_argument("--seed", type=int, default=1)
-    parser.add_argument("--count", type=int, default=20)
-    parser.add_argument("--build", default="build/debug")
-    parser.add_argument("--targets", default="all")
-    parser.add_argument("--tests", required=True, help="run in the build folder of the copy; {bin} is its programs")
-    parser.add_argument("--seconds", type=int, default=600, help="for one build or one run of the tests")
-    parser.add_argument("folders", nargs="+")
-    args = parser.parse_args()
-
-    root = pathlib.Path(__file__).resolve().parent.parent
+def copied_tree(root):
     copy = root / "build" / "mutants"
     listed = subprocess.run(["git", "ls-files", "-co", "--exclude-standard"], cwd=root, check=True, capture_output=True, text=True)
     for name in listed.stdout.splitlines():
@@ -71,28 +109,61 @@ def main():
             continue
         target.parent.mkdir(parents=True, exist_ok=True)
         shutil.copy(source, target)
-    subprocess.run(["cmake", "--preset", pathlib.Path(args.build).name], cwd=copy, check=True, stdout=subprocess.DEVNULL)
-    build = ["cmake", "--build", "--preset", pathlib.Path(args.build).name, "--target", *shlex.split(args.targets)]
-    tests = args.tests.replace("{bin}", str(copy / args.build / "bin"))
-    if run(build, copy, 7200) != 0 or run(tests, copy, args.seconds) != 0:
-        sys.exit("the sources as they are do not build, or fail their tests")
+    return copy
 
-    files = sorted(path for folder in args.folders for path in (copy / folder).rglob("*.cpp"))
+
+def configured(copy):
+    build = copy / "build" / "mutants"
+    linker = ["-DCMAKE_EXE_LINKER_FLAGS=-fuse-ld=mold", "-DCMAKE_SHARED_LINKER_FLAGS=-fuse-ld=mold"]
+    subprocess.run(["cmake", "-S", str(copy), "-B", str(build), "-G", "Ninja", "-DCMAKE_BUILD_TYPE=Debug",
+                    "-DCMAKE_CXX_FLAGS_DEBUG=-O0 -g0", f"-DCMAKE_PROJECT_INCLUDE={copy}/scripts/mutants.cmake",
+                    *(linker if shutil.which("ld.mold") else [])], check=True, stdout=subprocess.DEVNULL)
+    return build
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("--seed", type=int, required=True)
+    parser.add_argument("--count", type=int, default=20)
+    parser.add_argument("--first", type=int, default=1, help="go on with that mutant of the same seed and count")
+    parser.add_argument("--minutes", type=float, default=0, help="begin no mutant after so long")
+    parser.add_argument("--seconds", type=int, default=300, help="for one build, or one test program that hangs")
+    parser.add_argument("folders", nargs="+")
+    args = parser.parse_args()
+    begun = time.monotonic()
+
+    copy = copied_tree(pathlib.Path(__file__).resolve().parent.parent)
+    build = configured(copy)
+    tests = Tests(build, args.seconds)
+    if run(["ninja", "-C", str(build), "-j2", *tests.names], build, 7200) != 0:
+        sys.exit("the sources as they are do not build")
+    for name in tests.names:
+        if not tests.passes(name):
+            sys.exit(f"the sources as they are fail {name}")
+    print(", ".join(f"{name} {tests.cost[name]:.0f} s" for name in sorted(tests.names, key=tests.cost.get)), flush=True)
+
+    compiled = {pathlib.Path(entry["file"]) for entry in json.loads((build / "compile_commands.json").read_text())}
+    files = sorted(path for folder in args.folders for path in (copy / folder).rglob("*.cpp") if path in compiled)
     every = [(path, *place) for path in files for place in places(path.read_text())]
     chosen = random.Random(args.seed).sample(every, min(args.count, len(every)))
     print(f"seed {args.seed}: {len(chosen)} of {len(every)} mutants", flush=True)
     counts = {"caught": 0, "SURVIVED": 0, "not built": 0}
-    for path, at, old, new in chosen:
+    for number, (path, at, old, new) in enumerate(chosen, 1):
+        if number < args.first:
+            continue
+        if args.minutes and time.monotonic() - begun > 60 * args.minutes:
+            print(f"out of time before mutant {number}")
+            break
         text = path.read_text()
-        path.write_text(text[:at] + new + text[at + len(old):])
-        outcome = "not built"
-        if run(build, copy, args.seconds) == 0:
-            outcome = "SURVIVED" if run(tests, copy, args.seconds) == 0 else "caught"
-        path.write_text(text)
+        try:
+            path.write_text(text[:at] + new + text[at + len(old):])
+            outcome, program = tests.verdict(path.relative_to(copy).parts[0])
+        finally:
+            path.write_text(text)
         counts[outcome] += 1
         line = text.count("\n", 0, at) + 1
-        print(f"{outcome:9}  {path.relative_to(copy)}:{line}  {old.strip()} -> {new.strip()}  |  "
-              f"{text.splitlines()[line - 1].strip()}", flush=True)
+        print(f"{number:4} {outcome:9} {path.relative_to(copy)}:{line}  {old.strip()} -> {new.strip()}  |  "
+              f"{text.splitlines()[line - 1].strip()}  |  {program}", flush=True)
     built = counts["caught"] + counts["SURVIVED"]
     print(f"{built} built, {counts['caught']} caught, {counts['SURVIVED']} survived, {counts['not built']} not built")
 

@@ -40,7 +40,7 @@ class RunningClient {
     m_child = fork();
     if (m_child == 0) {
       // The shell of a test in the background ignores them.
-      std::signal(SIGINT, SIG_DFL);
+      for (const int number : {SIGINT, SIGTERM, SIGHUP}) std::signal(number, SIG_DFL);
       std::signal(SIGPIPE, SIG_DFL);
       dup2(ends[1], STDOUT_FILENO);
       close(ends[0]);

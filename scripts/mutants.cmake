@@ -1,0 +1,16 @@
+# Included by the build of mutants (CMAKE_PROJECT_INCLUDE): each source of the rooms alone, so that a mutant is one
+# file to compile, and each test program as one unit, so that all of them are built once in reasonable time.
+function(zkusb_unite_tests folder)
+  get_property(folders DIRECTORY ${folder} PROPERTY SUBDIRECTORIES)
+  foreach(each IN LISTS folders)
+    zkusb_unite_tests(${each})
+  endforeach()
+  get_property(targets DIRECTORY ${folder} PROPERTY BUILDSYSTEM_TARGETS)
+  foreach(target IN LISTS targets)
+    get_target_property(type ${target} TYPE)
+    if(type STREQUAL "EXECUTABLE")
+      set_target_properties(${target} PROPERTIES UNITY_BUILD ON UNITY_BUILD_BATCH_SIZE 0)
+    endif()
+  endforeach()
+endfunction()
+cmake_language(DEFER DIRECTORY ${CMAKE_SOURCE_DIR} CALL zkusb_unite_tests ${CMAKE_SOURCE_DIR}/tests)
