@@ -1,8 +1,10 @@
-// Clients advise, unadvise, walk and destroy, and broadcasts arrive, in thousands of orders: virtual time lets one
-// thread run until it waits, and the test decides which goes on. Builds wait, too, between their calls to the PC.
+// Clients advise, unadvise, walk and destroy, broadcasts arrive, and the module is unloaded, in thousands of orders:
+// virtual time lets one thread run until it waits, and the test decides which goes on. Builds wait, too, between their
+// calls to the PC.
 #include <gmock/gmock.h>
 
 #include <cstdlib>
+#include <functional>
 #include <iostream>
 #include <random>
 #include <set>
@@ -111,14 +113,13 @@ TEST(Schedules, RandomOrdersEndAlike) {
   }
 }
 
-// Every order of the first choices; behind them the threads take turns.
-TEST(Schedules, AllOrdersOfTheFirstChoicesEndAlike) {
-  const std::size_t depth = Count("ZKUSB_CHOICES", 3);
+// Every order of the first choices; behind them the threads take turns. Returns how many orders there were.
+std::size_t PlayAllOrders(std::size_t depth, const std::function<void(Choose)>& run) {
   std::vector<std::pair<std::size_t, std::size_t>> path;  // what was chosen, of how many
   std::size_t orders = 0;
   do {
     std::size_t at = 0;
-    RunInOneOrder([&](std::size_t threads) {
+    run([&](std::size_t threads) {
       if (at >= depth) return std::size_t{0};
       if (at == path.size()) path.emplace_back(0, threads);
       EXPECT_EQ(path[at].second, threads) << "a run repeats itself";
@@ -128,7 +129,65 @@ TEST(Schedules, AllOrdersOfTheFirstChoicesEndAlike) {
     while (!path.empty() && ++path.back().first >= path.back().second) path.pop_back();
   } while (!path.empty() && !testing::Test::HasFailure());
   std::cout << orders << " orders\n";
-  EXPECT_GE(orders, 8u);
+  return orders;
+}
+
+TEST(Schedules, AllOrdersOfTheFirstChoicesEndAlike) {
+  EXPECT_GE(PlayAllOrders(Count("ZKUSB_CHOICES", 3), RunInOneOrder), 8u);
+}
+
+// The module is unloaded while broadcasts arrive and events are under way, which a client does not see: it has let go
+// of the notifier, or lets go of it meanwhile.
+void UnloadInOneOrder(bool held, Choose choose) {
+  TestSink::Log log;
+  TestSink sink(log, "A");
+  {
+    ModuleProcess process;
+    PausingHost host(process.pc, process.desktop);
+    platform::SetCurrentSystem({.host = &host, .threads = &process.desktop, .desktop = &process.desktop});
+    process.Do({Stick(u"S1", 1, u'E')});
+    process.Start();
+    process.Advise(sink);
+    process.point.Reset();
+    if (!held) process.notifier.Reset();
+    process.UseTreeClass(nullptr);
+    Taken(log);
+    SimulatedDesktop& desktop = process.desktop;
+    desktop.SetChoice(std::move(choose));
+    host.paused = true;
+    bool unloaded = false;
+    std::size_t toldInTime = 0;
+    for (const std::uint32_t port : {2u, 3u}) {
+      process.Launch([&, port] {
+        process.Do({Gadget(port == 2 ? u"M1" : u"M2", port)});
+        EXPECT_EQ(desktop.Broadcast(VolumeBroadcast(platform::kDBT_DEVICEARRIVAL, u'E', 0)), 1u);
+      });
+    }
+    process.Launch([&] {
+      desktop.Sleep(0);
+      process.module->Unload();
+      unloaded = true;
+      toldInTime = log.size();
+      EXPECT_EQ(g_nEventThreads, 0u);
+      EXPECT_EQ(g_pNotifyTarget, nullptr);
+    });
+    desktop.Settle();
+    desktop.SetChoice(nullptr);
+    host.paused = false;
+    EXPECT_TRUE(unloaded);
+    EXPECT_EQ(log.size(), toldInTime) << "told after the unload";
+    EXPECT_EQ(ModuleLockCount(), held ? 2 : 0);
+    // Whether its code is still there is not known, so nobody lets go of it. This is deliberate.
+    EXPECT_EQ(sink.References(), 2);
+    sink.Release();
+  }
+}
+
+TEST(Schedules, AllOrdersOfBroadcastsAndUnloadEndAlike) {
+  for (const bool held : {false, true}) {
+    const auto run = [held](Choose choose) { UnloadInOneOrder(held, std::move(choose)); };
+    EXPECT_GE(PlayAllOrders(Count("ZKUSB_CHOICES", 3), run), 8u);
+  }
 }
 
 }  // namespace

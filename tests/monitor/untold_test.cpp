@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "bench/object_reader.h"
+#include "platform/wrappers/intercepting_host.h"
 #include "tests/support/notifier_scene.h"
 
 namespace KelvoUHW::untold {
@@ -83,6 +84,70 @@ TEST_F(Untold, ADriveLetterThatChanges) {
   EXPECT_EQ(pc.InTree(), "E:\\");
   EXPECT_EQ(pc.Run({Gadget(u"G", 3)}), "A 1 G -, A 0 S1 X:\\, A 0 CR -, A 0 G -, A 3 S1 X:\\, A 3 CR -, A 3 CR -");
   EXPECT_EQ(pc.InTree(), "X:\\");
+}
+
+// Something happens to the PC while a build reads it: between the hubs and what the device manager lists.
+struct Meanwhile final : platform::wrappers::InterceptingHost {
+  using InterceptingHost::InterceptingHost;
+  platform::Status BeforeCall(const platform::wrappers::HostCall& call) noexcept override {
+    const bool listed = call.operation == platform::wrappers::Operation::GetClassDevs && ++lists == 3;
+    if (listed && happens) std::exchange(happens, nullptr)();
+    return {};
+  }
+  int lists = 0;  // of this build
+  std::function<void()> happens;
+};
+
+// The device node of one that comes back is the one it had, so it is not new; that of one that came is told later.
+TEST_F(Untold, ADeviceThatIsResetWhileABuildReads) {
+  const struct {
+    const char* what;
+    std::vector<Change> before, meanwhile;
+    const char *told, *after;  // by the run whose build it was, and by the next one that finds a change
+  } kCases[] = {
+      {"reset",
+       {Gadget(u"G", 4), Unplug{UsbId(u"M")}},
+       {Gadget(u"M", 2)},
+       "A 1 G, A 0 S1, A 0 G, A 2 M, A 3 S1",
+       "A 1 N, A 0 S1, A 0 G, A 0 M, A 0 N, A 3 S1"},
+      {"moved",
+       {Gadget(u"G", 4), Unplug{UsbId(u"M")}},
+       {Gadget(u"M", 3)},
+       "A 1 G, A 0 S1, A 0 G, A 2 M, A 3 S1",
+       "A 1 N, A 0 S1, A 0 G, A 0 M, A 0 N, A 3 S1"},
+      {"came",
+       {Gadget(u"G", 4)},
+       {Gadget(u"L", 3)},
+       "A 1 G, A 0 S1, A 0 M, A 0 G, A 3 S1",
+       "A 1 N, A 1 L, A 0 S1, A 0 M, A 0 G, A 0 L, A 0 N, A 3 S1"},
+      {"went",
+       {Gadget(u"G", 4)},
+       {Unplug{UsbId(u"M")}},
+       "A 1 G, A 0 S1, A 0 G, A 2 M, A 3 S1",
+       "A 1 N, A 0 S1, A 0 G, A 0 N, A 2 M, A 3 S1"},
+  };
+  for (const auto& test : kCases) {
+    SCOPED_TRACE(test.what);
+    TestSink::Log log;
+    TestSink a(log, "A");
+    ModuleProcess process;
+    Meanwhile host(process.pc);
+    platform::SetCurrentSystem({.host = &host, .threads = &process.desktop, .desktop = &process.desktop});
+    process.Do({Stick(u"S1", 1, u'E'), Gadget(u"M", 2)});
+    process.Start();
+    const DWORD cookie = process.Advise(a);
+    EXPECT_EQ(Taken(log), "A 0 S1, A 0 M");
+    process.Do(test.before);
+    host.lists = 0;
+    host.happens = [&] { process.Do(test.meanwhile); };
+    EXPECT_EQ(process.Notify(), S_OK);
+    EXPECT_FALSE(host.happens);
+    EXPECT_EQ(Taken(log), test.told);
+    process.Do({Gadget(u"N", 5)});
+    EXPECT_EQ(process.Notify(), S_OK);
+    EXPECT_EQ(Taken(log), test.after);
+    EXPECT_EQ(process.point->Unadvise(cookie), S_OK);
+  }
 }
 
 // Broadcasts as they come when a device without a volume is plugged in, and when the PC wakes; then a volume's, which
