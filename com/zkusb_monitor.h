@@ -53,8 +53,8 @@ struct IZKUMUsbTreeNode : IUnknown {
       0x8080AF8D, 0x857A, 0x45C4, {0x82, 0x96, 0xAB, 0x13, 0x01, 0xAD, 0xFA, 0x28}};
   virtual HRESULT STDMETHODCALLTYPE get_InstanceId(BSTR* pVal) = 0;
   virtual HRESULT STDMETHODCALLTYPE get_Type(TUsbDeviceType* pType) = 0;
-  // The node object owns the parent: releasing it takes the parent's data out of the tree that is
-  // still in use. Read it at once, keep it, and never release it. E_POINTER for the root.
+  // The node that comes back owns its record: its last Release takes the record out of the tree,
+  // until a build finds the next change. Walk down from the root instead. E_POINTER for the root.
   virtual HRESULT STDMETHODCALLTYPE get_Parent(IZKUMUsbTreeNode** ppIUsbTreeNode) = 0;
   virtual HRESULT STDMETHODCALLTYPE get_Childs(IZKUMUsbTreeNodeEnumerator** ppNodeEnum) = 0;
   // The nodes of a kind in the subtree, this node among them, parents before their children.

@@ -106,8 +106,8 @@ typedef _TUsbDeviceType TUsbDeviceType;
 MIDL_INTERFACE("8080AF8D-857A-45C4-8296-AB1301ADFA28") IZKUMUsbTreeNode : public IUnknown {
   virtual HRESULT STDMETHODCALLTYPE get_InstanceId(BSTR* pVal) = 0;
   virtual HRESULT STDMETHODCALLTYPE get_Type(TUsbDeviceType* pType) = 0;
-  // The node object owns the parent: releasing it takes the parent's data out of the tree that is
-  // still in use. Programs do better without it. E_POINTER for the root.
+  // The node that comes back owns its record: its last Release takes the record out of the tree,
+  // until a build finds the next change. Walk down from the root instead. E_POINTER for the root.
   virtual HRESULT STDMETHODCALLTYPE get_Parent(IZKUMUsbTreeNode** ppIUsbTreeNode) = 0;
   virtual HRESULT STDMETHODCALLTYPE get_Childs(IZKUMUsbTreeNodeEnumerator** ppNodeEnum) = 0;
   // The nodes of a kind in the subtree, this node among them, parents before their children.

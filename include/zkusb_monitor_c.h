@@ -123,8 +123,8 @@ typedef struct IZKUMUsbTreeNodeVtbl {
   ULONG(STDMETHODCALLTYPE* Release)(IZKUMUsbTreeNode* This);
   HRESULT(STDMETHODCALLTYPE* get_InstanceId)(IZKUMUsbTreeNode* This, BSTR* pVal);
   HRESULT(STDMETHODCALLTYPE* get_Type)(IZKUMUsbTreeNode* This, TUsbDeviceType* pType);
-  /* The node object owns the parent: releasing it takes the parent's data out of the tree that is
-   * still in use. Programs do better without it. E_POINTER for the root. */
+  /* The node that comes back owns its record: its last Release takes the record out of the tree,
+   * until a build finds the next change. Walk down from the root instead. E_POINTER for the root. */
   HRESULT(STDMETHODCALLTYPE* get_Parent)(IZKUMUsbTreeNode* This,
       IZKUMUsbTreeNode** ppIUsbTreeNode);
   HRESULT(STDMETHODCALLTYPE* get_Childs)(IZKUMUsbTreeNode* This,
