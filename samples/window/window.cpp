@@ -76,7 +76,8 @@ class DeviceWindow {
         MoveWindow(m_list, 0, 0, LOWORD(second), HIWORD(second), TRUE);
         return true;
       case WM_DESTROY:
-        m_watcher.reset();  // no event comes after it
+        m_closed = true;
+        if (!m_looking) m_watcher.reset();  // no event comes after it
         PostQuitMessage(0);
         return true;
       default:
@@ -92,10 +93,21 @@ class DeviceWindow {
     if (changed) Fill();
   }
 
+  // While it waits, the watcher lets this thread take messages: more events, or the end of the window.
   void Fill() {
+    m_stale = true;
+    if (m_looking) return;
+    std::vector<zkum::Device> devices;
+    m_looking = true;
+    while (m_stale && !m_closed) {
+      m_stale = false;
+      devices = m_watcher->Devices();
+    }
+    m_looking = false;
+    if (m_closed) return m_watcher.reset();
     SendMessageW(m_list, LVM_DELETEALLITEMS, 0, 0);
     int row = 0;
-    for (const zkum::Device& device : m_watcher->Devices()) {
+    for (const zkum::Device& device : devices) {
       SetCell(m_list, row, 0, device.Letters());
       SetCell(m_list, row, 1, device.vendor);
       SetCell(m_list, row, 2, device.product);
@@ -104,6 +116,9 @@ class DeviceWindow {
     }
   }
 
+  bool m_looking = false;  // at the tree
+  bool m_stale = false;    // what was seen there
+  bool m_closed = false;
   HWND m_list = nullptr;
   std::unique_ptr<zkum::Watcher> m_watcher;
 };
