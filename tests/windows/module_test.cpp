@@ -4,7 +4,6 @@
 
 #include <dbt.h>
 #include <gtest/gtest.h>
-#include <process.h>
 
 #include <algorithm>
 #include <array>
@@ -24,6 +23,7 @@
 #include "platform/system.h"
 #include "platform/text.h"
 #include "platform/windows/server_classes.h"
+#include "tests/support/program.h"
 #include "tests/windows/module_files.h"
 #include "tools/zkusb/event_sink.h"
 
@@ -92,14 +92,18 @@ TEST(WindowsModule, RegistersAndUnregisters) {
 }
 
 TEST(WindowsModule, IsRegisteredByTheSystemsOwnProgram) {
-  const auto regsvr32 = [](std::u16string arguments) {
-    arguments.append(u" \"").append(Module()).append(u"\"");
-    return _wspawnlp(_P_WAIT, L"regsvr32.exe", L"regsvr32", platform::ToSystemText(arguments.c_str()), nullptr);
+  const auto regsvr32 = [](std::vector<std::string> arguments) {
+    arguments.insert(arguments.begin(), "/s");
+    arguments.push_back(platform::ToUtf8(Module()));
+    return RunProgram("regsvr32.exe", arguments).code;
   };
-  EXPECT_EQ(regsvr32(u"/s"), 0);
-  ExpectRegistered(Module());
-  EXPECT_EQ(regsvr32(u"/s /u"), 0);
-  EXPECT_EQ(Read(kTreeProgId, u""), "no key");
+  // There is no registration for one user: asked for one, it registers for all.
+  for (const std::vector<std::string>& options : {std::vector<std::string>(), {"/i:user"}}) {
+    EXPECT_EQ(regsvr32(options), 0) << options.size();
+    ExpectRegistered(Module());
+    EXPECT_EQ(regsvr32({"/u"}), 0);
+    EXPECT_EQ(Read(kTreeProgId, u""), "no key");
+  }
 }
 
 TEST(WindowsModule, InstallWritesNothing) {
