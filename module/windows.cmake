@@ -16,6 +16,8 @@ function(zkusb_windows_module name)
   zkusb_version_resource(${name})
   add_dependencies(${name} zkusb_type_library_file)
 
+  # The thread library never gives back what its function takes: platform/windows/thread_data.cpp has another.
+  target_link_options(${name} PRIVATE -Wl,--wrap=pthread_once)
   # 32-bit names of the calling convention carry the bytes of their parameters; the exported ones do not.
   target_link_options(${name} PRIVATE -s -Wl,--enable-stdcall-fixup -Wl,--kill-at
                       -Wl,-Map=${CMAKE_BINARY_DIR}/symbols/${name}.map)

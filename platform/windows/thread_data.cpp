@@ -1,10 +1,13 @@
-// Thread-local variables of a module that is loaded and unloaded any number of times.
+// What the compiler's run-time library asks of its thread library, in a module that is loaded and
+// unloaded any number of times. The thread library takes an index of the system for thread-local
+// data and handles in each load, when it is first asked who calls, and never gives them back: after
+// a thousand loads the process has none left. Two functions ask it.
 //
-// The compiler reaches each of them through __emutls_get_address; the record it passes is that of
-// its run-time library (libgcc, emutls.c). The library's own function takes an index of the system
-// and, with its thread library, handles for each load, and never gives them back: after a thousand
-// loads the process has none left. This one stands before it in the module, and what it takes an
-// unload gives back.
+// - __emutls_get_address: the compiler reaches each thread-local variable through it; the record it
+//   passes is that of the run-time library (libgcc, emutls.c). The one here stands before the
+//   library's in the module, and what it takes an unload gives back.
+// - pthread_once: for unwinding in 32 bits, which registers the module's tables when it is loaded,
+//   and for variables inside functions. The linker puts the one here in its place (--wrap).
 #include "platform/process_end.h"
 
 #include <windows.h>
@@ -30,6 +33,9 @@ struct EmulatedVariable {
 };
 
 void* __emutls_get_address(EmulatedVariable* variable);
+
+// `state` is 0 before the first call, and begins so.
+int __wrap_pthread_once(long* state, void (*routine)());
 }
 
 namespace __gnu_cxx {
@@ -147,4 +153,16 @@ void* __emutls_get_address(EmulatedVariable* variable) {
   void*& place = DataOfThread().variables[NumberOf(*variable)];
   if (place == nullptr) place = Made(*variable);
   return place;
+}
+
+int __wrap_pthread_once(long* state, void (*routine)()) {
+  constexpr long kNever = 0, kRuns = 1, kDone = 2;
+  const std::atomic_ref now(*state);
+  for (long seen = kNever; !now.compare_exchange_strong(seen, kRuns); seen = kNever) {
+    if (seen == kDone) return 0;
+    Sleep(0);  // the routines of the run-time library are a few stores
+  }
+  routine();
+  now = kDone;
+  return 0;
 }
