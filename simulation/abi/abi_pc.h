@@ -36,7 +36,7 @@ void Attach(HMODULE module);
 // Puts one function there; whether the module imports it.
 bool Replace(HMODULE module, const std::string& function, void* with);
 
-// One line each, with the call's name.
+// Each kind once, with the call's name.
 std::vector<std::string> Breaches();
 
 // What is open now.
@@ -49,6 +49,9 @@ std::string TextOf(const Open& open);
 
 // How often each function was called.
 std::map<std::string, unsigned> Calls();
+// The function that was called last, which may be under way; callable at any moment, in a crash
+// too.
+const char* LastCall();
 // That function fails from that call on (1 is the next) to that call. An empty name takes it back.
 void Fail(const std::string& function, unsigned from, unsigned to);
 // Is called before each call of any function, with the number of calls before it; empty: no more.

@@ -260,8 +260,8 @@ BOOL WINAPI Control(HANDLE handle, DWORD code, LPVOID in, DWORD inBytes, LPVOID 
       (writes && (file->access & GENERIC_WRITE) == 0)) {
     return call.Misused(ERROR_ACCESS_DENIED, "a request for which the file was not opened");
   }
-  if ((in == nullptr && inBytes != 0) || (out == nullptr && outBytes != 0)) {
-    return call.Misused(ERROR_NOACCESS, "a size without a buffer");
+  if ((in == nullptr) != (inBytes == 0) || (out == nullptr) != (outBytes == 0)) {
+    return call.Misused(ERROR_NOACCESS, "a size without a buffer, or a buffer without a size");
   }
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (file->gone) return call.Refuse(ERROR_DEVICE_NOT_CONNECTED);

@@ -46,7 +46,7 @@ CONFIGRET WINAPI Sibling(PDEVINST to, DEVINST from, ULONG flags) {
 CONFIGRET WINAPI DeviceId(DEVINST node, PWCHAR buffer, ULONG chars, ULONG flags) {
   const Call call("CM_Get_Device_IDW");
   WantNoFlags(call, flags);
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   if (call.Fails()) return CR_FAILURE;
   const Position here = call.Machine().index.DeviceByNumber(node);
   if (here == kNone) return CR_INVALID_DEVNODE;
@@ -64,7 +64,7 @@ CONFIGRET WINAPI RegistryProperty(DEVINST node, ULONG property, PULONG type, PVO
   if (!call.Want(buffer != nullptr || offered == 0, "a size without a buffer"))
     return CR_INVALID_POINTER;
   Spoil(type, bytes);
-  SpoilBytes(buffer, offered);
+  call.SpoilBytes(buffer, offered);
   if (call.Fails()) return CR_FAILURE;
   const Position here = call.Machine().index.DeviceByNumber(node);
   if (here == kNone) return CR_INVALID_DEVNODE;

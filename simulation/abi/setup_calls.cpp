@@ -111,7 +111,10 @@ BOOL WINAPI GetInterfaceDetail(HDEVINFO handle, PSP_DEVICE_INTERFACE_DATA data,
   }
   Spoil(required);
   SpoilRecord(device);
-  if (detail != nullptr) SpoilBytes(detail->DevicePath, bytes - kPathOffset);
+  if (detail != nullptr) {
+    call.SpoilBytes(detail, bytes);
+    detail->cbSize = kDetailSize;
+  }
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   const auto& element = contents.interfaces[position];
   if (call.Machine().index.DeviceByNumber(contents.devices[element.device].number) == kNone) {
@@ -152,7 +155,7 @@ BOOL WINAPI GetInstanceId(HDEVINFO handle, PSP_DEVINFO_DATA data, PWSTR buffer, 
                           PDWORD required) {
   const Call call("SetupDiGetDeviceInstanceIdW");
   Spoil(required);
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   DWORD code = 0;
   const sim::Device* const device = DeviceOf(call, handle, *data, code);
   if (device == nullptr) return call.Refuse(code);
@@ -166,7 +169,7 @@ BOOL WINAPI GetRegistryProperty(HDEVINFO handle, PSP_DEVINFO_DATA data, DWORD pr
   if (buffer == nullptr && bytes != 0)
     return call.Misused(ERROR_INVALID_PARAMETER, "a size without a buffer");
   Spoil(type, required);
-  SpoilBytes(buffer, bytes);
+  call.SpoilBytes(buffer, bytes);
   DWORD code = 0;
   const sim::Device* const device = DeviceOf(call, handle, *data, code);
   if (device == nullptr) return call.Refuse(code);
@@ -221,7 +224,7 @@ BOOL WINAPI DestroyImageList(PSP_CLASSIMAGELIST_DATA data) {
 BOOL WINAPI GetDescription(const GUID* guid, PWSTR buffer, DWORD chars, PDWORD required) {
   const Call call("SetupDiGetClassDescriptionW");
   Spoil(required);
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   const sim::ClassInfo* const info = call.Machine().index.Class(AsKey(*guid));
   if (call.Fails() || info == nullptr || !info->hasDescription)
     return call.Refuse(ERROR_INVALID_CLASS);

@@ -1,5 +1,6 @@
 #include "simulation/abi/state.h"
 
+#include <malloc.h>
 #include <sstream>
 
 #include "platform/text.h"
@@ -13,9 +14,11 @@ State& Pc() {
 
 Call::Call(const char* function) : m_pc(abi_pc::Pc()), m_lock(m_pc.mutex), m_function(function) {
   if (const auto before = m_pc.before) before(m_pc.allCalls);
-  ++m_pc.allCalls;
+  m_pc.lastCall = function;
+  if (++m_pc.allCalls == kMostCalls) Breach("a search that does not end");
   const unsigned nth = ++m_pc.calls[function];
-  m_fails = m_pc.failing == function && nth >= m_pc.failFrom && nth <= m_pc.failTo;
+  m_fails = m_pc.allCalls >= kMostCalls ||
+            (m_pc.failing == function && nth >= m_pc.failFrom && nth <= m_pc.failTo);
 }
 
 HANDLE Call::Opened(Object object) const {
@@ -25,10 +28,19 @@ HANDLE Call::Opened(Object object) const {
   return reinterpret_cast<HANDLE>(handle);
 }
 
+void Call::SpoilBytes(void* buffer, std::size_t bytes) const {
+  if (buffer == nullptr) return;
+  const auto heap = reinterpret_cast<HANDLE>(_get_heap_handle());  // what malloc takes from
+  if (HeapValidate(heap, 0, buffer)) {
+    const std::size_t owned = HeapSize(heap, 0, buffer);
+    if (!Want(bytes <= owned, "more is offered than the buffer has")) bytes = owned;
+  }
+  std::memset(buffer, kGarbage, bytes);
+}
+
 std::u16string Lowered(std::u16string_view text) { return platform::ToLower(text); }
 
 bool GiveText(std::u16string_view text, wchar_t* buffer, std::size_t chars) {
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
   if (buffer == nullptr || text.size() >= chars) return false;
   std::memcpy(buffer, text.data(), text.size() * sizeof(wchar_t));
   buffer[text.size()] = 0;
@@ -67,7 +79,7 @@ void Change(const Machine& machine) {
 
 std::vector<std::string> Breaches() {
   const std::lock_guard lock(Pc().mutex);
-  return Pc().breaches;
+  return {Pc().breaches.begin(), Pc().breaches.end()};
 }
 
 Open OpenNow() {
@@ -85,6 +97,8 @@ std::string TextOf(const Open& open) {
        << open.searches << " searches, " << open.notifications << " notifications";
   return text.str();
 }
+
+const char* LastCall() { return Pc().lastCall; }
 
 std::map<std::string, unsigned> Calls() {
   const std::lock_guard lock(Pc().mutex);
@@ -207,7 +221,7 @@ void Attach(HMODULE module) {
                                       function.find("Volume") != function.npos ||
                                       function.find("Drive") != function.npos;
                  if (machine)
-                   Pc().breaches.push_back(dll + " " + function + ": imported, and not known here");
+                   Pc().breaches.insert(dll + " " + function + ": imported, and not known here");
                });
 }
 

@@ -6,11 +6,13 @@
 #include <cfgmgr32.h>
 #include <setupapi.h>
 
+#include <atomic>
 #include <cstdint>
 #include <cstring>
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <set>
 #include <variant>
 
 #include "simulation/abi/abi_pc.h"
@@ -26,6 +28,9 @@ inline constexpr Position kNone = Index::kNone;
 // What programs find as the last error after a call that did not fail.
 inline constexpr DWORD kMark = 0xA5A50001;
 inline constexpr unsigned char kGarbage = 0xA5;
+// The largest PC of the tests takes a tenth of it. From there on everything fails, which ends every
+// search.
+inline constexpr unsigned kMostCalls = 2'000'000;
 // Where the handles of this PC begin; the system's own are smaller.
 inline constexpr std::uintptr_t kFirstHandle = 0x5A000000;
 
@@ -62,9 +67,10 @@ struct State {
   std::unique_ptr<const Now> now;
   std::map<std::uintptr_t, Object> open;
   std::uintptr_t lastHandle = kFirstHandle;  // none is given twice
-  std::vector<std::string> breaches;
+  std::set<std::string> breaches;
   std::map<std::string, unsigned> calls;
   unsigned allCalls = 0;
+  std::atomic<const char*> lastCall = "no call";
   std::string failing;
   unsigned failFrom = 0, failTo = 0;
   std::function<void(unsigned)> before;
@@ -77,7 +83,7 @@ class Call {
   explicit Call(const char* function);
   bool Fails() const { return m_fails; }
   void Breach(const std::string& what) const {
-    m_pc.breaches.push_back(std::string(m_function) + ": " + what);
+    m_pc.breaches.insert(std::string(m_function) + ": " + what);
   }
   // Says so unless it holds.
   bool Want(bool holds, const std::string& what) const {
@@ -88,6 +94,10 @@ class Call {
   BOOL Refuse(DWORD code) const { return SetLastError(code), FALSE; }
   // What was asked for is not as documented, which the system would answer with that code.
   BOOL Misused(DWORD code, const std::string& what) const { return Breach(what), Refuse(code); }
+  // Overwrites all that is offered, which the caller therefore must own. How long a block of the
+  // heap is, is known; more is a breach and stays as it is. Beyond a buffer on the stack the
+  // program crashes.
+  void SpoilBytes(void* buffer, std::size_t bytes) const;
 
   State& Pc() const { return m_pc; }
   const Now& Machine() const { return *m_pc.now; }
@@ -120,10 +130,6 @@ void Spoil(Value*... values) {
   ((values != nullptr ? static_cast<void>(std::memset(values, kGarbage, sizeof *values)) : void()),
    ...);
 }
-// All that is offered, which the caller therefore must own.
-inline void SpoilBytes(void* buffer, std::size_t bytes) {
-  if (buffer != nullptr) std::memset(buffer, kGarbage, bytes);
-}
 inline const char16_t* Units(const wchar_t* text) {
   return reinterpret_cast<const char16_t*>(text);
 }
@@ -132,8 +138,8 @@ inline const platform::Guid& AsKey(const GUID& guid) {
 }
 std::u16string Lowered(std::u16string_view text);
 
-// A text and its zero into a buffer counted in characters; false, with the buffer spoilt, where it
-// does not fit.
+// A text and its zero into a buffer counted in characters; false, with the buffer as it was, where
+// it does not fit.
 bool GiveText(std::u16string_view text, wchar_t* buffer, std::size_t chars);
 // The bytes of a registry property and its type; nothing where the device has none of that number.
 std::optional<std::pair<DWORD, std::string>> PropertyOf(const sim::Device& device, DWORD property);

@@ -37,7 +37,7 @@ const sim::Drive* DriveOf(const Call& call, std::u16string_view place) {
 }
 
 HANDLE FirstOf(const Call& call, Search search, wchar_t* buffer, DWORD chars) {
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   const auto refuse = [&](DWORD code) { return call.Refuse(code), INVALID_HANDLE_VALUE; };
   if (call.Fails()) return refuse(ERROR_GEN_FAILURE);
   if (search.names.empty()) return refuse(ERROR_NO_MORE_FILES);
@@ -47,7 +47,7 @@ HANDLE FirstOf(const Call& call, Search search, wchar_t* buffer, DWORD chars) {
 }
 
 BOOL NextOf(const Call& call, bool volumes, HANDLE handle, wchar_t* buffer, DWORD chars) {
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   Search* const search = call.Find<Search>(handle);
   if (search == nullptr || search->volumes != volumes)
     return call.Misused(ERROR_INVALID_HANDLE, "another search");
@@ -97,7 +97,7 @@ BOOL WINAPI CloseMountPoints(HANDLE handle) {
 BOOL WINAPI PathNames(LPCWSTR name, LPWCH buffer, DWORD chars, PDWORD required) {
   const Call call("GetVolumePathNamesForVolumeNameW");
   Spoil(required);
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   const Position volume = call.Machine().index.Volume(PlaceOf(call, name));
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (volume == kNone) return call.Refuse(ERROR_FILE_NOT_FOUND);
@@ -110,7 +110,7 @@ BOOL WINAPI PathNames(LPCWSTR name, LPWCH buffer, DWORD chars, PDWORD required) 
 
 BOOL WINAPI NameOf(LPCWSTR place, LPWSTR buffer, DWORD chars) {
   const Call call("GetVolumeNameForVolumeMountPointW");
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   const sim::Volume* const volume = VolumeAt(call, PlaceOf(call, place));
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE);
   if (volume == nullptr) return call.Refuse(ERROR_FILE_NOT_FOUND);
@@ -121,7 +121,7 @@ BOOL WINAPI NameOf(LPCWSTR place, LPWSTR buffer, DWORD chars) {
 
 DWORD WINAPI DriveStrings(DWORD chars, LPWSTR buffer) {
   const Call call("GetLogicalDriveStringsW");
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE), 0;
   std::u16string list;
   for (char16_t letter = u'A'; letter <= u'Z'; ++letter) {
@@ -159,8 +159,8 @@ BOOL WINAPI Information(LPCWSTR path, LPWSTR label, DWORD labelChars, LPDWORD se
                         LPDWORD longest, LPDWORD flags, LPWSTR kind, DWORD kindChars) {
   const Call call("GetVolumeInformationW");
   Spoil(serial, longest, flags);
-  SpoilBytes(label, labelChars * sizeof(wchar_t));
-  SpoilBytes(kind, kindChars * sizeof(wchar_t));
+  call.SpoilBytes(label, labelChars * sizeof(wchar_t));
+  call.SpoilBytes(kind, kindChars * sizeof(wchar_t));
   // The component asks with the path of a volume's device interface as it is. That is published,
   // and deliberate: the serial number stays unknown.
   const std::u16string place = Lowered(Units(path));
@@ -188,7 +188,7 @@ BOOL WINAPI Information(LPCWSTR path, LPWSTR label, DWORD labelChars, LPDWORD se
 
 DWORD WINAPI DosDevice(LPCWSTR name, LPWSTR buffer, DWORD chars) {
   const Call call("QueryDosDeviceW");
-  SpoilBytes(buffer, chars * sizeof(wchar_t));
+  call.SpoilBytes(buffer, chars * sizeof(wchar_t));
   if (call.Fails()) return call.Refuse(ERROR_GEN_FAILURE), 0;
   std::u16string place = Units(name);
   call.Want(place.size() == 2, "not a drive's name");
