@@ -7,10 +7,11 @@ BUILD is a folder in which everything is built, file by file:
 
     cmake --preset windows-x64 -B build/faults -DCMAKE_UNITY_BUILD=OFF && cmake --build build/faults
 
-Only the changed file is compiled, and the two modules and the test program that contains it are linked, in a folder of their own: neither the
-sources nor the build change. Ends with 1 when fewer are seen than the project wants.
+Only the changed file is compiled, and the two modules and the test program that contains it are linked, in a folder of
+their own: neither the sources nor the build change. The tests over a PC in the system's own ABI are asked first, and the
+other Windows tests only about what those miss. Ends with 1 when fewer are seen than the project wants.
 """
-import json, os, pathlib, re, shlex, shutil, subprocess, sys, tempfile
+import json, os, pathlib, re, shlex, shutil, signal, subprocess, sys, tempfile
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 BUILD = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else ROOT / "build/faults").resolve()
@@ -43,7 +44,7 @@ FAULTS = [
     ("volumes", "FindVolumeClose(Native(search))", "search != 0"),
     ("volumes", "FindFirstVolumeW(Native(name), nameChars)", "FindFirstVolumeW(Native(name), nameChars / 8)"),
     ("volumes", "Native(names), namesChars", "Native(names), namesChars * 2"),
-    ("volumes", "labelChars, Native(&serial),", "labelChars, Native(&fileSystemFlags),"),
+    ("volumes", "Native(&fileSystemFlags)", "Native(&serial)"),
     ("volumes", "FindVolumeMountPointClose", "FindVolumeClose"),
     ("volumes", "GetDriveTypeW(Native(path))", "GetDriveTypeW(Native(path) + 1)"),
     ("volumes", "QueryDosDeviceW(Native(name), Native(target), targetChars) != 0",
@@ -52,9 +53,16 @@ FAULTS = [
 ]
 WANTED_BY_ALL, WANTED_BY_THE_PC = 29, 26
 
-# The test programs: name, arguments, what is added to the environment.
-PC = ("zkusb_abi_pc_tests", ["--gtest_fail_fast", "--gtest_filter=*EveryStart*:*Alike*:*MayFail*"], {"ZKUSB_STARTS": "2"})
+# Program, arguments and what is added to the environment: the cheapest first, and nothing after the first that fails.
+PC = [("zkusb_abi_pc_tests", ["--gtest_fail_fast", "--gtest_filter=" + tests], environment) for tests, environment in [
+    ("*MadeUp*:*OlderWay*", {"ZKUSB_PCS": "24"}),
+    ("*EveryStart*", {"ZKUSB_STARTS": "1"}),
+    ("*MayFail*", {}),
+    ("*MadeUp*:*PulledOut*", {"ZKUSB_RANDOM_SEED": "25"}),
+    ("*Client*", {}),
+]]
 OTHERS = [("zkusb_windows_tests", [], {}), ("zkusb_windows_module_tests", ["--gtest_filter=-Console*"], {})]
+MOST_SECONDS = 300
 
 
 def run(command, **options):
@@ -67,7 +75,7 @@ def link_command(target):
 
 
 def build(folder, source, before, after):
-    """The modules and the test program with the fault; the rest is what stands in the build."""
+    """The platform library with the fault; the rest is what stands in the build."""
     path = ROOT / "platform/windows" / (source + ".cpp")
     text = path.read_text()
     assert text.count(before) >= 1, (source, before)
@@ -83,12 +91,16 @@ def build(folder, source, before, after):
     shutil.copy(BUILD / "platform/libzkusb_platform.a", library)
     assert run(["x86_64-w64-mingw32-ar", "r", str(library), str(compiled)]).returncode == 0
     (folder / "bin").mkdir()
-    for file in list(BUILD.glob("*.exe")) + list((BUILD / "bin").glob("zkusb_*")):
+    for file in list(BUILD.glob("*.exe")) + list(BUILD.glob("*.dll")) + list((BUILD / "bin").glob("zkusb_*")):
         os.symlink(file, folder / file.relative_to(BUILD))
-    for target in ["ZKUsbMonitor.dll", "ZKUsbMonitorSimulated.dll", "bin/zkusb_windows_tests.exe"]:
+
+
+def link(folder, targets):
+    """Those targets with the fault."""
+    for target in targets:
         out = folder / target
         out.unlink(missing_ok=True)
-        command = link_command(target).replace("platform/libzkusb_platform.a", str(library))
+        command = link_command(target).replace("platform/libzkusb_platform.a", str(folder / "libzkusb_platform.a"))
         command = command.replace(f"-o {target}", f"-o {out}")
         command = re.sub(r"--out-implib,[^ ,]*", f"--out-implib,{folder}/imports.a", command)
         made = run(re.sub(r"-Map=[^ ]*", f"-Map={folder}/symbols.map", command), cwd=BUILD)
@@ -96,21 +108,31 @@ def build(folder, source, before, after):
 
 
 def sees(folder, program, arguments, environment):
-    """Whether the program fails, and the first thing it says about it."""
+    """The first thing that the program says about a failure; None where it passes."""
+    program = subprocess.Popen([ROOT / "scripts/windows-run.sh", folder / "bin" / (program + ".exe"), *arguments],
+                               env={**os.environ, **environment}, stdout=subprocess.PIPE, stderr=subprocess.DEVNULL,
+                               text=True, errors="replace", start_new_session=True)
     try:
-        result = run([str(ROOT / "scripts/windows-run.sh"), str(folder / "bin" / (program + ".exe")), *arguments],
-                     env={**os.environ, **environment}, timeout=150)
+        output = program.communicate(timeout=MOST_SECONDS)[0]
     except subprocess.TimeoutExpired:
-        return "hangs"
-    if result.returncode == 0 and "  PASSED  " in result.stdout:
+        os.killpg(program.pid, signal.SIGKILL)
+        return f"{arguments[-1:]} hangs"
+    if program.returncode == 0 and "  PASSED  " in output:
         return None
-    failed = [line.split("] ")[1].split(" (")[0] for line in result.stdout.splitlines() if line.startswith("[  FAILED  ]")]
-    return failed[0].split(",")[0] if failed else "crashes"
+    failed = [line.split("] ")[1].split(" (")[0] for line in output.splitlines() if line.startswith("[  FAILED  ]")]
+    return failed[0].split(",")[0] if failed else f"{arguments[-1:]} crashes"
+
+
+def first_that_sees(folder, tests):
+    return next((seen for test in tests if (seen := sees(folder, *test))), None)
 
 
 def main():
     first = int(sys.argv[2]) if len(sys.argv) > 2 else 1
     last = int(sys.argv[3]) if len(sys.argv) > 3 else len(FAULTS)
+    if first == 1:
+        alarm = first_that_sees(BUILD, PC + OTHERS)
+        assert alarm is None, f"without a fault: {alarm}"
     by_pc = by_all = 0
     for number, (source, before, after) in enumerate(FAULTS, 1):
         if not first <= number <= last:
@@ -118,16 +140,17 @@ def main():
         folder = pathlib.Path(tempfile.mkdtemp(prefix="windows-fault-"))
         try:
             build(folder, source, before, after)
-            pc = sees(folder, *PC)
-            others = [seen for test in OTHERS[:1] if (seen := sees(folder, *test))]
-            # What registers takes its time, and is asked only where nobody has seen anything.
-            others += [seen for test in OTHERS[1:] if not pc and not others and (seen := sees(folder, *test))]
+            link(folder, ["ZKUsbMonitor.dll"])
+            pc = others = first_that_sees(folder, PC)
+            if not pc:
+                link(folder, ["ZKUsbMonitorSimulated.dll", "bin/zkusb_windows_tests.exe"])
+                others = first_that_sees(folder, OTHERS)
         finally:
             shutil.rmtree(folder)
         by_pc += bool(pc)
-        by_all += bool(pc or others)
-        print(f"{number:2} {source}: {before.splitlines()[0]} -> {after.splitlines()[0]} | {pc or '-'} | "
-              f"{', '.join(others) or '-'}", flush=True)
+        by_all += bool(others)
+        print(f"{number:2} {source}: {before.splitlines()[0]} -> {after.splitlines()[0]} | {others or '-'} | "
+              f"{'the PC' if pc else 'others' if others else 'nobody'}", flush=True)
     count = last - first + 1
     print(f"{count} faults: {by_pc} seen by the PC in the system's ABI, {by_all} by all")
     missing = len(FAULTS) - count
