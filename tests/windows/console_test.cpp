@@ -61,7 +61,8 @@ TEST(Console, HasItsCodePageAfterTheClient) {
       EXPECT_TRUE(WaitForCodePage(CP_UTF8)) << "never set";
       // All programs of the console hear of it, this one too.
       if (!GenerateConsoleCtrlEvent(control, 0)) {
-        std::printf("skipped: Ctrl-C cannot be sent here: error %lu\n", GetLastError());
+        std::printf("skipped: Ctrl-%s cannot be sent here: error %lu\n", control == CTRL_C_EVENT ? "C" : "Break",
+                    GetLastError());
         TerminateProcess(process.hProcess, 1);
         SetConsoleOutputCP(kCodePage);
       }
