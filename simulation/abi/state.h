@@ -28,7 +28,7 @@ inline constexpr Position kNone = Index::kNone;
 // What programs find as the last error after a call that did not fail.
 inline constexpr DWORD kMark = 0xA5A50001;
 inline constexpr unsigned char kGarbage = 0xA5;
-// The largest PC of the tests takes a tenth of it. From there on everything fails, which ends every
+// More than the largest PC of the tests takes. From there on everything fails, which ends every
 // search.
 inline constexpr unsigned kMostCalls = 2'000'000;
 // Where the handles of this PC begin; the system's own are smaller.
