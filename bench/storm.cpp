@@ -409,7 +409,7 @@ int Main(int argc, char** argv) {
     const std::size_t kept = 384 * (totals.hubs - hubsAtFirst), heap = HeapInUse();
     std::printf("heap: %zu bytes, after three processes %zu; %zu may be kept for hubs\n", heap,
                 heapAtFirst, kept);
-    if (heap > heapAtFirst + kept + 65'536) {
+    if (heap > heapAtFirst + kept + 65'536 + 256 * totals.processes) {
       std::printf("memory grows\n");
       good = false;
     }
