@@ -69,6 +69,7 @@ class CSingletonExComObject2 final : public T {
   // A new instance without references; `out` stays null on failure. The caller holds the lock.
   static HRESULT Create(CSingletonExComObject2*& out) noexcept {
     return Guarded([&] {
+      // NOLINTNEXTLINE(bugprone-unhandled-exception-at-new): Guarded catches it
       auto* object = new CSingletonExComObject2;
       ++object->m_nRef;  // FinalConstruct may hand the object out and take it back
       HRESULT result = object->InitializeLock();
@@ -134,6 +135,7 @@ class CachedComObject final : public Class {
   // With one reference, for the cache.
   static HRESULT Create(CachedComObject*& out) noexcept {
     return Guarded([&] {
+      // NOLINTNEXTLINE(bugprone-unhandled-exception-at-new): Guarded catches it
       auto* object = new CachedComObject;
       object->m_nRef = 1;
       const HRESULT result = object->InitializeLock();

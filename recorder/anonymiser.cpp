@@ -239,7 +239,7 @@ std::uint32_t Anonymiser::SerialOf(std::uint32_t volumeSerial) {
 void Anonymiser::Replace(Machine& machine) {
   const auto replace = [this](auto&... texts) {
     const auto one = [this](auto& text) {
-      if (text) ReplaceText(*text);
+      if (text) this->ReplaceText(*text);
     };
     (one(texts), ...);
   };
@@ -295,7 +295,7 @@ void Anonymiser::Replace(Machine& machine) {
     if (!StartsWith(target, u"\\Device\\Harddisk") && third != Text::npos) {
       Text rest = target.substr(third);
       ReplaceFolders(rest);
-      target = target.substr(0, third) + rest;
+      target.replace(third, Text::npos, rest);
     } else if (StartsWith(target, u"\\??\\")) {
       Text rest = target.substr(4);
       ReplaceFolders(rest);

@@ -64,8 +64,8 @@ void CZKUMInfoDeviceImpl::OwnLines(std::u16string& out, const std::u16string& in
   lineIfAny(u"SPDRP_FRIENDLYNAME: ", FriendlyName);
   lineIfAny(u"SPDRP_MFG: ", Manufacturer);
   if (LegacyBusType >= -1 && LegacyBusType < 18) {
-    AppendLine(out, indent, u"INTERFACE_TYPE: ",
-               kBusTypeNames[static_cast<std::size_t>(LegacyBusType + 1)]);
+    const std::int32_t row = LegacyBusType + 1;
+    AppendLine(out, indent, u"INTERFACE_TYPE: ", kBusTypeNames[static_cast<std::size_t>(row)]);
   }
   lineIfAny(u"SPDRP_HARDWAREID: ", HardwareId);
   lineIfAny(u"SPDRP_PHYSICAL_DEVICE_OBJECT_NAME: ", PhysicalName);

@@ -81,7 +81,7 @@ CZKUMUsbTreeNodeImpl::~CZKUMUsbTreeNodeImpl() {
   }
 }
 
-bool CZKUMUsbTreeNodeImpl::AcceptNode(NodePtr) { return true; }
+bool CZKUMUsbTreeNodeImpl::AcceptNode(const NodePtr&) { return true; }
 
 void CZKUMUsbTreeNodeImpl::ToString(std::u16string& out, std::u16string indent) const {
   struct Level {
@@ -154,7 +154,7 @@ bool CZKUMUsbTreeNodeImpl::IsSameNode(const CZKUMUsbTreeNodeImpl& other) const n
          m_strDeviceDescr == other.m_strDeviceDescr;
 }
 
-void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent) {
+void AddChild(const NodePtr& child, CZKUMUsbTreeNodeImpl* parent) {
   if (parent == nullptr || !child) return;
   for (const NodePtr& present : parent->m_childs) {
     if (present && present->IsSameNode(*child)) return;

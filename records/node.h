@@ -72,7 +72,7 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity, public RecordRings {
   // shared between successive trees, and a climb must end at null and not in freed memory.
   virtual ~CZKUMUsbTreeNodeImpl();
   // Whether the node is kept when a replaced tree is pruned. Every class answers true.
-  virtual bool AcceptNode(NodePtr node);
+  virtual bool AcceptNode(const NodePtr& node);
   // Appends the text dump of the node and its subtree. Each line starts with `indent` and ends with
   // "\r\n". A loop over the tree, however deep: what differs between kinds of node is OwnLines.
   virtual void ToString(std::u16string& out, std::u16string indent) const;
@@ -113,7 +113,7 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity, public RecordRings {
 
 // Hangs a node below a parent, unless one of the parent's children is the same node: then nothing
 // changes. Without a parent or a child nothing happens.
-void AddChild(NodePtr child, CZKUMUsbTreeNodeImpl* parent);
+void AddChild(const NodePtr& child, CZKUMUsbTreeNodeImpl* parent);
 
 // The first node with this instance id (compared exactly), a node before its children and children
 // in their order; empty when there is none.

@@ -55,7 +55,7 @@ CZKUMPortDeviceImpl::~CZKUMPortDeviceImpl() {
   if (m_pParent) m_infoDevice->m_pParent.ClearIfNaming(m_pParent);
 }
 
-bool CZKUMPortDeviceImpl::AcceptNode(NodePtr) { return true; }
+bool CZKUMPortDeviceImpl::AcceptNode(const NodePtr&) { return true; }
 
 void CZKUMPortDeviceImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
   const ConnectionRecord* record = ConnectionInfo();

@@ -23,7 +23,7 @@ class CZKUMPortDeviceImpl final : public CZKUMUsbTreeNodeImpl {
                       std::u16string instanceId);
   ~CZKUMPortDeviceImpl() override;
 
-  bool AcceptNode(NodePtr node) override;
+  bool AcceptNode(const NodePtr& node) override;
   void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   // The connection record's speed byte; 0 without a record.

@@ -112,7 +112,7 @@ class RingPtr : private RingLink {
     auto ring = std::make_unique<RecordRings::Ring>();
     const Lock lock;
     if (record->BeginRing(ring.get(), result)) {
-      ring.release();
+      static_cast<void>(ring.release());  // the record owns it
       result.m_pHeld = record;
     }
     return result;

@@ -127,7 +127,7 @@ bool CZKUMTopologyWalker::AddRootHub(const RingPtr<CZKUMHostControllerImpl>& con
   if (!Initialise(m_host, m_answers, DriverKeys(), handle, *controller)) return false;
   std::unique_ptr<ConnectionRecord> none;
   if (NodePtr hub = BuildHub(controller->m_strRootHubName, none, u"RootHub")) {
-    AddChild(std::move(hub), controller.Get());
+    AddChild(hub, controller.Get());
   }
   return true;
 }
@@ -170,7 +170,7 @@ NodePtr CZKUMTopologyWalker::EnumeratePorts(HubPath& path) {
       BuildPort(path, here.nextPort++);
       continue;
     }
-    const NodePtr done = here.hub;
+    NodePtr done = here.hub;
     path.pop_back();
     if (path.empty()) return done;
     HubOnTheWay& above = *path.back();

@@ -9,8 +9,6 @@
 
 namespace {
 
-using platform::controls::BstrCounts;
-
 std::atomic<std::int64_t> g_alive = 0;
 std::atomic<std::int64_t> g_allocated = 0;
 

@@ -148,7 +148,8 @@ std::uint32_t SimulatedDesktop::FormatMessageW(std::uint32_t flags, std::uint32_
                                   [&](const SystemText& entry) { return entry.code == code; });
   if (known == kSystemTexts.end()) return 0;
   // The system's allocation: the caller gives it back with LocalFree.
-  text = new char16_t[known->text.size() + 1]{};
+  text = new (std::nothrow) char16_t[known->text.size() + 1]{};
+  if (text == nullptr) return 0;
   std::copy(known->text.begin(), known->text.end(), text);
   m_state->localBuffers.insert(text);
   return static_cast<std::uint32_t>(known->text.size());

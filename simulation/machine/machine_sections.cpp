@@ -26,7 +26,7 @@ std::optional<Guid> GuidFrom(const std::u16string& text) {
     const std::size_t digit = kDigits.find(ToLower(text[i]));
     if (digit == std::u16string_view::npos) return std::nullopt;
     std::uint8_t& byte = bytes[digits++ / 2];
-    byte = static_cast<std::uint8_t>(byte * 16 + digit);
+    byte = static_cast<std::uint8_t>(byte * std::size_t{16} + digit);
   }
   Guid guid;
   guid.Data1 = std::uint32_t{bytes[0]} << 24 | std::uint32_t{bytes[1]} << 16 |

@@ -87,7 +87,7 @@ struct AskedNode final : CZKUMUsbTreeNodeImpl {
   AskedNode(Verdict verdict, std::string& asked, char16_t name) : m_verdict(verdict), m_asked(asked) {
     m_strDevInstId = name;
   }
-  bool AcceptNode(NodePtr node) override {
+  bool AcceptNode(const NodePtr& node) override {
     EXPECT_EQ(node.Get(), this);
     m_asked += platform::ToUtf8(m_strDevInstId);
     std::u16string siblings;

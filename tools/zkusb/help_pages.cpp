@@ -59,7 +59,8 @@ std::string Names(const CLI::App& app, const std::string& before,
   std::string names;
   for (const CLI::Option* option : app.get_options()) {
     if (std::ranges::count(kinds, KindOf(*option)) == 0) continue;
-    for (const std::string& name : option->get_lnames()) names += before + "--" + name;
+    for (const std::string& name : option->get_lnames())
+      names.append(before).append("--").append(name);
   }
   return names;
 }

@@ -18,7 +18,7 @@ std::u16string Number(Integer value) {
 }
 
 // The text with a blank behind, or nothing.
-std::u16string WithBlank(std::u16string text) { return text.empty() ? text : text + u" "; }
+std::u16string WithBlank(const std::u16string& text) { return text.empty() ? text : text + u" "; }
 
 std::u16string SpeedText(std::uint32_t speed) {
   switch (speed) {
@@ -46,7 +46,7 @@ TextTree DiskLine(const Disk& disk) {
 }
 
 // `head` says where the device is.
-TextTree DeviceLine(std::u16string head, const NodeView& device) {
+TextTree DeviceLine(const std::u16string& head, const NodeView& device) {
   TextTree line{head + WithBlank(IdText(device)), NamesText(device), {}, {}};
   if (line.middle.empty()) line.middle = u"unknown device";
   const std::vector<std::u16string> mountPoints = MountPointsOf(device);
