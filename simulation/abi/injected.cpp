@@ -2,11 +2,16 @@
 // it loads the module that ships and stands in its import table. The environment says which PC it
 // is, and where to write what was wrong:
 //
-//   ABI_PC_MODULE   the module
-//   ABI_PC_MACHINE  the machine file
-//   ABI_PC_SCRIPT   a script, played in real time with the system's own messages; not set: nothing
-//   changes ABI_PC_REPORT   the report: one line for each breach, then one with what is open and
-//   one with the starts
+// - ABI_PC_MODULE: the module.
+// - ABI_PC_MACHINE: the machine file.
+// - ABI_PC_SCRIPT: a script, played in real time with the system's own messages; empty: nothing
+//   changes.
+// - ABI_PC_PROGRAM: not empty: it stands in the program's own import table, too, for what the
+// program
+//   asks without the module. The script begins at once, since there is no window to wait for.
+// - ABI_PC_REPORT: the report: one line for each breach, then one with what is open and one with
+// the
+//   starts.
 #include <windows.h>
 
 #include <dbt.h>
@@ -48,7 +53,9 @@ void Send(const sim::DeviceBroadcast& broadcast) {
       abi_pc::OpenNow().notifications == 0) {
     return;
   }
-  SendMessageTimeoutW(Receiver(), WM_DEVICECHANGE, broadcast.event,
+  const HWND receiver = Receiver();
+  if (receiver == nullptr) return;
+  SendMessageTimeoutW(receiver, WM_DEVICECHANGE, broadcast.event,
                       broadcast.record.empty() ? 0 : reinterpret_cast<LPARAM>(record), SMTO_BLOCK,
                       5000, nullptr);
 }
@@ -57,7 +64,7 @@ DWORD WINAPI Play(void*) {
   try {
     const sim::Machine machine = sim::LoadMachine(Variable("ABI_PC_MACHINE"));
     sim::SimulatedPc pc(machine);
-    while (Receiver() == nullptr) Sleep(10);
+    while (Variable("ABI_PC_PROGRAM").empty() && Receiver() == nullptr) Sleep(10);
     const ULONGLONG start = GetTickCount64();
     for (const sim::Step& step : sim::LoadScript(Variable("ABI_PC_SCRIPT"), machine)) {
       const ULONGLONG now = GetTickCount64() - start;
@@ -82,6 +89,7 @@ bool Enter() {
     const HMODULE module = LoadLibraryA(Variable("ABI_PC_MODULE").c_str());
     if (module == nullptr) return false;
     abi_pc::Attach(module);
+    if (!Variable("ABI_PC_PROGRAM").empty()) abi_pc::Attach(GetModuleHandleW(nullptr));
     if (!Variable("ABI_PC_SCRIPT").empty())
       CloseHandle(CreateThread(nullptr, 0, Play, nullptr, 0, nullptr));
     return true;

@@ -1,9 +1,13 @@
 // What a module shows of a PC, and what it must leave as it was.
 #pragma once
 
+#include <windows.h>
+
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
 #include <sstream>
 #include <string>
 
@@ -17,7 +21,23 @@ namespace sim = platform::simulated;
 // What each build leaves open, which is documented: the sets of volumes, disks and their like.
 inline constexpr std::size_t kSetsOfABuild = 4;
 
+inline constexpr const char* kMachines[] = {"dell-precision", "asus-b560", "hp-cardreader", "vmware-win7"};
+
 inline std::string MachinePath(const std::string& name) { return ZKUSB_SOURCE_DIR "/machines/" + name + ".json"; }
+inline std::string Beside(const char16_t* file) { return platform::ToUtf8(ModuleFile(file)); }
+// A file of this process alone: two runs may go side by side.
+inline std::string Temporary(const std::string& name, const std::string& text) {
+  const std::string path = testing::TempDir() + "zkusb-abi-" + std::to_string(GetCurrentProcessId()) + "-" + name;
+  std::ofstream(path, std::ios::binary) << text;
+  return path;
+}
+
+// A program that has just ended may still hold its file for a moment; a file that stays does no harm.
+inline void Remove(const std::string& path) {
+  std::error_code ignored;
+  std::filesystem::remove(path, ignored);
+}
+
 inline unsigned FromEnvironment(const char* name, unsigned otherwise) {
   const char* const given = std::getenv(name);
   return given != nullptr ? static_cast<unsigned>(std::atoi(given)) : otherwise;
