@@ -56,6 +56,8 @@ TEST(Help, CompletesInBash) {
       {"zkusb --json watch --f", {"--for"}},
       {"zkusb tree --for", {""}},
       {"zkusb find --vendor ''", {""}},
+      {"zkusb record --w", {"--width", "--with-serials", "--watch"}},
+      {"zkusb check " ZKUSB_SOURCE_DIR "/machines/v", {ZKUSB_SOURCE_DIR "/machines/vmware-win7.json"}},
       {"zkusb --machine " ZKUSB_SOURCE_DIR "/machines/v", {ZKUSB_SOURCE_DIR "/machines/vmware-win7.json"}},
   };
   for (const auto& [line, words] : cases) EXPECT_EQ(Completions(line), words) << line;

@@ -98,9 +98,16 @@ std::string BashCompletion(const CLI::App& app) {
   std::string values = Names(app, "|", {Kind::kOtherValue});
   std::string commands;
   std::string cases;
+  std::string withFiles;  // commands that take a file without an option before it
   for (const CLI::App* command : app.get_subcommands(nullptr)) {
     commands += (commands.empty() ? "" : " ") + command->get_name();
     values += Names(*command, "|", {Kind::kOtherValue});
+    const auto isFile = [](const CLI::Option* option) {
+      return option->get_positional() && option->get_required();
+    };
+    if (std::ranges::any_of(command->get_options(), isFile)) {
+      withFiles += (withFiles.empty() ? "" : "|") + command->get_name();
+    }
     cases +=
         "    " + command->get_name() + ") words=\"$options" + Names(*command, " ", all) + "\" ;;\n";
   }
@@ -127,10 +134,11 @@ std::string BashCompletion(const CLI::App& app) {
          "    *) words=\"$commands $options\" ;;\n"
          "  esac\n"
          "  COMPREPLY=($(compgen -W \"$words\" -- \"$current\"))\n"
-         "  # The page's file is the one argument that is a file without an option before it.\n"
-         "  if [ \"$command\" = page ] && [[ $current != -* ]]; then\n"
-         "    COMPREPLY=($(compgen -f -- \"$current\"))\n"
-         "  fi\n"
+         "  case $command in\n"
+         "    " +
+         withFiles +
+         ") [[ $current == -* ]] || COMPREPLY=($(compgen -f -- \"$current\")) ;;\n"
+         "  esac\n"
          "}\n"
          "complete -o filenames -F _zkusb zkusb\n";
 }
