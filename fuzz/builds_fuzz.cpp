@@ -67,7 +67,7 @@ void Check(const CZKUMUsbTreeBuilder& builder) {
   Require(dump.ends_with(u"ChildsToString End\r\n"), "whole dump");
   VisitPreOrder(builder.Root(), [](const NodePtr& node) {
     Require(node.RingSize() >= 1, "held by the tree");
-    ClimbToHubPort(node.Get());
+    HubPortClimbs().From(node.Get());
     return true;
   });
 }

@@ -37,11 +37,7 @@ void Publication::Run(DeviceLists& lists) {
   DeviceList connected = MatchAll(m_devices.Current(), index);
   DeviceList attached = MatchAll(m_devices.Added(), index);
 
-  // Asked and not acted upon. Deliberate: a record that hangs nowhere is published all the same.
-  bool rooted = true;
-  for (const InfoDevicePtr& entry : m_devices.Current()) rooted = ReachesRoot(*entry) && rooted;
-  static_cast<void>(rooted);
-
+  // Nobody asks whether a record hangs anywhere. Deliberate: it is published all the same.
   DeviceList removed;
   if (m_published) {
     // Neither changes anything, since every class of node keeps its nodes. This is deliberate.
@@ -151,6 +147,7 @@ DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIn
   DeviceList modified;
   const platform::FlatTextSet attachedIds = IdsOf(attached);
   platform::FlatTextSet modifiedIds;
+  HubPortClimbs climbs;
   const auto append = [&](const std::u16string& instanceId) {
     NodePtr node = index.Find(instanceId);
     if (!node) return;
@@ -158,7 +155,7 @@ DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIn
     modified.push_back(std::move(node));
   };
   for (const InfoDevicePtr& entry : m_devices.Added()) {
-    const CZKUMUsbTreeNodeImpl* below = ClimbToHubPort(entry->m_pParent);
+    const CZKUMUsbTreeNodeImpl* below = climbs.From(entry->m_pParent);
     if (below == nullptr || below->m_nType != KUDTPortDevice) continue;
     const std::u16string& id = below->m_strDevInstId;
     if (!attachedIds.Contains(id) && !modifiedIds.Contains(id)) append(id);
@@ -166,7 +163,7 @@ DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIn
   // A device is appended here once for each of its volumes, however often it is listed already.
   // This is deliberate.
   for (const NodePtr& device : m_interfaceDevices) {
-    const CZKUMUsbTreeNodeImpl* below = ClimbToHubPort(device->m_pParent);
+    const CZKUMUsbTreeNodeImpl* below = climbs.From(device->m_pParent);
     if (below != nullptr && !attachedIds.Contains(below->m_strDevInstId)) {
       append(below->m_strDevInstId);
     }
@@ -174,14 +171,24 @@ DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIn
   return modified;
 }
 
-CZKUMUsbTreeNodeImpl* ClimbToHubPort(CZKUMUsbTreeNodeImpl* start) noexcept {
-  CZKUMUsbTreeNodeImpl* node = start;
-  while (node != nullptr) {
+CZKUMUsbTreeNodeImpl* HubPortClimbs::From(CZKUMUsbTreeNodeImpl* start) {
+  std::vector<const CZKUMUsbTreeNodeImpl*> way;
+  CZKUMUsbTreeNodeImpl* found = nullptr;
+  for (CZKUMUsbTreeNodeImpl* node = start; node != nullptr && found == nullptr;) {
+    ++m_nSteps;
+    // Nothing is known yet of what is on the way: a circle of parents would end here.
+    const auto [known, isNew] = m_found.try_emplace(node, nullptr);
+    if (!isNew) {
+      found = known->second;
+      break;
+    }
+    way.push_back(node);
     CZKUMUsbTreeNodeImpl* parent = node->m_pParent;
-    if (parent != nullptr && parent->m_nType == KUDTHubPort) return node;
+    if (parent != nullptr && parent->m_nType == KUDTHubPort) found = node;
     node = parent;
   }
-  return nullptr;
+  for (const CZKUMUsbTreeNodeImpl* passed : way) m_found[passed] = found;
+  return found;
 }
 
 bool ReachesRoot(const CZKUMUsbTreeNodeImpl& record) noexcept {

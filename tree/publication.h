@@ -1,7 +1,9 @@
 // The passes that turn a built tree into a published one.
 #pragma once
 
+#include <cstddef>
 #include <string>
+#include <unordered_map>
 #include <vector>
 
 #include "devinfo/info_device_cache.h"
@@ -50,8 +52,20 @@ bool PruneTree(const NodePtr& root);
 bool AcceptsAll(const NodePtr& root);
 // Whether the parent links of a record end at a root.
 bool ReachesRoot(const CZKUMUsbTreeNodeImpl& record) noexcept;
-// The node directly below a hub port that one meets when climbing from `start`; null when there is
-// none on the way.
-CZKUMUsbTreeNodeImpl* ClimbToHubPort(CZKUMUsbTreeNodeImpl* start) noexcept;
+
+// Climbs from records to the node directly below a hub port. Remembers where each record on the way
+// led: a chain of devices would take its length at each of them. For the time in which no parent
+// link changes; one thread.
+class HubPortClimbs {
+ public:
+  // Null where there is no hub port on the way.
+  CZKUMUsbTreeNodeImpl* From(CZKUMUsbTreeNodeImpl* start);
+  // Records looked at so far.
+  std::size_t Steps() const noexcept { return m_nSteps; }
+
+ private:
+  std::unordered_map<const CZKUMUsbTreeNodeImpl*, CZKUMUsbTreeNodeImpl*> m_found;
+  std::size_t m_nSteps = 0;
+};
 
 }  // namespace KelvoUHW

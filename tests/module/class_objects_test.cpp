@@ -327,6 +327,47 @@ TEST(Module, EndsWithTheNotifierHeldOrNotHeld) {
   }
 }
 
+// Nobody has asked a fresh module for a class object yet: whoever comes first makes it, and all get that one.
+TEST(ModuleStress, EightThreadsAskAFreshModuleForItsClassObjects) {
+  constexpr std::size_t kThreads = 8;
+  constexpr int kModules = 5;
+  testing_support::Rendezvous round(kThreads + 1);
+  std::atomic<CZKUsbMonitorModule*> asked = nullptr;
+  std::array<std::array<ComPtr<IClassFactory>, 2>, kThreads> answers;
+  std::vector<std::thread> threads;
+  for (auto& answer : answers) {
+    threads.emplace_back([&] {
+      for (int i = 0; i < kModules; ++i) {
+        round.ArriveAndWait();
+        const SlowAllocations slow;
+        for (std::size_t kind = 0; kind < 2; ++kind) {
+          const CLSID& clsid = kind == 0 ? CLSID_ZKUMUsbTree : CLSID_ZKUMEventNotifier;
+          EXPECT_EQ(asked.load()->GetClassObject(clsid, platform::IidOf<IClassFactory>(), answer[kind].PutVoid()),
+                    S_OK);
+        }
+        round.ArriveAndWait();
+        round.ArriveAndWait();
+      }
+    });
+  }
+  int different = 0;
+  for (int i = 0; i < kModules; ++i) {
+    CZKUsbMonitorModule module;
+    asked = &module;
+    round.ArriveAndWait();
+    round.ArriveAndWait();
+    for (auto& answer : answers) {
+      for (std::size_t kind = 0; kind < 2; ++kind) different += answer[kind].Get() != answers[0][kind].Get() ? 1 : 0;
+    }
+    for (auto& answer : answers) answer = {};
+    EXPECT_EQ(module.GetLockCount(), 0);
+    module.Unload();
+    round.ArriveAndWait();
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(different, 0);
+}
+
 TEST(ModuleStress, EightThreadsMakeAndReleaseTheTree) {
   constexpr std::size_t kThreads = 8;
   constexpr std::size_t kRounds = 500;

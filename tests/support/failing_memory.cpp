@@ -2,10 +2,12 @@
 
 #include <unwind.h>
 
+#include <chrono>
 #include <map>
 #include <memory>
 #include <new>
 #include <set>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -14,6 +16,7 @@
 // Allocations until the one that fails; 0: none fails.
 static thread_local std::uint64_t t_countdown = 0;
 static thread_local bool t_paused = false;
+static thread_local bool t_slow = false;
 
 // While set: the places of the allocations, hashed.
 static thread_local std::vector<std::uint64_t>* t_places = nullptr;
@@ -33,6 +36,7 @@ static void RecordPlace() {
 }
 
 void* operator new(std::size_t bytes) {
+  if (t_slow) std::this_thread::sleep_for(std::chrono::milliseconds(1));
   if (t_places != nullptr && !t_paused) RecordPlace();
   if (t_countdown != 0 && !t_paused && --t_countdown == 0) throw std::bad_alloc();
   if (void* memory = heap::Take(bytes)) return memory;
@@ -62,6 +66,9 @@ std::vector<std::uint64_t> EndRecordingAllocations() {
   for (const auto& [place, both] : firstAndLast) distinct.insert({both.first, both.second});
   return {distinct.begin(), distinct.end()};
 }
+
+SlowAllocations::SlowAllocations() noexcept { t_slow = true; }
+SlowAllocations::~SlowAllocations() { t_slow = false; }
 
 FailingAllocation::FailingAllocation(std::uint64_t allocation) noexcept { t_countdown = allocation; }
 FailingAllocation::~FailingAllocation() { t_countdown = 0; }

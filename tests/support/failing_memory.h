@@ -17,6 +17,13 @@ struct FailingAllocation {
   bool Failed() const noexcept;  // whether it came to the failure
 };
 
+// From construction to destruction each allocation of this thread takes a millisecond: time for others to pass where
+// nothing keeps them out.
+struct SlowAllocations {
+  SlowAllocations() noexcept;
+  ~SlowAllocations();
+};
+
 void BeginRecordingAllocations();
 std::vector<std::uint64_t> EndRecordingAllocations();
 

@@ -73,11 +73,26 @@ TEST(Climbing, EndsAtTheNodeBelowAHubPort) {
   const auto lone = MakeRecord<CZKUMInfoDeviceImpl>();
   const std::pair<NodePtr, NodePtr> cases[] = {{disk, device},  {device, device}, {hubPort, hub}, {hub, hub},
                                                {port, nullptr}, {root, nullptr},  {lone, nullptr}};
+  HubPortClimbs climbs;
   for (const auto& [start, below] : cases) {
-    EXPECT_EQ(ClimbToHubPort(start.Get()), below.Get()) << start->m_nType;
+    EXPECT_EQ(HubPortClimbs().From(start.Get()), below.Get()) << start->m_nType;
+    for (int again = 0; again < 2; ++again) EXPECT_EQ(climbs.From(start.Get()), below.Get()) << start->m_nType;
     EXPECT_EQ(ReachesRoot(*start), start != lone) << start->m_nType;
   }
-  EXPECT_EQ(ClimbToHubPort(nullptr), nullptr);
+  EXPECT_EQ(climbs.From(nullptr), nullptr);
+  // A chain of devices is climbed once, from whichever of them and in whichever order one asks.
+  constexpr std::size_t kLength = 2000;
+  for (const auto& [top, below] : {std::pair<NodePtr, NodePtr>{disk, device}, {lone, nullptr}}) {
+    std::vector<NodePtr> chain{top};
+    while (chain.size() < kLength) chain.push_back(Below<CZKUMInfoDeviceImpl>(chain.back().Get()));
+    for (const bool fromTop : {true, false}) {
+      HubPortClimbs ofChain;
+      for (std::size_t i = 0; i < kLength; ++i) {
+        EXPECT_EQ(ofChain.From(chain[fromTop ? i : kLength - 1 - i].Get()), below.Get());
+      }
+      EXPECT_LE(ofChain.Steps(), 2 * kLength + 2);
+    }
+  }
 }
 
 // Whether a node is kept, by its name and the children of its parent at that time.
