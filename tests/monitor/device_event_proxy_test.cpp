@@ -4,6 +4,9 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <thread>
 
 #include "monitor/event_notifier.h"
 #include "tests/support/failing_memory.h"
@@ -252,6 +255,38 @@ TEST_F(DeviceEventProxy, EnumeratesWithoutMemory) {
   EXPECT_EQ(result, S_OK);
   EXPECT_GE(failures, 3);
   EXPECT_EQ(scene.a.References(), 2);
+}
+
+// Whoever has the lock changes the slots: everybody else waits.
+TEST(SinkSlots, EachCallWaitsForTheLock) {
+  platform::CriticalSection lock;
+  ASSERT_EQ(lock.Initialize(), S_OK);
+  TestSink::Log log;
+  TestSink sink(log, "A");
+  SinkSlots slots(lock);
+  DWORD cookie = 0;
+  const std::pair<const char*, std::function<void()>> kCalls[] = {
+      {"Add",
+       [&] {
+         ComPtr<IUnknown> added(&sink);
+         EXPECT_EQ(slots.Add(added, cookie), S_OK);
+       }},
+      {"At", [&] { EXPECT_TRUE(slots.At(0)); }},
+      {"Occupied", [&] { EXPECT_EQ(slots.Occupied().size(), 1u); }},
+      {"Take", [&] { EXPECT_TRUE(slots.Take(cookie)); }},
+  };
+  for (const auto& [what, call] : kCalls) {
+    std::atomic<bool> done = false;
+    lock.lock();
+    std::thread caller([&] {
+      call();
+      done = true;
+    });
+    std::this_thread::sleep_for(std::chrono::milliseconds(30));
+    EXPECT_FALSE(done) << what;
+    lock.unlock();
+    caller.join();
+  }
 }
 
 }  // namespace

@@ -110,6 +110,20 @@ TEST(WatchCommand, TellsTheEventsThatAreKept) {
   }
 }
 
+// A reader without cards has letters and no volume.
+TEST(WatchCommand, TellsTheLettersOfEmptyCardSlots) {
+  const Args args{"watch", "--for", "0", "--machine", MachineFile("hp-cardreader")};
+  EXPECT_THAT(Output(args), testing::HasSubstr(
+                                "8-5  0BDA:0151  USB Mass Storage Device  serial 20060413092100000  F:, G:, H:, I:\n"));
+  Args asJson = args;
+  asJson.push_back("--json");
+  Json letters;
+  for (const Json& line : JsonLines(Output(asJson))) {
+    if (line.at("line") == "event" && IdOf(line) == "0BDA:0151") letters = line.at("driveLetters");
+  }
+  EXPECT_EQ(letters, Json::array({"F:", "G:", "H:", "I:"}));
+}
+
 TEST(WatchCommand, WatchesAPcWithoutController) {
 #ifdef _WIN32
   GTEST_SKIP() << "scripts play in real time, and this one takes a minute";
