@@ -10,6 +10,7 @@ is one mutant: caught or SURVIVED, where, what was changed, and the program that
 counts. The same seed makes the same mutants of the same sources.
 """
 import argparse
+import fcntl
 import json
 import os
 import pathlib
@@ -116,7 +117,8 @@ def configured(copy):
     build = copy / "build" / "mutants"
     linker = ["-DCMAKE_EXE_LINKER_FLAGS=-fuse-ld=mold", "-DCMAKE_SHARED_LINKER_FLAGS=-fuse-ld=mold"]
     subprocess.run(["cmake", "-S", str(copy), "-B", str(build), "-G", "Ninja", "-DCMAKE_BUILD_TYPE=Debug",
-                    "-DCMAKE_CXX_FLAGS_DEBUG=-O0 -g0", f"-DCMAKE_PROJECT_INCLUDE={copy}/scripts/mutants.cmake",
+                    # A mutant is often one that the compiler warns of, which is no reason not to build it.
+                    "-DCMAKE_CXX_FLAGS_DEBUG=-O0 -g0 -w", f"-DCMAKE_PROJECT_INCLUDE={copy}/scripts/mutants.cmake",
                     *(linker if shutil.which("ld.mold") else [])], check=True, stdout=subprocess.DEVNULL)
     return build
 
@@ -133,7 +135,12 @@ def main():
     args = parser.parse_args()
     begun = time.monotonic()
 
-    copy = copied_tree(pathlib.Path(__file__).resolve().parent.parent)
+    root = pathlib.Path(__file__).resolve().parent.parent
+    # Two runs in one copy would test each other's mutants.
+    (root / "build").mkdir(exist_ok=True)
+    only = (root / "build" / "mutants.lock").open("w")
+    fcntl.flock(only, fcntl.LOCK_EX | fcntl.LOCK_NB)
+    copy = copied_tree(root)
     build = configured(copy)
     tests = Tests(build, args.seconds)
     if run(["ninja", "-C", str(build), "-j2", *tests.names], build, 7200) != 0:
