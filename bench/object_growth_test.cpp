@@ -15,6 +15,7 @@ namespace {
 using platform::simulated::GeneratedShape;
 
 constexpr std::size_t kObjectDevices = 250;
+constexpr double kMostAllocationsOfADump = 3.2;  // for each node
 
 class ObjectGrowth : public testing::TestWithParam<GeneratedShape> {};
 
@@ -37,7 +38,12 @@ TEST_P(ObjectGrowth, IsTheSamePerNode) {
     EXPECT_NEAR(large.brought / small.brought, large.nodes / small.nodes, 1);
     EXPECT_LE(large.allocations / large.nodes, small.allocations / small.nodes * 1.05);
     EXPECT_LE(large.texts / large.nodes, small.texts / small.nodes * 1.05);
-    EXPECT_GE(large.allocations, large.brought);
+    // A dump is one text that grows; all else makes an object for whatever it brings.
+    if (work == ObjectWork::Dump) {
+      EXPECT_LE(large.allocations / large.nodes, kMostAllocationsOfADump);
+    } else {
+      EXPECT_GE(large.allocations, large.brought);
+    }
     EXPECT_EQ(large.texts > 0, work == ObjectWork::Read || work == ObjectWork::Dump);
   }
 }

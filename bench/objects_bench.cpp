@@ -4,6 +4,7 @@
 #include <string>
 
 #include "bench/object_work.h"
+#include "bench/start_state.h"
 #include "bench/workload.h"
 
 namespace {
@@ -11,6 +12,7 @@ namespace {
 using platform::simulated::GeneratedShape;
 
 void RunWork(benchmark::State& state, bench::ObjectWork work, GeneratedShape shape) {
+  bench::KeepFreedMemory();
   const bench::ObjectWorkload workload(shape, static_cast<std::size_t>(state.range(0)));
   for ([[maybe_unused]] const auto& iteration : state) {
     benchmark::DoNotOptimize(workload.Run(work));

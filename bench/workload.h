@@ -1,5 +1,5 @@
 // The work that the benchmarks measure: walks and builds over generated PCs. The programs here
-// print costs in platform calls (costs.cpp) and times, and tests pin counts of calls.
+// print costs in platform calls (costs_bench.cpp) and times, and tests pin counts of calls.
 #pragma once
 
 #include <cstddef>

@@ -103,6 +103,7 @@ void RunWork(benchmark::State& state, Work work, GeneratedShape shape) {
   state.counters["median_ms"] = median * 1e3;
   state.counters["floor_ms"] = floor * 1e3;
   state.counters["x_floor"] = median / floor;
+  state.counters["own_us"] = (median - floor) * 1e6 / static_cast<double>(devices);
 }
 
 // The two sizes take turns, so that a machine that is busy for a while slows both.

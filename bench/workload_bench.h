@@ -10,7 +10,8 @@ namespace bench {
 // Registers the work for PCs of 10 to 10,000 devices in both shapes. Reported are the mean time and
 // median_ms, the median of the iterations; the exact numbers of platform calls by kind and of
 // allocations, from a run of their own; floor_ms, the time of the same platform calls with nothing
-// done between them; and x_floor, the one median divided by the other.
+// done between them; x_floor, the one median divided by the other; and own_us, what the component
+// itself takes for each device.
 //
 // "growth/..." shows how time grows from 1,000 to 10,000 devices: both sizes take turns in one run,
 // and x_time is the median of the large PC divided by that of the small one.

@@ -131,7 +131,17 @@ HRESULT CZKUMUsbTreeNode::get_DriverKeyName(BSTR* pVal) {
 
 HRESULT CZKUMUsbTreeNode::get_ToString(BSTR* pVal) {
   return ReadTextOf(m_node, E_FAIL, pVal, [](const auto& node) {
+    // Room for most dumps from the start: a large one would be copied again and again as it grows.
+    constexpr std::size_t kCharsForEachNode = 1'024;
+    std::size_t chars = kCharsForEachNode;
+    for (const NodePtr& child : node.m_childs) {
+      VisitPreOrder(child, [&chars](const NodePtr&) {
+        chars += kCharsForEachNode;
+        return true;
+      });
+    }
     std::u16string text;
+    text.reserve(chars);
     node.ToString(text, {});
     return text;
   });

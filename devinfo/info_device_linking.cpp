@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "platform/flat_index.h"
+#include "platform/text.h"
 
 namespace KelvoUHW {
 
@@ -90,7 +91,8 @@ class ChildAdder {
     return platform::HashOf(parent) ^ platform::HashOf(id);
   }
   bool IsOf(Entry entry, Entry parent, std::u16string_view id) const noexcept {
-    return m_children[entry].parent == parent && m_children[entry].child->m_strDevInstId == id;
+    return m_children[entry].parent == parent &&
+           platform::SameText(m_children[entry].child->m_strDevInstId, id);
   }
   void Remember(const CZKUMUsbTreeNodeImpl& child, Entry parent) {
     m_children.push_back({parent, &child});

@@ -2,11 +2,26 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <type_traits>
+
+#include "platform/text.h"
 
 namespace KelvoUHW {
 
 using platform::FlatIndex;
 using platform::HashOf;
+
+namespace {
+
+bool SameKey(std::u16string_view a, std::u16string_view b) noexcept {
+  return platform::SameText(a, b);
+}
+template <class Number>
+bool SameKey(Number a, Number b) noexcept requires std::is_integral_v<Number> {
+  return a == b;
+}
+
+}  // namespace
 
 struct InfoDeviceSet::ByRecord {
   static std::uint64_t Of(const CZKUMUsbTreeNodeImpl& record) noexcept {
@@ -33,14 +48,14 @@ template <class Key>
 void InfoDeviceSet::Enter(Index<Key>& index, Entry entry) const {
   const auto value = Key::Of(RecordAt(entry));
   index.entries.Add(HashOf(value), entry,
-                    [&](Entry other) { return Key::Of(RecordAt(other)) == value; });
+                    [&](Entry other) { return SameKey(Key::Of(RecordAt(other)), value); });
 }
 
 template <class Key>
 void InfoDeviceSet::Leave(Index<Key>& index, Entry entry) const noexcept {
   const auto value = Key::Of(RecordAt(entry));
   index.entries.Remove(HashOf(value), entry,
-                       [&](Entry other) { return Key::Of(RecordAt(other)) == value; });
+                       [&](Entry other) { return SameKey(Key::Of(RecordAt(other)), value); });
 }
 
 template <class Key, class Value>
@@ -54,7 +69,7 @@ InfoDeviceSet::Entry InfoDeviceSet::First(const Value& value) const {
     index.filled = true;
   }
   return index.entries.First(HashOf(value),
-                             [&](Entry entry) { return Key::Of(RecordAt(entry)) == value; });
+                             [&](Entry entry) { return SameKey(Key::Of(RecordAt(entry)), value); });
 }
 
 const InfoDevicePtr& InfoDeviceSet::Found(Entry entry) const noexcept {

@@ -8,11 +8,13 @@
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
-#include <functional>
+#include <cstring>
 #include <limits>
 #include <string_view>
 #include <utility>
 #include <vector>
+
+#include "platform/text.h"
 
 namespace platform {
 
@@ -21,8 +23,25 @@ inline std::size_t HashOf(std::uint64_t number) noexcept {
   number *= 0x9E3779B97F4A7C15u;  // 2^64 divided by the golden ratio
   return static_cast<std::size_t>(number ^ (number >> 32));
 }
+// Four units at a time: ids are hashed in every pass of a build.
 inline std::size_t HashOf(std::u16string_view text) noexcept {
-  return std::hash<std::u16string_view>{}(text);
+  constexpr std::uint64_t kFactor = 0xD6E8FEB86659FD93u;
+  std::uint64_t hash = text.size() * kFactor;
+  const auto add = [&hash](std::uint64_t units) {
+    hash = (hash ^ units) * kFactor;
+    hash ^= hash >> 29;
+  };
+  std::size_t at = 0;
+  for (; at + 4 <= text.size(); at += 4) {
+    std::uint64_t four;
+    std::memcpy(&four, text.data() + at, sizeof four);
+    add(four);
+  }
+  std::uint64_t rest = 0;
+  for (; at < text.size(); ++at) rest = rest << 16 | text[at];
+  add(rest);
+  hash *= kFactor;  // a difference in the last units has to reach the lowest bits
+  return static_cast<std::size_t>(hash ^ (hash >> 29));
 }
 
 // Finds entries by a key. The entries are the caller's and known by small numbers, as positions in
@@ -162,18 +181,22 @@ class FlatTextSet {
  public:
   // False where the text was in the set already.
   bool Insert(std::u16string_view text) {
-    if (Contains(text)) return false;
+    const std::size_t hash = HashOf(text);
+    if (First(hash, text) != FlatIndex::kNone) return false;
     m_texts.push_back(text);
-    m_index.Add(HashOf(text), static_cast<FlatIndex::Entry>(m_texts.size() - 1),
-                [&](auto entry) { return m_texts[entry] == text; });
+    m_index.Add(hash, static_cast<FlatIndex::Entry>(m_texts.size() - 1),
+                [&](auto entry) { return SameText(m_texts[entry], text); });
     return true;
   }
   bool Contains(std::u16string_view text) const noexcept {
-    return m_index.First(HashOf(text), [&](auto entry) { return m_texts[entry] == text; }) !=
-           FlatIndex::kNone;
+    return First(HashOf(text), text) != FlatIndex::kNone;
   }
 
  private:
+  FlatIndex::Entry First(std::size_t hash, std::u16string_view text) const noexcept {
+    return m_index.First(hash, [&](auto entry) { return SameText(m_texts[entry], text); });
+  }
+
   std::vector<std::u16string_view> m_texts;
   FlatIndex m_index;
 };

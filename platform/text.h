@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -28,6 +29,16 @@ bool EqualIgnoringCase(std::u16string_view a, std::u16string_view b) noexcept;
 
 // The text with every `from` replaced by `to`.
 std::u16string Replaced(std::u16string text, char16_t from, char16_t to);
+
+// Whether both are the same units; the operator of the standard library compares them one by one.
+inline bool SameText(std::u16string_view a, std::u16string_view b) noexcept {
+  return a.size() == b.size() &&
+         (a.empty() || std::memcmp(a.data(), b.data(), a.size() * sizeof(char16_t)) == 0);
+}
+
+// Where the four units stand first, and `text.size()` where they do not. Much faster than a search
+// for a text of any length.
+std::size_t FindFour(std::u16string_view text, const char16_t (&units)[5]) noexcept;
 
 // The characters before the first zero, or all of `buffer` where it holds none.
 std::u16string_view UpToZero(std::u16string_view buffer) noexcept;

@@ -78,16 +78,18 @@ struct Field {
   std::u16string_view text;  // between the marks
   std::u16string_view rest;  // behind the end mark
 };
-// The first `begin` and the first `end` behind it; false where one of the two is missing.
-bool FindField(std::u16string_view text, std::u16string_view begin, char16_t end,
-               Field& field) noexcept {
-  const std::size_t start = text.find(begin);
-  if (start == text.npos) return false;
-  const std::u16string_view from = text.substr(start + begin.size());
+// From a place in the text to the first `end` there; false where there is none.
+bool TakeField(std::u16string_view from, char16_t end, Field& field) noexcept {
   const std::size_t length = from.find(end);
   if (length == from.npos) return false;
   field = {from.substr(0, length), from.substr(length + 1)};
   return true;
+}
+// The first `begin` and the first `end` behind it; false where one of the two is missing.
+bool FindField(std::u16string_view text, const char16_t (&begin)[5], char16_t end,
+               Field& field) noexcept {
+  const std::size_t start = platform::FindFour(text, begin);
+  return start != text.size() && TakeField(text.substr(start + 4), end, field);
 }
 
 }  // namespace
@@ -115,11 +117,17 @@ void NodeIdentity::ParseInstanceId() {
     m_strProduct.clear();
     // The product name runs up to the backslash, revision included. Deliberate: it is the name
     // under which storage devices are told apart.
-    if (!FindField(field.rest, u"PROD_", u'\\', field)) return;
+    constexpr std::u16string_view kProduct = u"PROD_";
+    const std::size_t product = field.rest.find(kProduct);
+    if (product == field.rest.npos ||
+        !TakeField(field.rest.substr(product + kProduct.size()), u'\\', field)) {
+      return;
+    }
     m_strProduct = field.text;
   }
   // The serial number is deliberately the whole last component, including a trailing "&0".
-  SetSerialNumber(std::u16string(id.substr(id.rfind(u'\\') + 1)));
+  const std::u16string_view serialNumber = id.substr(id.rfind(u'\\') + 1);
+  if (!serialNumber.empty()) m_strSerialNumber = serialNumber;
 }
 
 void NodeIdentity::SetSerialNumber(std::u16string serialNumber) {

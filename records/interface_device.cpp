@@ -54,11 +54,8 @@ void CZKUMInterfaceDeviceImpl::DevicePropertiesToString(std::u16string& out,
   // received and so reads as a fixed direct-access device without texts.
   const platform::STORAGE_DEVICE_DESCRIPTOR header = DescriptorHeader();
   AppendLine(out, indent, u"Device Properties:");
-  AppendLine(out, indent, u"Device Type         : 0x",
-             platform::Hex(header.DeviceType)
-                 .append(u" (")
-                 .append(StorageDeviceTypeName(header.DeviceType))
-                 .append(u")"));
+  AppendLineOf(out, indent, u"Device Type         : 0x", platform::Hex(header.DeviceType), u" (",
+               StorageDeviceTypeName(header.DeviceType), u")");
   if (header.DeviceTypeModifier != 0) {
     AppendLine(out, indent, u"Device Modifier : 0x", platform::HexLower(header.DeviceTypeModifier));
   }

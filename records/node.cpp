@@ -89,6 +89,7 @@ void CZKUMUsbTreeNodeImpl::ToString(std::u16string& out, std::u16string indent) 
     std::size_t nextChild;
   };
   std::vector<Level> path;
+  path.reserve(8);  // deeper than most: each device record below a port is dumped on its own
   const auto enter = [&](const CZKUMUsbTreeNodeImpl& node) {
     node.OwnLines(out, indent);
     // The number is the constant 0 and not the count of children. Deliberate: readers of dumps
@@ -128,10 +129,10 @@ void CZKUMUsbTreeNodeImpl::BaseToString(std::u16string& out, const std::u16strin
   lineUnlessEmpty(u"deviceDescr : ", m_strDeviceDescr);
   lineUnlessEmpty(u"serial number        : ", m_strSerialNumber);
   if (m_nVendorId != kUnknownId || m_nProductId != kUnknownId) {
-    AppendLine(out, indent, u"VendorId; productId: ",
-               u"0x" + platform::Hex(m_nVendorId) + u"; 0x" + platform::Hex(m_nProductId));
+    AppendLineOf(out, indent, u"VendorId; productId: 0x", platform::Hex(m_nVendorId), u"; 0x",
+                 platform::Hex(m_nProductId));
   } else if (!m_strVendor.empty() || !m_strProduct.empty()) {
-    AppendLine(out, indent, u"Vendor; product: ", m_strVendor + u";" + m_strProduct);
+    AppendLineOf(out, indent, u"Vendor; product: ", m_strVendor, u";", m_strProduct);
   }
   const auto lineUnlessZero = [&](std::u16string_view label, platform::DevInst handle) {
     if (handle == 0) return;
@@ -149,9 +150,11 @@ bool CZKUMUsbTreeNodeImpl::HasChildWithDriverKey(const std::u16string& driverKey
 
 bool CZKUMUsbTreeNodeImpl::IsSameNode(const CZKUMUsbTreeNodeImpl& other) const noexcept {
   if (this == &other) return true;
-  return m_strDevInstId == other.m_strDevInstId && m_nProductId == other.m_nProductId &&
-         m_strProduct == other.m_strProduct && m_strSerialNumber == other.m_strSerialNumber &&
-         m_strDeviceDescr == other.m_strDeviceDescr;
+  using platform::SameText;
+  return m_nProductId == other.m_nProductId && SameText(m_strDevInstId, other.m_strDevInstId) &&
+         SameText(m_strProduct, other.m_strProduct) &&
+         SameText(m_strSerialNumber, other.m_strSerialNumber) &&
+         SameText(m_strDeviceDescr, other.m_strDeviceDescr);
 }
 
 void AddChild(const NodePtr& child, CZKUMUsbTreeNodeImpl* parent) {
@@ -175,7 +178,7 @@ NodePtr FindByInstanceId(const NodePtr& root, const std::u16string& instanceId) 
 
 void AppendLine(std::u16string& out, std::u16string_view indent, std::u16string_view label,
                 std::u16string_view value) {
-  out.append(indent).append(label).append(value).append(u"\r\n");
+  AppendLineOf(out, indent, label, value);
 }
 
 }  // namespace KelvoUHW

@@ -137,6 +137,13 @@ void VisitPreOrder(const NodePtr& root, Visit visit) {
   }
 }
 
+// Appends indent + parts + "\r\n". No text is made for it: dumps have many lines.
+template <class... Parts>
+void AppendLineOf(std::u16string& out, std::u16string_view indent, const Parts&... parts) {
+  out.append(indent);
+  (out.append(parts), ...);
+  out.append(u"\r\n");
+}
 // Appends indent + label + value + "\r\n", the shape of most lines of a dump.
 void AppendLine(std::u16string& out, std::u16string_view indent, std::u16string_view label,
                 std::u16string_view value = {});

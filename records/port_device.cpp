@@ -65,8 +65,8 @@ void CZKUMPortDeviceImpl::OwnLines(std::u16string& out, const std::u16string& in
     AppendLine(out, indent, u"manufacturer  : ", m_strUsbManufacturer);
     AppendLine(out, indent, u"product       : ", m_strUsbProduct);
     // A vendor without a name is printed as the platform's formatted print writes a missing text.
-    AppendLine(out, indent, u"idVendor      : 0x" + platform::Hex(m_nVendorId, 4) + u" ",
-               VendorName(static_cast<std::uint16_t>(m_nVendorId)).value_or(u"(null)"));
+    AppendLineOf(out, indent, u"idVendor      : 0x", platform::Hex(m_nVendorId, 4), u" ",
+                 VendorName(static_cast<std::uint16_t>(m_nVendorId)).value_or(u"(null)"));
     DumpConnectionInformation(*record, indent, out);
     if (m_pPortInfo->ConfigDesc) {
       DumpConfiguration(m_rawInterfaceDescriptors, m_pPortInfo->StringDescs.get(), indent, out);

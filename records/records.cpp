@@ -71,8 +71,8 @@ CZKUMHubPortImpl::~CZKUMHubPortImpl() {
 }
 
 void CZKUMHubPortImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
-  AppendLine(out, indent,
-             u"HubPort " + platform::Decimal(static_cast<std::int32_t>(m_nPortIndex)) + u":");
+  AppendLineOf(out, indent, u"HubPort ", platform::Decimal(static_cast<std::int32_t>(m_nPortIndex)),
+               u":");
   // Everything but 0 and 1 is called bad, an unconfigured device too. This is deliberate.
   AppendLine(out, indent, u"status : ",
              m_nStatus == KPortEmpty       ? u"no device connected"

@@ -94,8 +94,9 @@ void RecordRings::LetAllGo() noexcept {
   const RingLink::Lock lock;
   for (Ring* ring = &m_shared; ring;) {
     while (ring->m_pNext != ring) {
-      ring->m_pNext->m_pHeld = nullptr;
-      RingLink::Unlink(*ring->m_pNext);
+      const RingLink& member = *ring->m_pNext;
+      RingLink::Unlink(member);
+      member.Hold(nullptr);
     }
     Ring* const next = ring->next;
     if (ring != &m_shared) delete ring;

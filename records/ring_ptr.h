@@ -4,6 +4,7 @@
 // when it lets go deletes the record. Copies, moves and releases take constant time.
 #pragma once
 
+#include <atomic>
 #include <concepts>
 #include <cstddef>
 #include <memory>
@@ -37,8 +38,11 @@ class RingLink {
   static void SwapPlaces(const RingLink& a, const RingLink& b) noexcept;  // of two rings
   static std::size_t CountMembers(const RingLink& member) noexcept;
 
-  // What the member points at. A record that is destroyed takes it from pointers that it knows.
-  mutable void* m_pHeld = nullptr;
+  // What the member points at. A record that is destroyed takes it from pointers that it knows, as
+  // the last thing it does to them: a pointer that finds itself empty stands alone, and needs no
+  // lock.
+  void* Held() const noexcept { return m_pHeld.load(std::memory_order_acquire); }
+  void Hold(void* record) const noexcept { m_pHeld.store(record, std::memory_order_release); }
 
  private:
   friend class RecordRings;
@@ -46,6 +50,7 @@ class RingLink {
   // Copying a pointer links the copy behind its source, which is const to the one who copies.
   mutable const RingLink* m_pPrevious = this;
   mutable const RingLink* m_pNext = this;
+  mutable std::atomic<void*> m_pHeld = nullptr;
 };
 
 // The base of records that several rings may hold: that of the pointers which share it, and rings
@@ -96,7 +101,7 @@ class RingPtr : private RingLink {
   RingPtr(std::nullptr_t) noexcept {}
   // Takes over a new record that no RingPtr owns yet.
   explicit RingPtr(T* record) noexcept {
-    m_pHeld = record;
+    Hold(record);
     if constexpr (KnowsItsRings()) {
       const Lock lock;
       if (record) record->Begin(*this);
@@ -113,7 +118,7 @@ class RingPtr : private RingLink {
     const Lock lock;
     if (record->BeginRing(ring.get(), result)) {
       static_cast<void>(ring.release());  // the record owns it
-      result.m_pHeld = record;
+      result.Hold(record);
     }
     return result;
   }
@@ -129,19 +134,30 @@ class RingPtr : private RingLink {
   ~RingPtr() { Reset(); }
 
   RingPtr& operator=(const RingPtr& other) noexcept {
-    if (this != &other) RingPtr(other).Swap(*this);
+    if (this == &other) return *this;
+    if (*this) {
+      RingPtr(other).Swap(*this);
+    } else {
+      Join(other);
+    }
     return *this;
   }
   RingPtr& operator=(RingPtr&& other) noexcept {
-    RingPtr(std::move(other)).Swap(*this);
+    if (*this) {
+      RingPtr(std::move(other)).Swap(*this);
+    } else {
+      Take(other);
+    }
     return *this;
   }
 
   void Swap(RingPtr& other) noexcept {
     const Lock lock;
-    if (m_pHeld == other.m_pHeld && AreOneRing(other)) return;  // nothing would differ
+    void* const held = Held();
+    if (held == other.Held() && AreOneRing(other)) return;  // nothing would differ
     SwapPlaces(*this, other);
-    std::swap(m_pHeld, other.m_pHeld);
+    Hold(other.Held());
+    other.Hold(held);
   }
 
   // Lets go; deletes the record when this was the last pointer to it.
@@ -166,15 +182,15 @@ class RingPtr : private RingLink {
     }
   }
 
-  T* Get() const noexcept { return static_cast<T*>(m_pHeld); }
+  T* Get() const noexcept { return static_cast<T*>(Held()); }
   T* operator->() const noexcept { return Get(); }
   T& operator*() const noexcept { return *Get(); }
-  explicit operator bool() const noexcept { return m_pHeld != nullptr; }
+  explicit operator bool() const noexcept { return Held() != nullptr; }
 
   // The number of pointers in the ring, 0 for an empty one. Walks it.
   std::size_t RingSize() const noexcept {
     const Lock lock;
-    return m_pHeld ? CountMembers(*this) - (KnowsItsRings() ? 1 : 0) : 0;
+    return Held() ? CountMembers(*this) - (KnowsItsRings() ? 1 : 0) : 0;
   }
 
   // The same record under a derived type, in the same ring. The caller knows the type.
@@ -182,8 +198,10 @@ class RingPtr : private RingLink {
   RingPtr<U> StaticCast() const noexcept {
     RingPtr<U> result;
     const Lock lock;
-    result.m_pHeld = static_cast<U*>(Get());
-    if (m_pHeld) LinkAfter(*this, result);
+    if (T* const record = Get()) {
+      result.Hold(static_cast<U*>(record));
+      LinkAfter(*this, result);
+    }
     return result;
   }
 
@@ -208,21 +226,33 @@ class RingPtr : private RingLink {
     }
   }
 
-  // The source's address is read under the lock: another thread may be assigning to the source.
+  // The next two are for a pointer that is empty. The source's address is read under the lock:
+  // another thread may be assigning to the source, or taking its record from it.
   template <class U>
   void Join(const RingPtr<U>& other) noexcept {
+    if (!other) return;
     const Lock lock;
-    m_pHeld = static_cast<T*>(other.Get());
-    if (m_pHeld) LinkAfter(other, *this);
+    if (T* const record = other.Get()) {
+      Hold(record);
+      LinkAfter(other, *this);
+    }
   }
   template <class U>
   void Take(RingPtr<U>& other) noexcept {
+    if (!other) return;
     const Lock lock;
-    m_pHeld = static_cast<T*>(other.Taken());
-    TakePlace(other, *this);
+    if (T* const record = other.Taken()) {
+      Hold(record);
+      TakePlace(other, *this);
+    }
   }
-  T* Taken() noexcept { return static_cast<T*>(std::exchange(m_pHeld, nullptr)); }
+  T* Taken() noexcept {
+    T* const record = Get();
+    Hold(nullptr);
+    return record;
+  }
   T* Leave() noexcept {
+    if (!*this) return nullptr;
     const Lock lock;
     T* record = Taken();
     if constexpr (KnowsItsRings()) {

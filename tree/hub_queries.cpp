@@ -28,34 +28,32 @@ class NameBuffer {
   // False without a buffer of that size.
   bool Grow(std::uint32_t size) noexcept {
     if (size > kMostNameBytes) return false;
-    m_large.reset(static_cast<std::uint8_t*>(std::calloc(size, 1)));
+    m_large.reset(static_cast<char16_t*>(std::calloc(size, 1)));
     m_size = size;
     return m_large != nullptr;
   }
-  std::uint8_t* Data() noexcept { return m_large ? m_large.get() : m_first.data(); }
+  void* Data() noexcept { return Chars(); }
   std::uint32_t Size() const noexcept { return m_size; }
   // The characters between the head and `end`, as far as they were received, up to the terminating
   // zero.
   std::u16string Name(std::size_t head, std::uint32_t end) {
     end = std::min(end, m_size);
-    // Taken one by one: how much a driver claims to have written says nothing about the name.
-    std::u16string name;
-    for (std::size_t at = head; at + sizeof(char16_t) <= end; at += sizeof(char16_t)) {
-      char16_t unit;
-      std::memcpy(&unit, Data() + at, sizeof unit);
-      if (unit == u'\0') break;
-      name += unit;
-    }
-    return name;
+    if (end < head) return {};
+    const std::u16string_view received(Chars() + head / sizeof(char16_t),
+                                       (end - head) / sizeof(char16_t));
+    // How much a driver claims to have written says nothing about the name.
+    return std::u16string(platform::UpToZero(received));
   }
 
  private:
   struct Free {
-    void operator()(std::uint8_t* bytes) const noexcept { std::free(bytes); }
+    void operator()(char16_t* chars) const noexcept { std::free(chars); }
   };
 
-  std::array<std::uint8_t, kFirstNameBytes> m_first{};
-  std::unique_ptr<std::uint8_t[], Free> m_large;
+  char16_t* Chars() noexcept { return m_large ? m_large.get() : m_first.data(); }
+
+  std::array<char16_t, kFirstNameBytes / sizeof(char16_t)> m_first{};
+  std::unique_ptr<char16_t[], Free> m_large;
   std::uint32_t m_size = kFirstNameBytes;
 };
 

@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "devinfo/info_device_linking.h"
+#include "platform/text.h"
 #include "records/devnode.h"
 
 namespace KelvoUHW {
@@ -114,11 +115,17 @@ void Publication::IdentifyHubs(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& 
   const CZKUMUsbTreeNodeImpl* node = entry.Get();
   CZKUMUsbTreeNodeImpl* hub = twoAbove(device);
   while (hub != nullptr && hub->m_nType == KUDTHub) {
-    const std::u16string earlierId = hub->m_strDevInstId;
-    hub->m_devInstHandle = node->m_devInstHandleParent;
-    hub->SetInstanceId(node->m_strDevInstIdParent);
-    ResolveParentInstanceId(m_manager, *hub);
-    index.Renamed(*hub, earlierId);
+    const bool asBefore = hub->m_devInstHandle == node->m_devInstHandleParent &&
+                          platform::SameText(hub->m_strDevInstId, node->m_strDevInstIdParent);
+    if (!asBefore || !m_identified.contains(hub)) {
+      const std::u16string earlierId = hub->m_strDevInstId;
+      hub->m_devInstHandle = node->m_devInstHandleParent;
+      hub->SetInstanceId(node->m_strDevInstIdParent);
+      ResolveParentInstanceId(m_manager, *hub);
+      index.Renamed(*hub, earlierId);
+      // A parent that could not be told is asked for again.
+      if (!hub->m_strDevInstIdParent.empty()) m_identified.insert(hub);
+    }
     node = hub;
     hub = twoAbove(*hub);
   }

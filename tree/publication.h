@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <string>
 #include <unordered_map>
+#include <unordered_set>
 #include <vector>
 
 #include "devinfo/info_device_cache.h"
@@ -43,6 +44,8 @@ class Publication {
   const std::vector<NodePtr>& m_interfaceDevices;
   const NodePtr m_building;
   const NodePtr m_published;
+  // Hubs whose parent is known, as they stand: most are above many devices.
+  std::unordered_set<const CZKUMUsbTreeNodeImpl*> m_identified;
 };
 
 // Asks every node of a tree, parents first, whether it is kept, and takes out of the child lists

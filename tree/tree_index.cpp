@@ -2,16 +2,20 @@
 
 #include <utility>
 
+#include "platform/text.h"
+
 namespace KelvoUHW {
 
 using platform::FlatIndex;
 using platform::HashOf;
+using platform::SameText;
 
 TreeIndex::TreeIndex(NodePtr root) : m_root(std::move(root)) { Added(m_root); }
 
 TreeIndex::Entry TreeIndex::First(std::u16string_view instanceId) const noexcept {
-  return m_byId.First(HashOf(instanceId),
-                      [&](Entry entry) { return m_nodes[entry]->m_strDevInstId == instanceId; });
+  return m_byId.First(HashOf(instanceId), [&](Entry entry) {
+    return SameText(m_nodes[entry]->m_strDevInstId, instanceId);
+  });
 }
 
 NodePtr TreeIndex::Find(const std::u16string& instanceId) const {
@@ -45,7 +49,8 @@ void TreeIndex::Added(const NodePtr& node) {
 
 void TreeIndex::Enter(Entry entry) {
   const std::u16string& id = m_nodes[entry]->m_strDevInstId;
-  m_byId.Add(HashOf(id), entry, [&](Entry other) { return m_nodes[other]->m_strDevInstId == id; });
+  m_byId.Add(HashOf(id), entry,
+             [&](Entry other) { return SameText(m_nodes[other]->m_strDevInstId, id); });
 }
 
 void TreeIndex::Renamed(const CZKUMUsbTreeNodeImpl& node, const std::u16string& earlierId) {
@@ -53,7 +58,7 @@ void TreeIndex::Renamed(const CZKUMUsbTreeNodeImpl& node, const std::u16string& 
   // Where it stands it stands under its earlier id still.
   const auto hadEarlierId = [&](Entry entry) {
     const NodePtr& each = m_nodes[entry];
-    return (each.Get() == &node ? earlierId : each->m_strDevInstId) == earlierId;
+    return each.Get() == &node || SameText(each->m_strDevInstId, earlierId);
   };
   const std::size_t hash = HashOf(earlierId);
   Entry entry = m_byId.First(hash, hadEarlierId);
