@@ -28,6 +28,8 @@ if(ZKUSB_BUILD_TESTS)
   # The test library, from its sources: the building system has it compiled for itself only.
   find_path(ZKUSB_GOOGLETEST CMakeLists.txt PATHS /usr/src/googletest NO_DEFAULT_PATH REQUIRED)
   add_subdirectory(${ZKUSB_GOOGLETEST} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
+  target_compile_options(gtest PRIVATE -O0)
+  target_compile_options(gmock PRIVATE -O0)
 endif()
 
 # The version resource of a DLL or program, for a resource script that includes cmake/version.rc: the version is that of

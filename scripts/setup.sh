@@ -24,4 +24,4 @@ windows_build_packages=("${build_packages[@]}" g++-mingw-w64-i686-posix g++-ming
 windows_run_packages=(wine wine64)
 # Beyond those, for ./test all. Without a browser and without a typesetter the tests that use them are skipped, aloud.
 all_packages=(clang-tidy-14)
-browser_packages=(chromium groff-base)
+browser_packages=(chromium groff-base xvfb xauth imagemagick)

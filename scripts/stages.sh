@@ -17,7 +17,7 @@ about() {
     native) echo 'all native tests under the address sanitizer|150' ;;
     windows-x64) echo 'the 64-bit Windows tests under Wine|180' ;;
     windows-x86) echo 'the 32-bit Windows tests under Wine|180' ;;
-    plain) echo 'growth by exact counts, and what the module exports|60' ;;
+    plain) echo 'growth by exact counts, what the module exports, 10,000 orders of threads, 200,000 broadcasts|150' ;;
     threads) echo 'what shares memory, under the thread sanitizer|120' ;;
     fuzz) echo 'each fuzz target for a moment|60' ;;
     tidy) echo 'clang-tidy over every source file|95' ;;
@@ -56,7 +56,8 @@ test_preset() { # PRESET [OPTION OF CTEST...]
 stage_tree() { scripts/check-tree.sh && outcome 1 0 0; }
 stage_native() { build_preset asan && test_preset asan; }
 stage_plain() {
-  build_preset release ZKUsbMonitor zkusb_growth && test_preset release -R '^(module_exports|zkusb_growth)'
+  build_preset release ZKUsbMonitor zkusb_growth zkusb_schedule_tests zkusb_storm &&
+    test_preset release -R '^(module_exports|zkusb_growth|zkusb_schedules_long|zkusb_storm_long)'
 }
 stage_threads() {
   build_preset tsan zkusb_tree_tests zkusb_records_tests zkusb_com_tests zkusb_simulation_tests zkusb_monitor_tests \
