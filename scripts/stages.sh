@@ -56,7 +56,7 @@ test_preset() { # PRESET [OPTION OF CTEST...]
 stage_tree() { scripts/check-tree.sh && outcome 1 0 0; }
 stage_native() { build_preset asan && test_preset asan; }
 stage_plain() {
-  build_preset release ZKUsbMonitor zkusb_growth zkusb_schedule_tests zkusb_storm &&
+  build_preset release ZKUsbMonitor zkusb_bench zkusb_growth zkusb_schedule_tests zkusb_storm &&
     test_preset release -R '^(module_exports|zkusb_growth|zkusb_schedules_long|zkusb_storm_long)'
 }
 stage_threads() {
