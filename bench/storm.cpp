@@ -244,12 +244,15 @@ class Process {
                      : InterfaceBroadcast(event, platform::GUID_DEVINTERFACE_DISK,
                                           watched ? u"\\\\?\\USB#VID_05AC&PID_1291#1#{x}"
                                                   : u"\\\\?\\USB#VID_046D&PID_C077#1#{x}");
-      if (kind == 1) broadcast.record.resize(random() % broadcast.record.size());
-      if (kind == 2) broadcast = {7, {}};
-      if (kind == 1 && broadcast.record.size() >= 4) {
-        const auto size = static_cast<std::uint32_t>(broadcast.record.size());
+      if (kind == 1) {
+        // Cut off somewhere, and it says so: no message is without its own size, which stands
+        // first.
+        std::uint32_t size = sizeof size;
+        size += static_cast<std::uint32_t>(random() % (broadcast.record.size() - sizeof size));
+        broadcast.record.resize(size);
         std::memcpy(broadcast.record.data(), &size, sizeof size);
       }
+      if (kind == 2) broadcast = {7, {}};
       ++broadcasts;
       m_desktop.Broadcast(broadcast);
       if (random() % 8 == 0) Pause();
