@@ -14,14 +14,14 @@ fi
 about() {
   case $1 in
     tree) echo 'the tree of files: order of the rooms, format, test lists|5' ;;
-    native) echo 'all native tests under the address sanitizer|150' ;;
-    windows-x64) echo 'the 64-bit Windows tests under Wine|180' ;;
-    windows-x86) echo 'the 32-bit Windows tests under Wine|180' ;;
-    plain) echo 'growth by exact counts, what the module exports, 10,000 orders of threads, 200,000 broadcasts|150' ;;
-    threads) echo 'what shares memory, under the thread sanitizer|120' ;;
-    fuzz) echo 'each fuzz target for a moment|60' ;;
-    tidy) echo 'clang-tidy over every source file|95' ;;
-    reproducible) echo 'the Windows files, built twice: the same bytes|150' ;;
+    native) echo 'all native tests under the address sanitizer|300' ;;
+    windows-x64) echo 'the 64-bit Windows tests under Wine|320' ;;
+    windows-x86) echo 'the 32-bit Windows tests under Wine|320' ;;
+    plain) echo 'growth by exact counts, what the module exports, 10,000 orders of threads, 200,000 broadcasts|120' ;;
+    threads) echo 'what shares memory, under the thread sanitizer|90' ;;
+    fuzz) echo 'each fuzz target for a moment|70' ;;
+    tidy) echo 'clang-tidy over every source file|75' ;;
+    reproducible) echo 'the Windows files, built twice: the same bytes|240' ;;
   esac
 }
 
