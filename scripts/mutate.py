@@ -91,7 +91,8 @@ class Tests:
 def run(command, folder, seconds):
     def bound():
         resource.setrlimit(resource.RLIMIT_AS, (PROGRAM_LIMIT, PROGRAM_LIMIT))
-        signal.signal(signal.SIGHUP, signal.SIG_DFL)  # ignored in what runs in the background
+        for ignored in (signal.SIGHUP, signal.SIGINT, signal.SIGQUIT):  # in what runs in the background
+            signal.signal(ignored, signal.SIG_DFL)
     with subprocess.Popen(command, cwd=folder, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, preexec_fn=bound,
                           start_new_session=True) as process:
         try:
