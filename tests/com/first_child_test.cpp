@@ -46,6 +46,17 @@ TEST_F(FirstChildOfType, FindsTheFirstInPreOrder) {
   EXPECT_EQ(searcher->get_FirstChildOfType(nullptr, KUDTHub, nullptr), E_POINTER);
 }
 
+#ifndef _WIN32
+// Deliberate: callers have always had to pass these two pointers.
+TEST_F(FirstChildOfType, TwoPointersAreNotTestedForNull) {
+  const auto root = Wrap(sample.root);
+  EXPECT_DEATH(searcher->get_FirstChildOfType(root.Get(), KUDTRoot, nullptr), "");
+  ComPtr<IZKUMUsbTreeNodeEnumerator> list;
+  ASSERT_EQ(root->get_Childs(list.Put()), S_OK);
+  EXPECT_DEATH(list->MoveNext(nullptr), "");
+}
+#endif
+
 TEST_F(FirstChildOfType, DepthIsNoLimit) {
   NodePtr chain = MakeNode<CZKUMHostControllerImpl>(u"deepest");
   for (int depth = 0; depth < 1000; ++depth) chain = MakeNode<CZKUMHubDeviceImpl>(u"hub", {chain});

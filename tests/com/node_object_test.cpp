@@ -16,8 +16,9 @@ struct TextRules {
 constexpr char kRaised[] = "raised E_OUTOFMEMORY null", kNoMemory[] = "E_OUTOFMEMORY null";
 // The text is made before the out pointer is looked at, the record is asked for before both.
 constexpr TextRules kBase = {kRaised, kNoMemory, "raised E_OUTOFMEMORY", "E_FAIL null", "E_FAIL"};
-// The typed record is not tested.
-constexpr TextRules kTyped = {kRaised, kNoMemory, "raised E_OUTOFMEMORY", nullptr, nullptr};
+// No object without record has these interfaces, but its record may be destroyed.
+constexpr TextRules kTyped = {kRaised, kNoMemory, "raised E_OUTOFMEMORY", "E_POINTER null", nullptr};
+constexpr TextRules kManaged = {kRaised, kNoMemory, "raised E_OUTOFMEMORY", "E_FAIL null", nullptr};
 // Nothing is read for a null out pointer.
 constexpr TextRules kSerialNumber = {kRaised, kNoMemory, "E_POINTER", "E_FAIL null", "E_POINTER"};
 // Out of memory is not noticed.
@@ -60,14 +61,14 @@ const TextRow kTexts[] = {Row<&IZKUMUsbTreeNode::get_InstanceId, 3>("InstanceId"
                           Row<&IZKUMHubDevice::get_PathName, 3>("PathName", {"hub"}, kTyped),
                           Row<&IZKUMHubDevice::get_ConnectionName, 4>("ConnectionName", {"hub"}, kTyped),
                           // A port device shows those of its device-manager node.
-                          Row<&IZKUMInfoDevice::get_Service, 3>("Service", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_FriendlyName, 4>("FriendlyName", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_Location, 5>("Location", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_Manufacturer, 6>("Manufacturer", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_HardwareId, 7>("HardwareId", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_PhysicalName, 8>("PhysicalName", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_DevClass, 9>("DevClass", kInfo, kTyped, "info"),
-                          Row<&IZKUMInfoDevice::get_EnumName, 10>("EnumName", kInfo, kTyped, "info"),
+                          Row<&IZKUMInfoDevice::get_Service, 3>("Service", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_FriendlyName, 4>("FriendlyName", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_Location, 5>("Location", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_Manufacturer, 6>("Manufacturer", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_HardwareId, 7>("HardwareId", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_PhysicalName, 8>("PhysicalName", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_DevClass, 9>("DevClass", kInfo, kManaged, "info"),
+                          Row<&IZKUMInfoDevice::get_EnumName, 10>("EnumName", kInfo, kManaged, "info"),
                           Row<&IZKUMInterfaceDevice::get_VolumeName, 3>("VolumeName", {"disk"}, kTyped),
                           Row<&IZKUMInterfaceDevice::get_VendorId, 4>("VendorId", {"disk"}, kTyped),
                           Row<&IZKUMInterfaceDevice::get_ProductId, 5>("ProductId", {"disk"}, kTyped),
@@ -115,7 +116,7 @@ TEST_F(NodeObject, TextsAndWhatIsAnsweredInTheirPlace) {
       CheckText(row.property, objects[kind].Get(), row.rules, source + "." + row.name);
       EXPECT_EQ(TextOf(row.bySlot, objects[kind].Get()), "S_OK " + source + "." + row.name);
     }
-    if (row.rules.noRecord == nullptr) continue;
+    if (row.rules.noRecordNullOut == nullptr) continue;
     EXPECT_EQ(TextOf(row.property, empty.Get()), row.rules.noRecord) << row.name;
     EXPECT_EQ(TextOf(row.property, empty.Get(), false), row.rules.noRecordNullOut) << row.name;
   }
@@ -164,6 +165,35 @@ TEST_F(NodeObject, NumbersAndWhatIsAnsweredInTheirPlace) {
     EXPECT_EQ(row.read(empty.Get(), true), row.noRecord + untouched);
     EXPECT_EQ(row.read(empty.Get(), false), row.noRecordNullOut);
   }
+}
+
+// The object of a Parent that is let go takes the record from all others.
+TEST_F(NodeObject, WhatIsAnsweredWhenTheRecordIsDestroyed) {
+  std::vector<CZKUMUsbTreeNodeImpl*> records;
+  for (const NodePtr& node : sample.Nodes()) records.push_back(node.Get());
+  for (CZKUMUsbTreeNodeImpl* record : records) {
+    const auto child = MakeRecord<CZKUMUsbTreeNodeImpl>();
+    child->m_pParent = record;
+    ComPtr<IZKUMUsbTreeNode> parent;
+    ASSERT_EQ(Wrap(child)->get_Parent(parent.Put()), S_OK);
+  }
+  EXPECT_FALSE(sample.root || sample.plain || sample.device || sample.info || sample.disk);
+  for (const TextRow& row : kTexts) {
+    for (const char* kind : row.kinds) {
+      EXPECT_EQ(TextOf(row.property, objects[kind].Get()), row.rules.noRecord) << kind << "." << row.name;
+    }
+  }
+  for (const auto& [kind, object] : objects) {
+    EXPECT_EQ(TextOf(&Read<&IZKUMUsbDevice::get_ToString>, object.Get()), "E_FAIL null") << kind;
+    EXPECT_EQ(NumberOf<&IZKUMUsbTreeNode::get_Type>(object.Get()), "E_INVALIDARG 1515870810") << kind;
+    EXPECT_EQ(NumberOf<&IZKUMUsbDevice::get_VendorId>(object.Get()), "E_POINTER 1515870810") << kind;
+    EXPECT_EQ(NumberOf<&IZKUMUsbDevice::get_ProductId>(object.Get()), "E_POINTER 1515870810") << kind;
+  }
+  for (const char* kind : {"info", "device"}) {
+    EXPECT_EQ(NumberOf<&IZKUMInfoDevice::get_ClassGuid>(objects[kind].Get()), "E_FAIL 0") << kind;
+  }
+  ComPtr<IEnumVARIANT> list;
+  EXPECT_EQ(objects["disk"].As<IZKUMInterfaceDevice>()->get_MountPoints(list.Put()), E_POINTER);
 }
 
 TEST_F(NodeObject, PortDeviceWithoutDeviceManagerNodeFailsItsPropertiesOnly) {

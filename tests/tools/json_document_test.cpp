@@ -3,9 +3,37 @@
 #include <sstream>
 
 #include "tests/tools/client.h"
+#include "tools/zkusb/commands.h"
 
 namespace zkusb {
 namespace {
+
+// The most that comes at once: what a document holds back is in memory beside what it is made of.
+struct Pieces final : std::stringbuf {
+  std::streamsize xsputn(const char* text, std::streamsize size) override {
+    largest = std::max(largest, size);
+    return std::stringbuf::xsputn(text, size);
+  }
+  std::streamsize largest = 0;
+};
+
+TEST(JsonDocument, ATreeOfAnySizeIsWrittenWhileItIsMade) {
+  NodeView root, controller, device;
+  root.Type = KUDTRoot;
+  controller.Type = KUDTHostController;
+  device.Type = KUDTPortDevice;
+  device.InstanceId = std::u16string(100, u'x');
+  controller.Childs.assign(200, device);
+  root.Childs.assign(3, controller);
+  Pieces pieces;
+  std::ostream stream(&pieces);
+  Writer writer(stream);
+  PrintTree(root, true, writer);
+  const Json json = Json::parse(pieces.str());
+  EXPECT_EQ(json["RootNode"]["Childs"].at(2)["Childs"].size(), 200u);
+  EXPECT_GT(pieces.str().size(), 1u << 18);
+  EXPECT_LT(pieces.largest, 1 << 10);
+}
 
 TEST(JsonDocument, IsWhatItWouldBeAsAWhole) {
   std::u16string text = u"\x1B\"\\\r\n\u202E";
@@ -16,7 +44,8 @@ TEST(JsonDocument, IsWhatItWouldBeAsAWhole) {
   expected["Inner"] = {{"List", {{{"x", 1}}, Json::object(), 5}}, {"Empty", Json::array()}};
   expected["Text"] = TextJson(text);
 
-  std::ostringstream stream;
+  Pieces pieces;
+  std::ostream stream(&pieces);
   Writer writer(stream);
   JsonDocument document("dump", writer);
   document.Members(facts);
@@ -34,12 +63,13 @@ TEST(JsonDocument, IsWhatItWouldBeAsAWhole) {
   document.End();
   document.Text("Text", text);
   document.Finish();
-  EXPECT_EQ(Json::parse(stream.str()), expected);
+  EXPECT_EQ(Json::parse(pieces.str()), expected);
+  EXPECT_LT(pieces.largest, 1 << 16);
   // Laid out alike, and nothing in it that a terminal would obey.
   expected.erase("Text");
   const std::string whole = expected.dump(2);
-  EXPECT_EQ(stream.str().substr(0, whole.size() - 2), whole.substr(0, whole.size() - 2));
-  EXPECT_NE(stream.str().find("\"Text\": \"\\u001b\\\"\\\\\\r\\n\\u202e"), std::string::npos);
+  EXPECT_EQ(pieces.str().substr(0, whole.size() - 2), whole.substr(0, whole.size() - 2));
+  EXPECT_NE(pieces.str().find("\"Text\": \"\\u001b\\\"\\\\\\r\\n\\u202e"), std::string::npos);
 }
 
 // The schema would be worth nothing if it took everything.

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <chrono>
 #include <sstream>
 
 #include "bench/small_pcs.h"
@@ -197,28 +199,49 @@ TEST(ForestNodes, DiskDriveRecordsAreCopiedAsFoundFirst) {
   EXPECT_EQ(ToText(forest), "a(d(e(f)) b(g)) h");
 }
 
-// A recursion anywhere would end in a stack overflow, a climb at each device in minutes.
+// Each device below the one before.
+Records ChainOf(platform::DevInst length, bool parentsFirst, bool disksOnly) {
+  Records records(length);
+  for (platform::DevInst i = 0; i < length; ++i) {
+    DeviceNodeRecord& record = records[parentsFirst ? i : length - 1 - i];
+    record.DevInst = i + 1;
+    record.ParentDevInst = i;
+    record.ClassName = disksOnly || i + 1 == length ? u"DiskDrive" : u"System";
+  }
+  return records;
+}
+
+// A recursion anywhere would end in a stack overflow.
 TEST(DeviceForest, ChainsAreLoopsHoweverLong) {
-  constexpr platform::DevInst kLength = 50'000;
+  constexpr platform::DevInst kLength = 200'000;
+  for (const bool disksOnly : {true, false}) {
+    Records forest = LinkDeviceForest(ChainOf(kLength, !disksOnly, disksOnly));
+    const auto root = MakeRecord<CZKUMUsbTreeRootImpl>();
+    AddForestNodes(forest, *root);
+    const Records disks = DiskDriveRecords(forest);
+    forest = disks;
+    std::size_t depth = 0;
+    for (const Records* level = &forest; !level->empty(); level = &level->front().Children) ++depth;
+    EXPECT_EQ(depth, disksOnly ? kLength : 1);
+    EXPECT_EQ(root->m_childs.size() + disks.size(), 1u);
+  }
+}
+
+// A climb at each device would take 1,600 times as long for forty times the length.
+TEST(DeviceForest, ChainsTakeTheirLengthAndNotItsSquare) {
   for (const bool parentsFirst : {true, false}) {
-    for (const bool disksOnly : {true, false}) {
-      Records records(kLength);
-      for (platform::DevInst i = 0; i < kLength; ++i) {
-        DeviceNodeRecord& record = records[parentsFirst ? i : kLength - 1 - i];
-        record.DevInst = i + 1;
-        record.ParentDevInst = i;
-        record.ClassName = disksOnly || i + 1 == kLength ? u"DiskDrive" : u"System";
+    const auto best = [&](platform::DevInst length) {
+      auto least = std::chrono::steady_clock::duration::max();
+      for (int i = 0; i < 3; ++i) {
+        Records records = ChainOf(length, parentsFirst, true);
+        const auto begun = std::chrono::steady_clock::now();
+        const Records forest = LinkDeviceForest(std::move(records));
+        least = std::min(least, std::chrono::steady_clock::now() - begun);
+        EXPECT_EQ(forest.size(), 1u);
       }
-      Records forest = LinkDeviceForest(std::move(records));
-      const auto root = MakeRecord<CZKUMUsbTreeRootImpl>();
-      AddForestNodes(forest, *root);
-      const Records disks = DiskDriveRecords(forest);
-      forest = disks;
-      std::size_t depth = 0;
-      for (const Records* level = &forest; !level->empty(); level = &level->front().Children) ++depth;
-      EXPECT_EQ(depth, disksOnly ? kLength : 1);
-      EXPECT_EQ(root->m_childs.size() + disks.size(), 1u);
-    }
+      return least;
+    };
+    EXPECT_LT(best(80'000), 400 * best(2'000)) << parentsFirst;
   }
 }
 

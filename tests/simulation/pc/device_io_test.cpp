@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <utility>
 
 #include "platform/storage_ioctl.h"
 #include "platform/usb_ioctl.h"
@@ -89,6 +90,14 @@ TEST_F(DeviceIoTest, WrongClosesAreRefusedAndRemembered) {
   EXPECT_EQ(pc.Misuses(),
             (std::vector<Text>{u"close of set devices as file", u"close of file \\\\.\\HCD0 as set",
                                u"second close of file \\\\.\\HCD0", u"close of what never was a handle, as file"}));
+  // Names are kept of the latest 4,096 handles, or each broadcast of a long run would take memory for good.
+  const FileHandle early = Open(u"\\\\.\\HCD0");
+  FileHandle late = early;
+  for (int i = 0; i < 4'096; ++i) EXPECT_TRUE(pc.CloseDevice(std::exchange(late, Open(u"\\\\.\\e:"))));
+  EXPECT_EQ(Error(pc.CloseDevice(early)), kERROR_INVALID_HANDLE);
+  EXPECT_EQ(pc.Misuses().back(), u"second close of what was closed long ago");
+  EXPECT_EQ(Error(pc.CloseDevice(early + 4)), kERROR_INVALID_HANDLE);
+  EXPECT_EQ(pc.Misuses().back(), u"second close of file \\\\.\\e:");
 }
 
 TEST_F(DeviceIoTest, NameRequestsAtEverySize) {
