@@ -20,13 +20,15 @@ constexpr std::uint32_t kWM_USER = 0x0400;
 // The window thread's work on a thread of the test, with what it returned.
 struct LoopRun {
   explicit LoopRun(MonitorProcess& process) {
-    process.Launch([this] {
-      WinApp app(platform::simulated::kProgramInstance, 1, u"", 2);
+    process.Launch([this, &process] {
+      WinApp app(process.desktop.GetModuleHandleW(nullptr), 1, u"", 2);
       result = app.RunMessageLoop();
+      windowsLeft = process.desktop.Counts().windows;
     });
     process.desktop.RunFor(0);
   }
   std::optional<platform::WParam> result;
+  std::size_t windowsLeft = 99;  // when the loop has returned and its thread has not
 };
 
 TEST(MessageWindow, IsHiddenTopLevelAndHasNoSize) {
@@ -40,15 +42,16 @@ TEST(MessageWindow, IsHiddenTopLevelAndHasNoSize) {
   EXPECT_EQ(fields.style, 3u);
   EXPECT_TRUE(fields.lpfnWndProc == StaticWndProc);
   EXPECT_TRUE(fields.cbClsExtra == 0 && fields.cbWndExtra == 0 && fields.hIcon == 0);
-  EXPECT_EQ(fields.hInstance, platform::simulated::kProgramInstance);
-  EXPECT_EQ(fields.hCursor, process.desktop.LoadCursorW(0, 32512));
-  EXPECT_EQ(fields.hbrBackground, process.desktop.GetStockObject(0));
+  // The handles as the simulation makes them: of the program, of the arrow, of the white brush.
+  EXPECT_EQ(fields.hInstance, 0x00400000);
+  EXPECT_EQ(fields.hCursor, 0x10000 + 32512);
+  EXPECT_EQ(fields.hbrBackground, 0x20000);
 
   const std::vector<WindowFacts> windows = process.desktop.Windows();
   ASSERT_EQ(windows.size(), 1u);
   EXPECT_TRUE(windows[0].className == u"MsgReceiver" && windows[0].title.empty());
   const platform::CREATESTRUCTW& creation = windows[0].creation;
-  EXPECT_EQ(creation.hInstance, platform::simulated::kProgramInstance);
+  EXPECT_EQ(creation.hInstance, 0x00400000);
   EXPECT_TRUE(creation.style == 0 && creation.dwExStyle == 0 && creation.x == 0 && creation.y == 0);
   EXPECT_TRUE(creation.cx == 0 && creation.cy == 0 && creation.hwndParent == 0 && creation.hMenu == 0);
   EXPECT_EQ(creation.lpCreateParams, nullptr);
@@ -78,7 +81,7 @@ TEST(MessageWindow, PumpsUntilTheQuitMessage) {
   process.desktop.SetDefaultProcedure({});
   EXPECT_EQ(run.result, 77u);
   EXPECT_EQ(seen, (std::vector<platform::WParam>{1, 2}));
-  EXPECT_EQ(process.desktop.Counts().windows, 0u);
+  EXPECT_EQ(run.windowsLeft, 0u);
 }
 
 TEST(MessageWindow, AnswersZeroForDeviceMessagesAndForExceptions) {
@@ -86,7 +89,9 @@ TEST(MessageWindow, AnswersZeroForDeviceMessagesAndForExceptions) {
   RecordingTarget target(process.desktop);
   CZKUMUsbEventReceiver receiver;
   ASSERT_TRUE(receiver.Start(&target));
-  const platform::WindowHandle window = process.desktop.Windows().at(0).handle;
+  const WindowFacts facts = process.desktop.Windows().at(0);
+  EXPECT_EQ(facts.creation.hInstance, 0x00400000) << "the receiver's own, too";
+  const platform::WindowHandle window = facts.handle;
   const DeviceBroadcast watched = NamedBroadcast(0, 5, kWatchedPath);
   process.desktop.SetDefaultProcedure([&](const platform::MSG& message) -> platform::LResult {
     if (message.message == kWM_USER && message.wParam == 0) throw WinAppException(u"text");

@@ -200,5 +200,20 @@ TEST(Merging, JoinsDeviceNodesToPortDevices) {
   EXPECT_EQ(identity(*rootHub.m_pParent), identity(*walker.m_building->m_childs.at(0)));
 }
 
+// Two devices on one hub whose parents are two nodes: the hub is given the identity of the last one's.
+TEST(Merging, EachDeviceNamesTheHubsAboveIt) {
+  Machine machine = BarePc();
+  for (const Plug& plug : {Gadget(u"A", 1), Gadget(u"B", 2)}) EXPECT_EQ(CarryOut(machine, plug), u"");
+  auto other = *std::ranges::find_if(machine.devices, [](const auto& each) { return each.id == kRootHubId; });
+  machine.devices.back().parent = other.id = Text(kRootHubId) + u"OTHER";
+  machine.devices.push_back(other);
+  SimulatedPc pc(machine);
+  CZKUMUsbTreeBuilder builder(pc);
+  ASSERT_TRUE(builder.Build());
+  ASSERT_EQ(ListsText(builder), "A B | A B | - | -");
+  const NodePtr device = builder.GetDeviceList(kConnectedList)->at(0);
+  EXPECT_EQ(device->m_pParent->m_pParent->m_strDevInstId, other.id);
+}
+
 }  // namespace
 }  // namespace KelvoUHW
