@@ -195,7 +195,7 @@ class Process {
       std::function<void(std::mt19937&)> body;
       std::mt19937 random;
     };
-    auto thread = std::make_unique<Thread>(std::move(body), std::mt19937(m_random()));
+    auto thread = std::make_unique<Thread>(Thread{std::move(body), std::mt19937(m_random())});
     const auto run = [](void* argument) {
       const std::unique_ptr<Thread> own(static_cast<Thread*>(argument));
       Check(SUCCEEDED(CoInitializeEx(nullptr, COINIT_MULTITHREADED)), "no apartment");

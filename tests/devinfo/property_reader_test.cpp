@@ -106,9 +106,10 @@ bool Read(ScriptedSets& sets, CZKUMInfoDeviceImpl& record) {
   DeviceAnswers answers(sets);
   ElementReader reader(sets, 1, answers);
   PassedElements none;
-  const bool accepted = ReadClass(reader, {}, record) & ReadService(reader, {}, record);
+  const bool class_accepted = ReadClass(reader, {}, record);
+  const bool service_accepted = ReadService(reader, {}, record);  // read in either case
   ReadOtherProperties(reader, {}, none, record);
-  return accepted;
+  return class_accepted && service_accepted;
 }
 
 TEST(InfoDeviceProperties, FillTheirFields) {

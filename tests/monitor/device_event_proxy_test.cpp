@@ -278,7 +278,7 @@ TEST(SinkSlots, EachCallWaitsForTheLock) {
   for (const auto& [what, call] : kCalls) {
     std::atomic<bool> done = false;
     lock.lock();
-    std::thread caller([&] {
+    std::thread caller([&done, &call = call] {
       call();
       done = true;
     });

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <map>
 #include <set>
-#include <sstream>
+#include <string_view>
 
 #include "platform/wrappers/intercepting_host.h"
 #include "tests/support/desk_pc.h"
@@ -61,27 +61,33 @@ const Machine& FullPc() {
 
 // The parts of a text in alphabetical order: records that were away stand last for a while, and the
 // number of a child is its place.
-std::string Sorted(const std::string& text, char separator) {
-  std::multiset<std::string> parts;
-  std::istringstream stream(text);
-  for (std::string part; std::getline(stream, part, separator);) parts.insert(part + separator);
-  std::string sorted;
-  for (const std::string& part : parts) sorted += part.starts_with("child ") ? "" : part;
+template <class String>
+String Sorted(const String& text, typename String::value_type separator) {
+  using View = std::basic_string_view<typename String::value_type>;
+  std::vector<View> parts;
+  for (View rest = text; !rest.empty(); rest.remove_prefix(parts.back().size()))
+    parts.push_back(rest.substr(0, std::min(rest.find(separator), rest.size() - 1) + 1));
+  std::ranges::sort(parts);
+  String sorted;
+  for (const View part : parts)
+    if (!std::ranges::equal(part.substr(0, 6), std::string_view("child "))) sorted += part;
   return sorted;
 }
 
 // What a builder shows when something happens: the lists, and the dumps of the tree and of the
 // current device records.
 struct Shown {
-  std::string lists, dumps;
+  std::string lists;
+  std::u16string dumps;
   friend bool operator==(const Shown&, const Shown&) = default;
 };
 Shown NextEvent(FaultyDesk& desk) {
   desk.Do({Gadget(u"NEXT", 4)});
-  Shown shown{desk.builder.Build() ? "" : "nothing new\n", ""};
-  for (const DeviceList& list : desk.Lists()) shown.lists += Sorted(ShortNames(list), ' ') + "\n";
-  std::string dump = desk.builder.Root() ? DumpOf(*desk.builder.Root()) : "";
-  for (const InfoDevicePtr& record : desk.builder.DeviceInfo().Current()) dump += DumpOf(*record);
+  Shown shown{desk.builder.Build() ? "" : "nothing new\n", u""};
+  for (const DeviceList& list : desk.Lists()) shown.lists += Sorted(ShortNames(list) + " ", ' ') + "\n";
+  std::u16string dump;
+  if (const NodePtr root = desk.builder.Root()) root->ToString(dump, u"");
+  for (const InfoDevicePtr& record : desk.builder.DeviceInfo().Current()) record->ToString(dump, u"");
   shown.dumps = Sorted(dump, '\n');
   desk.builder.CommitDeviceCache();
   return shown;
