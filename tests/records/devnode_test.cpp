@@ -7,8 +7,10 @@
 #include <optional>
 #include <vector>
 
+#include "platform/text.h"
 #include "platform/wrappers/intercepting_host.h"
 #include "simulation/pc/simulated_pc.h"
+#include "tests/support/best_time.h"
 
 namespace KelvoUHW {
 namespace {
@@ -190,6 +192,24 @@ TEST(DriverKey, AWalkThatBreaksOffIsNotKept) {
   DriverKeyIndex index(manager);
   for (int i = 0; i < 1000; ++i) EXPECT_EQ(index.Find(u"\u00C4\\4") * 10 + index.Find(u"twice"), 40u);
   EXPECT_EQ(manager.walks, 300);
+}
+
+// Nearly all keys have one class: looking through all of them for each would take 1,600 times as long for forty times
+// the nodes.
+TEST(DriverKey, OneClassForAllNodesTakesNoLonger) {
+  const auto time = [](DevInst count) {
+    ScriptedManager manager;
+    for (DevInst i = 2; i < count; ++i) {
+      manager.nodes[i] = {
+          .parent = 1,
+          .sibling = i + 1 < count ? Link(i + 1) : Link(),
+          .driver = u"{36fc9e60-c465-11cf-8056-444553540000}\\" + platform::Decimal(static_cast<int>(i))};
+    }
+    manager.nodes[1].child = 2;
+    const std::u16string last = *manager.nodes[count - 1].driver;
+    return testing_support::BestOfThree([&] { EXPECT_EQ(DriverKeyIndex(manager).Find(last), count - 1); });
+  };
+  EXPECT_LT(time(4'000), 400 * time(100));
 }
 
 // Each node has a child that nobody has seen.

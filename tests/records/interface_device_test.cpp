@@ -3,6 +3,12 @@
 
 #include <gtest/gtest.h>
 
+#include <cstring>
+#include <tuple>
+
+#include "platform/wrappers/intercepting_host.h"
+#include "records/device_set.h"
+#include "simulation/pc/simulated_pc.h"
 #include "tests/support/outline.h"
 
 namespace KelvoUHW {
@@ -40,6 +46,41 @@ TEST(InterfaceDevice, DumpsWhatItHas) {
   std::u16string dump = u"before|\r\n";
   volume.ToString(dump, u"> ");
   EXPECT_EQ(platform::ToUtf8(dump), Golden("interface-device"));
+}
+
+// Tells a path that takes so many bytes with what stands before it.
+struct LongPaths final : platform::wrappers::InterceptingHost {
+  using InterceptingHost::InterceptingHost;
+  platform::Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
+  platform::Status GetDeviceInterfaceDetail(platform::DeviceSetHandle, const platform::SP_DEVICE_INTERFACE_DATA&,
+                                            void* detail, std::uint32_t bytes, std::uint32_t* required,
+                                            platform::SP_DEVINFO_DATA*) noexcept override {
+    ++calls;
+    *required = needed;
+    if (bytes < needed) return platform::Status::Failure(platform::kERROR_INSUFFICIENT_BUFFER);
+    for (std::uint32_t at = platform::kInterfaceDetailPathOffset; at < needed; at += sizeof(char16_t)) {
+      const char16_t unit = at + sizeof unit < needed ? u'x' : u'\0';
+      std::memcpy(static_cast<char*>(detail) + at, &unit, sizeof unit);
+    }
+    return platform::Status::Success();
+  }
+  std::uint32_t needed = 0, calls = 0;
+};
+
+TEST(InterfaceDetail, IsAskedForAgainWhereThePathIsLong) {
+  platform::simulated::SimulatedPc pc{platform::simulated::Machine()};
+  constexpr std::uint32_t kMost = 1 << 17;
+  const std::tuple<std::uint32_t, std::uint32_t, bool> cases[] = {
+      {6, 1, true}, {1024, 1, true}, {1026, 2, true}, {kMost, 2, true}, {kMost + 2, 1, false}};
+  for (const auto& [needed, calls, told] : cases) {
+    LongPaths host(pc);
+    host.needed = needed;
+    platform::Status status;
+    const InterfaceDetail detail = ReadInterfaceDetail(host, 1, {}, nullptr, status);
+    EXPECT_EQ(detail.DevicePath(), std::u16string(told ? needed / 2 - 3 : 0, u'x')) << needed;
+    EXPECT_EQ(host.calls, calls) << needed;
+    EXPECT_EQ(static_cast<bool>(status), told) << needed;
+  }
 }
 
 }  // namespace

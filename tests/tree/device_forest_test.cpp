@@ -2,13 +2,12 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
-#include <chrono>
 #include <sstream>
 
 #include "bench/small_pcs.h"
 #include "platform/wrappers/failing_host.h"
 #include "simulation/pc/simulated_pc.h"
+#include "tests/support/best_time.h"
 #include "tests/support/outline.h"
 
 namespace KelvoUHW {
@@ -230,18 +229,11 @@ TEST(DeviceForest, ChainsAreLoopsHoweverLong) {
 // A climb at each device would take 1,600 times as long for forty times the length.
 TEST(DeviceForest, ChainsTakeTheirLengthAndNotItsSquare) {
   for (const bool parentsFirst : {true, false}) {
-    const auto best = [&](platform::DevInst length) {
-      auto least = std::chrono::steady_clock::duration::max();
-      for (int i = 0; i < 3; ++i) {
-        Records records = ChainOf(length, parentsFirst, true);
-        const auto begun = std::chrono::steady_clock::now();
-        const Records forest = LinkDeviceForest(std::move(records));
-        least = std::min(least, std::chrono::steady_clock::now() - begun);
-        EXPECT_EQ(forest.size(), 1u);
-      }
-      return least;
+    const auto time = [&](platform::DevInst length) {
+      return testing_support::BestOfThree(
+          [&] { EXPECT_EQ(LinkDeviceForest(ChainOf(length, parentsFirst, true)).size(), 1u); });
     };
-    EXPECT_LT(best(80'000), 400 * best(2'000)) << parentsFirst;
+    EXPECT_LT(time(80'000), 400 * time(2'000)) << parentsFirst;
   }
 }
 
