@@ -1,5 +1,5 @@
 // Watcher: the PC's USB devices and their events for a C++ program, C++11 and later, that need not know what an
-// apartment is; link ole32, oleaut32 and uuid. A program with a window uses this alone.
+// apartment is; link ole32, oleaut32, user32 and uuid. A program with a window uses this alone.
 #ifndef ZKUSB_MONITOR_WATCHER_H
 #define ZKUSB_MONITOR_WATCHER_H
 

@@ -129,7 +129,7 @@ def road(measured):
     rows = [[sinks, *(one(measured[f"RealTime/{sinks}"][part]) for part in parts)]
             for sinks in [1, 10, 100]]
     return table(["sinks", "broadcast to build", "build to first sink", "first to last sink",
-                  "whole road"], rows)
+                  "whole path"], rows)
 
 
 def plot(path, title, least, most, lines):
