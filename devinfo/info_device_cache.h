@@ -31,7 +31,8 @@ const platform::Guid* DeviceClassByName(std::u16string_view name) noexcept;
 // One thread at a time. Exceptions: std::bad_alloc only.
 class InfoDeviceCache {
  public:
-  // `answers` is what the running build has been told; whoever starts a pass makes it forget.
+  // `answers` keeps what the system answered during the running build; whoever starts a pass
+  // empties it.
   InfoDeviceCache(platform::DeviceSets& sets, DeviceAnswers& answers) noexcept
       : m_sets(sets), m_answers(answers) {}
 

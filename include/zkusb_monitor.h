@@ -1,16 +1,16 @@
 // The interfaces of ZKUsbMonitor for C++ programs, C++11 and later. Made from zkusb_monitor.idl: do not edit.
 //
 // Rules that hold for every method unless its comment says otherwise:
-// - The result is an HRESULT; a failed call brings nothing to release.
-// - An out pointer that is null is answered with E_POINTER (some numbers: E_INVALIDARG).
-// - A BSTR is the caller's to free with SysFreeString, an interface the caller's to release.
-// - Text properties answer E_OUTOFMEMORY when memory runs out, or raise it as an exception that
-//   derives from std::exception.
+// - The result is an HRESULT; a failed call returns nothing to release.
+// - A null out pointer gives E_POINTER (for some numbers: E_INVALIDARG).
+// - The caller frees a BSTR with SysFreeString, and releases an interface.
+// - Text properties return E_OUTOFMEMORY when memory runs out, or throw an exception that derives
+//   from std::exception.
 // - Nodes are snapshots: a node answers from the tree it was taken from, also after that tree has
 //   been replaced by a newer one.
-// - Call from the multithreaded apartment. Three methods carry no parameter directions
-//   (InSubtreeDevicesOfType, FirstChildOfType, PortDevicesWithVolume): through a proxy they answer
-//   S_OK and bring nothing.
+// - Call from the multithreaded apartment. The type library gives no parameter directions for three
+//   methods (InSubtreeDevicesOfType, FirstChildOfType, PortDevicesWithVolume): through a proxy they
+//   return S_OK but no result.
 
 // clang-format off
 #ifndef ZKUSB_MONITOR_H

@@ -1,4 +1,4 @@
-// What must not be told of a PC.
+// Removes what identifies a person or an installation from a recorded PC.
 #pragma once
 
 #include <optional>
@@ -55,7 +55,7 @@ class Anonymiser {
   void ReplaceFolders(Text& path);
   std::uint32_t SerialOf(std::uint32_t volumeSerial);
 
-  Replacements m_texts;                // wherever they stand
+  Replacements m_texts;                // wherever they occur
   Replacements m_instances;            // too short for that: where an id or a path has its instance
   Replacements m_names;                // words of names
   Replacements m_folders;              // single names of folders

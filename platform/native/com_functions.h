@@ -37,8 +37,9 @@ HRESULT CoCreateInstance(REFCLSID clsid, IUnknown* outer, DWORD context, REFIID 
 HRESULT CoRegisterClassObject(REFCLSID clsid, IUnknown* classObject, DWORD context, DWORD flags,
                               DWORD* cookie) noexcept;
 HRESULT CoRevokeClassObject(DWORD cookie) noexcept;
-// Unloads the libraries that answer DllCanUnloadNow with S_OK and that nobody is just asking for a
-// class. Not while another thread may still be inside the release of a library's last object.
+// Unloads the libraries that answer DllCanUnloadNow with S_OK and are not being asked for a class
+// at that moment. Not while another thread may still be inside the release of a library's last
+// object.
 void CoFreeUnusedLibraries() noexcept;
 // The class of a program identifier such as "KelvoUsbMonitor.UsbTree", from the registry of the
 // current system. CO_E_CLASSSTRING when there is none.

@@ -1,5 +1,5 @@
-// A PC in the system's own ABI: functions that stand in a module's import table before those of
-// SetupAPI, the configuration manager, files, volumes and device notifications, and answer out of a
+// A PC in the system's own ABI: functions that replace, in a module's import table, those of
+// SetupAPI, the configuration manager, files, volumes and device notifications. They answer from a
 // machine file.
 //
 // Layouts and codes come from the SDK's headers, or from numbers written beside them, and never
@@ -27,11 +27,11 @@ using Machine = platform::simulated::Machine;
 
 // Another PC, with nothing open and nothing counted.
 void Begin(const Machine& machine);
-// The same PC has changed. What was opened of a device that went answers no more.
+// The same PC has changed. Handles to a removed device fail from then on.
 void Change(const Machine& machine);
 
-// Puts the functions into the module's import table. What the module imports of SetupAPI, the
-// configuration manager and volumes, and is not known here, is a breach.
+// Puts the functions into the module's import table. A function of SetupAPI, the configuration
+// manager or volumes that the module imports and that is not known here is a breach.
 void Attach(HMODULE module);
 // Puts one function there; whether the module imports it.
 bool Replace(HMODULE module, const std::string& function, void* with);

@@ -1,6 +1,6 @@
 // A registry in memory that answers the registry calls (platform/registry.h) as the system would.
-// Beside it in this room are the rest of what a process has for registration: type libraries, and
-// what a module knows about itself.
+// The other files of this room have the rest of what registration needs from a process: type
+// libraries, and what a module knows about itself.
 #pragma once
 
 #include <cstddef>
@@ -16,9 +16,9 @@
 
 namespace platform::simulated {
 
-// HKEY_CLASSES_ROOT alone, empty at the start. As strict as the system: what a handle may do was
-// settled when it was opened, a key with subkeys cannot be deleted, and a deleted key answers no
-// more. Handles are handed out once and never again. Thread-safe.
+// HKEY_CLASSES_ROOT alone, empty at the start. As strict as the system: the access of a handle is
+// fixed when it is opened, a key with subkeys cannot be deleted, and calls on a deleted key fail.
+// The value of a handle is never used again. Thread-safe.
 class SimulatedRegistry final : public Registry {
  public:
   SimulatedRegistry();

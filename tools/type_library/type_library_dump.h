@@ -4,7 +4,7 @@
 
 #include <string>
 
-// The library of a file (its own or that of a module), a line for itself and for each type,
-// function, value and interface in it, in UTF-8. Throws std::runtime_error where there is none or
-// it does not answer.
+// The library in the file `path`, a type library or a module that contains one: a line for the
+// library and for each type, function, value and interface in it, in UTF-8. Throws
+// std::runtime_error when there is none or it cannot be read.
 std::string DumpTypeLibrary(const std::u16string& path);

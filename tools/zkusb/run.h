@@ -11,7 +11,7 @@ namespace zkusb {
 
 enum ExitCode : int {
   kDone = 0,          // did what was asked
-  kNothingFound = 1,  // what was not found is said on `err`
+  kNothingFound = 1,  // `err` names what was not found
   kRefused = 2,  // wrong usage, a bad file, output that cannot be written; the reason is on `err`
 };
 
