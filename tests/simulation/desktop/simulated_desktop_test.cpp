@@ -215,6 +215,33 @@ TEST_F(SimulatedDesktopTest, DeliversDeviceMessagesAsTheSystemDoes) {
   EXPECT_EQ(desktop.Counts(), (DesktopCounts{1, 1, 3, 2, 0}));
 }
 
+TEST_F(SimulatedDesktopTest, HandlesAndTextsAreOfWhatIsAskedFor) {
+  SimulatedDesktop process;
+  const std::pair<GraphicsHandle, GraphicsHandle> handles[] = {{process.LoadCursorW(0, kIDC_ARROW), 0x17F00},
+                                                               {process.LoadCursorW(0, kIDC_ARROW + 1), 0x17F01},
+                                                               {process.LoadCursorW(0, kIDC_ARROW - 1), 0},
+                                                               {process.LoadCursorW(1, kIDC_ARROW), 0},
+                                                               {process.GetStockObject(0), 0x20000},
+                                                               {process.GetStockObject(5), 0x20005},
+                                                               {process.GetStockObject(-1), 0},
+                                                               {process.GetModuleHandleW(nullptr), 0x00400000},
+                                                               {process.GetModuleHandleW(u"other"), 0}};
+  for (const auto& [handle, expected] : handles) EXPECT_EQ(handle, expected);
+  constexpr std::uint32_t kFlags = kFORMAT_MESSAGE_ALLOCATE_BUFFER | kFORMAT_MESSAGE_FROM_SYSTEM;
+  const std::tuple<std::uint32_t, std::uint32_t, std::uint32_t, std::u16string> texts[] = {
+      {kFlags, 5, kLANG_USER_DEFAULT, u"Access is denied.\r\n"},
+      {kFORMAT_MESSAGE_FROM_SYSTEM, 5, kLANG_USER_DEFAULT, u""},
+      {kFlags, 5, 0x409, u""},
+      {kFlags, 0xDEAD, kLANG_USER_DEFAULT, u""}};
+  for (const auto& [flags, code, language, expected] : texts) {
+    char16_t* text = nullptr;
+    EXPECT_EQ(process.FormatMessageW(flags, code, language, text), expected.size());
+    EXPECT_EQ(text == nullptr ? std::u16string() : text, expected);
+    process.LocalFree(text);
+  }
+  EXPECT_THAT(process.Misuses(), IsEmpty());
+}
+
 // Whatever a thread waits for, the end of the process ends the wait and then the thread.
 TEST_F(SimulatedDesktopTest, EndsItsThreadsWhereverTheyWait) {
   for (const ClockMode mode : {ClockMode::Virtual, ClockMode::Real}) {

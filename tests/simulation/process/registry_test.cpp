@@ -130,6 +130,8 @@ TEST(SimulatedRegistry, GivesEachHandleOnlyWhatItWasOpenedFor) {
   EXPECT_TRUE(registry.EnumKey(reader, 0, name, chars));
   EXPECT_EQ(std::u16string(name, chars + 1), std::u16string(u"Sub\0", 4));
   EXPECT_EQ(Code(registry.EnumKey(reader, 1, name, chars)), kERROR_NO_MORE_ITEMS);
+  EXPECT_THAT(registry.OpenKeys(), testing::UnorderedElementsAre(u"HKEY_CLASSES_ROOT\\Key", u"HKEY_CLASSES_ROOT\\Key",
+                                                                 u"HKEY_CLASSES_ROOT\\Key\\Sub"));
   for (const RegistryKeyHandle key : {reader, writer, gone}) EXPECT_TRUE(registry.CloseKey(key));
   EXPECT_EQ(Code(registry.CloseKey(gone)), kERROR_INVALID_HANDLE);
   EXPECT_EQ(Code(registry.CloseKey(0x1000)), kERROR_INVALID_HANDLE);
