@@ -9,9 +9,10 @@ namespace KelvoUHW {
 
 void DeviceAnswers::Forget() noexcept {
   m_index = {};
-  m_nodes = {};
-  m_properties = {};
-  m_texts = {};
+  // Neither clear() nor an assigned {} would give memory back.
+  std::vector<Node>().swap(m_nodes);
+  std::vector<Property>().swap(m_properties);
+  std::u16string().swap(m_texts);
 }
 
 const DeviceAnswers::Node* DeviceAnswers::Find(platform::DevInst node) const noexcept {

@@ -66,7 +66,7 @@ InterfaceDetail ReadShortDetail(platform::DeviceSets& sets, platform::DeviceSetH
     return {};
   }
   bytes.resize(required);
-  return InterfaceDetail(std::move(bytes));
+  return InterfaceDetail(bytes);
 }
 
 }  // namespace

@@ -4,6 +4,7 @@
 #include <array>
 #include <cstddef>
 #include <cstring>
+#include <span>
 #include <utility>
 
 #include "platform/setup_api.h"
@@ -31,13 +32,14 @@ platform::Status ReadDescriptor(platform::DeviceIo& io, CZKUMInterfaceDeviceImpl
   const platform::STORAGE_PROPERTY_QUERY query{};
   const platform::FileHandle device =
       record.DeviceHandle ? record.DeviceHandle->Get() : platform::kInvalidHandle;
+  std::array<std::uint8_t, kStorageDescriptorBytes> answer{};
   std::uint32_t received = 0;
   const platform::Status status =
       io.DeviceControl(device, platform::kIOCTL_STORAGE_QUERY_PROPERTY, &query, sizeof query,
-                       record.Descriptor.data(), kStorageDescriptorBytes, received);
-  record.DescriptorLength = std::min<std::uint32_t>(received, kStorageDescriptorBytes);
-  std::fill(record.Descriptor.begin() + record.DescriptorLength, record.Descriptor.end(),
-            std::uint8_t{0});
+                       answer.data(), kStorageDescriptorBytes, received);
+  const std::span whole(answer);
+  const std::span kept = whole.first(std::min<std::size_t>(received, whole.size()));
+  record.Descriptor.assign(kept.begin(), kept.end());
   return status;
 }
 
@@ -45,7 +47,7 @@ platform::Status ReadDescriptor(platform::DeviceIo& io, CZKUMInterfaceDeviceImpl
 void AppendDescriptorText(const CZKUMInterfaceDeviceImpl& record, std::uint32_t offset,
                           std::u16string& text) {
   if (offset == 0) return;
-  for (std::size_t i = offset; i < record.DescriptorLength && record.Descriptor[i] != 0; ++i) {
+  for (std::size_t i = offset; i < record.Descriptor.size() && record.Descriptor[i] != 0; ++i) {
     text += static_cast<char16_t>(record.Descriptor[i]);
   }
 }

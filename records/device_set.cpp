@@ -16,13 +16,14 @@ constexpr std::uint32_t kFirstDetailBytes = 1024;
 
 }  // namespace
 
-std::u16string InterfaceDetail::DevicePath() const {
-  if (m_bytes.size() <= platform::kInterfaceDetailPathOffset) return {};
-  const std::size_t bytes = m_bytes.size() - platform::kInterfaceDetailPathOffset;
-  std::u16string path(bytes / sizeof(char16_t), u'\0');
-  std::memcpy(path.data(), m_bytes.data() + platform::kInterfaceDetailPathOffset,
-              path.size() * sizeof(char16_t));
-  return std::u16string(platform::UpToZero(path));
+InterfaceDetail::InterfaceDetail(const std::vector<std::uint8_t>& bytes)
+    : m_received(!bytes.empty()) {
+  if (bytes.size() <= platform::kInterfaceDetailPathOffset) return;
+  std::u16string rest((bytes.size() - platform::kInterfaceDetailPathOffset) / sizeof(char16_t),
+                      u'\0');
+  std::memcpy(rest.data(), bytes.data() + platform::kInterfaceDetailPathOffset,
+              rest.size() * sizeof(char16_t));
+  m_path = platform::UpToZero(rest);
 }
 
 InterfaceDetail ReadInterfaceDetail(platform::DeviceSets& sets, platform::DeviceSetHandle set,
@@ -47,7 +48,7 @@ InterfaceDetail ReadInterfaceDetail(platform::DeviceSets& sets, platform::Device
   }
   if (!status) return {};
   bytes.resize(std::min<std::size_t>(required, bytes.size()));
-  return InterfaceDetail(std::move(bytes));
+  return InterfaceDetail(bytes);
 }
 
 InterfaceDetail GetInterfaceDetail(platform::DeviceSets& sets, platform::DebugOutput& debug,

@@ -122,14 +122,16 @@ class MountPointSearch {
 class InterfaceDetail {
  public:
   InterfaceDetail() = default;
-  explicit InterfaceDetail(std::vector<std::uint8_t> bytes) noexcept : m_bytes(std::move(bytes)) {}
+  // The record as it was received. Only the path is kept.
+  explicit InterfaceDetail(const std::vector<std::uint8_t>& bytes);
 
   // The path, or an empty text where there is no detail.
-  std::u16string DevicePath() const;
-  explicit operator bool() const noexcept { return !m_bytes.empty(); }
+  const std::u16string& DevicePath() const noexcept { return m_path; }
+  explicit operator bool() const noexcept { return m_received; }
 
  private:
-  std::vector<std::uint8_t> m_bytes;
+  std::u16string m_path;
+  bool m_received = false;
 };
 
 // Reads the detail of an interface, a second time where it is longer than most. `device` (may be

@@ -1,6 +1,7 @@
 #include "records/interface_device.h"
 
 #include <algorithm>
+#include <array>
 #include <cstring>
 
 #include "platform/text.h"
@@ -43,8 +44,10 @@ CZKUMInterfaceDeviceImpl::CZKUMInterfaceDeviceImpl() noexcept
 }
 
 platform::STORAGE_DEVICE_DESCRIPTOR CZKUMInterfaceDeviceImpl::DescriptorHeader() const noexcept {
-  platform::STORAGE_DEVICE_DESCRIPTOR header;
-  std::memcpy(&header, Descriptor.data(), sizeof header);
+  platform::STORAGE_DEVICE_DESCRIPTOR header{};
+  if (!Descriptor.empty()) {
+    std::memcpy(&header, Descriptor.data(), std::min(sizeof header, Descriptor.size()));
+  }
   return header;
 }
 

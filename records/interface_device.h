@@ -1,7 +1,6 @@
 // The record of a volume or of a disk that no volume names.
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -31,10 +30,10 @@ class CZKUMInterfaceDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   void OwnLines(std::u16string& out, const std::u16string& indent) const override;
 
   // The path of the device interface; empty without a detail.
-  std::u16string DevicePath() const { return Detail.DevicePath(); }
+  const std::u16string& DevicePath() const noexcept { return Detail.DevicePath(); }
   // The first of the mount points; empty when there is none.
   std::u16string MountPoint() const { return MountPoints.empty() ? u"" : MountPoints.front(); }
-  // The fixed part of the descriptor; zero where nothing was received.
+  // The fixed part of the descriptor; zero as far as nothing was received.
   platform::STORAGE_DEVICE_DESCRIPTOR DescriptorHeader() const noexcept;
 
   // Drive roots such as E:\ and folders with a backslash at their end.
@@ -49,9 +48,9 @@ class CZKUMInterfaceDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   std::u16string MediaSerialNumber;
   std::uint32_t VolumeSerialNumber = kUnknownVolumeSerialNumber;
   std::u16string VolumeName;  // \\?\Volume{...}\, empty for a disk
-  // A STORAGE_DEVICE_DESCRIPTOR and its texts: DescriptorLength bytes as received, zeros behind.
-  std::array<std::uint8_t, kStorageDescriptorBytes> Descriptor{};
-  std::uint32_t DescriptorLength = 0;  // in bytes, at most kStorageDescriptorBytes
+  // A STORAGE_DEVICE_DESCRIPTOR and its texts as received, at most kStorageDescriptorBytes; empty
+  // for a disk.
+  std::vector<std::uint8_t> Descriptor;
   // The opened device path while it is being queried.
   std::optional<DeviceFile> DeviceHandle;
 

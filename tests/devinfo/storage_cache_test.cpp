@@ -162,7 +162,7 @@ TEST_F(StorageCacheTest, ReportsWhenTheVolumesDiffer) {
   EXPECT_FALSE(Pass());
   EXPECT_EQ(Ids(cache->Volumes()), (Texts{StickVolumeId(1), u"USBSTOR\\SLOT", u"IDE\\DISK"}));
   EXPECT_EQ(Volume(1).MountPoints, Texts{u"F:\\"});
-  EXPECT_EQ(std::tuple(Volume(1).m_strDeviceDescr, Volume(1).DescriptorLength), std::tuple(u"", 0u));
+  EXPECT_EQ(std::tuple(Volume(1).m_strDeviceDescr, Volume(1).Descriptor.size()), std::tuple(u"", 0u));
   EXPECT_EQ(Volume(2).MountPoints, Texts{});
   EXPECT_TRUE(change({}, 2));
   EXPECT_TRUE(change({2}, 3));  // as many as before, but another

@@ -90,7 +90,7 @@ TEST_F(StorageQuery, TextsOfTheDescriptor) {
                   fresh.m_strSerialNumber,
               texts);
     EXPECT_EQ(fresh.m_strDeviceDescr, StorageDeviceTypeName(type));
-    EXPECT_EQ(fresh.DescriptorLength, std::min(answer.returned, 512u));
+    EXPECT_EQ(fresh.Descriptor.size(), std::min(answer.returned, 512u));
     EXPECT_EQ(diagnostics, kErrorLine + kNotSupported);
   }
 }

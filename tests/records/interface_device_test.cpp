@@ -39,9 +39,7 @@ TEST(InterfaceDevice, DumpsWhatItHas) {
   volume.MediaSerialNumber = u"M-1";
   volume.VolumeSerialNumber = 0x80000000;
   volume.VolumeName = u"\\\\?\\Volume{1}\\";
-  volume.Descriptor[8] = 0x1F;
-  volume.Descriptor[9] = 0xAB;
-  volume.Descriptor[10] = 2;
+  volume.Descriptor = {0, 0, 0, 0, 0, 0, 0, 0, 0x1F, 0xAB, 2};
   EXPECT_EQ(volume.MountPoint(), u"E:\\");
   std::u16string dump = u"before|\r\n";
   volume.ToString(dump, u"> ");
