@@ -50,7 +50,8 @@ class InfoDeviceProperties : public Bases..., public IZKUMInfoDevice {
   const CZKUMInfoDeviceImpl* Record() const noexcept {
     return static_cast<const Derived*>(this)->InfoRecord();
   }
-  HRESULT Text(BSTR* pVal, std::u16string CZKUMInfoDeviceImpl::*field) const {
+  template <class AnyText>
+  HRESULT Text(BSTR* pVal, AnyText CZKUMInfoDeviceImpl::*field) const {
     if (pVal) *pVal = nullptr;
     const RecordReadLock lock;
     const CZKUMInfoDeviceImpl* record = Record();

@@ -133,7 +133,7 @@ bool ReadClass(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
                CZKUMInfoDeviceImpl& record) {
   PropertyAnswer answer;
   record.DevClass.clear();
-  if (reader.Read(element, platform::kSPDRP_CLASS, answer)) record.DevClass = TextOf(answer);
+  if (reader.Read(element, platform::kSPDRP_CLASS, answer)) record.DevClass = reader.Texts().Of(TextOf(answer));
   return !IsExcludedClass(record.DevClass);
 }
 
@@ -141,7 +141,7 @@ bool ReadService(ElementReader& reader, const platform::SP_DEVINFO_DATA& element
                  CZKUMInfoDeviceImpl& record) {
   PropertyAnswer answer;
   record.Service.clear();
-  if (reader.Read(element, platform::kSPDRP_SERVICE, answer)) record.Service = TextOf(answer);
+  if (reader.Read(element, platform::kSPDRP_SERVICE, answer)) record.Service = reader.Texts().Of(TextOf(answer));
   return !IsExcludedService(record.Service);
 }
 
@@ -184,24 +184,27 @@ void ReadOtherProperties(ElementReader& reader, const platform::SP_DEVINFO_DATA&
   const auto readText = [&](std::uint32_t property, std::u16string& field) {
     if (read(property)) field = TextOf(answer);
   };
+  const auto readShared = [&](std::uint32_t property, SharedText& field) {
+    if (read(property)) field = reader.Texts().Of(TextOf(answer));
+  };
   const auto readType = [&](std::uint32_t property, std::int32_t& field) {
     if (read(property)) field = static_cast<std::int32_t>(answer.type);
   };
 
   readText(platform::kSPDRP_DEVICEDESC, record.m_strDeviceDescr);
   if (read(platform::kSPDRP_CLASSGUID)) {
-    record.ClassGuidText = TextOf(answer);
+    record.ClassGuidText = reader.Texts().Of(TextOf(answer));
     record.ClassGuid = ParseGuidText(record.ClassGuidText.c_str());
   }
   readText(platform::kSPDRP_DRIVER, record.m_strDriverKeyName);
   readText(platform::kSPDRP_FRIENDLYNAME, record.FriendlyName);
   readText(platform::kSPDRP_LOCATION_INFORMATION, record.Location);
-  readText(platform::kSPDRP_MFG, record.Manufacturer);
+  readShared(platform::kSPDRP_MFG, record.Manufacturer);
   readType(platform::kSPDRP_LEGACYBUSTYPE, record.LegacyBusType);
   readText(platform::kSPDRP_HARDWAREID, record.HardwareId);
   readText(platform::kSPDRP_PHYSICAL_DEVICE_OBJECT_NAME, record.PhysicalName);
   readType(platform::kSPDRP_UI_NUMBER, record.UiNumber);
-  readText(platform::kSPDRP_ENUMERATOR_NAME, record.EnumName);
+  readShared(platform::kSPDRP_ENUMERATOR_NAME, record.EnumName);
 }
 
 }  // namespace KelvoUHW

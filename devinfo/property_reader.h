@@ -79,6 +79,8 @@ class ElementReader {
   std::u16string InstanceId(const platform::SP_DEVINFO_DATA& element) const {
     return GetInstanceId(m_sets, m_set, element);
   }
+  // For texts that many elements have alike.
+  SharedTexts& Texts() noexcept { return m_texts; }
 
  private:
   platform::Status Ask(const platform::SP_DEVINFO_DATA& element, std::uint32_t property,
@@ -88,6 +90,7 @@ class ElementReader {
   platform::DeviceSetHandle m_set;
   DeviceAnswers& m_answers;
   PropertyBuffer m_buffer;
+  SharedTexts m_texts;
   std::size_t m_failures = 0;
 };
 

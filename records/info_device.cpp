@@ -38,11 +38,11 @@ CZKUMInfoDeviceImpl::CZKUMInfoDeviceImpl() : CZKUMUsbTreeNodeImpl(KUDTInfoDevice
 void CZKUMInfoDeviceImpl::Reset() {
   SetSerialNumber({});
   SetInstanceId({});
-  for (std::u16string* text : {&m_strDeviceDescr, &DevClass, &ClassGuidText, &m_strDriverKeyName,
-                               &FriendlyName, &Manufacturer, &HardwareId, &PhysicalName, &Service,
-                               &m_strVendor, &m_strProduct, &m_strDevInstIdParent}) {
+  for (std::u16string* text : {&m_strDeviceDescr, &m_strDriverKeyName, &FriendlyName, &HardwareId,
+                               &PhysicalName, &m_strVendor, &m_strProduct, &m_strDevInstIdParent}) {
     text->clear();
   }
+  for (SharedText* text : {&DevClass, &ClassGuidText, &Manufacturer, &Service}) text->clear();
   ClassGuid = {};
   m_nVendorId = m_nProductId = kUnknownId;
   UiNumber = LegacyBusType = -1;
@@ -50,7 +50,7 @@ void CZKUMInfoDeviceImpl::Reset() {
 }
 
 void CZKUMInfoDeviceImpl::OwnLines(std::u16string& out, const std::u16string& indent) const {
-  const auto lineIfAny = [&](std::u16string_view label, const std::u16string& value) {
+  const auto lineIfAny = [&](std::u16string_view label, std::u16string_view value) {
     if (!value.empty()) AppendLine(out, indent, label, value);
   };
 

@@ -6,6 +6,7 @@
 
 #include "platform/guid.h"
 #include "records/node.h"
+#include "records/shared_text.h"
 
 namespace KelvoUHW {
 
@@ -19,17 +20,17 @@ class CZKUMInfoDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   // stay: a node that lacks them shows those of the node read before it.
   void Reset();
 
-  std::u16string DevClass;
-  std::u16string ClassGuidText;
+  SharedText DevClass;
+  SharedText ClassGuidText;
   platform::Guid ClassGuid{};
   std::u16string Location;
   std::u16string FriendlyName;
-  std::u16string Manufacturer;
+  SharedText Manufacturer;
   std::u16string HardwareId;  // the first of the list
   std::u16string PhysicalName;
-  std::u16string Service;
+  SharedText Service;
   std::int32_t LegacyBusType = -1;  // see ReadInfoDeviceProperties
-  std::u16string EnumName;
+  SharedText EnumName;
   std::int32_t UiNumber = -1;  // see ReadInfoDeviceProperties
 };
 

@@ -112,8 +112,9 @@ TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
                                   {u"USB\\C", u"||other|other|SERIAL|"}}) {
     const InfoDevicePtr record = cache->Current().FindByInstanceId(id);
     ASSERT_TRUE(record);
-    EXPECT_EQ(record->FriendlyName + u"|" + record->Manufacturer + u"|" + record->Location + u"|" + record->EnumName +
-                  u"|" + record->m_strSerialNumber + u"|" + record->Service,
+    EXPECT_EQ(record->FriendlyName + u"|" + std::u16string(record->Manufacturer) + u"|" + record->Location + u"|" +
+                  std::u16string(record->EnumName) + u"|" + record->m_strSerialNumber + u"|" +
+                  std::u16string(record->Service),
               texts);
   }
 }
@@ -213,7 +214,7 @@ TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
     const InfoDevicePtr record = *cache->Current().begin();
     EXPECT_EQ(record->m_devInstHandle, kUnknownDevInst);
     EXPECT_THAT((std::array{record->m_strSerialNumber, record->m_strDevInstIdParent, record->FriendlyName,
-                            record->DevClass, record->Location, record->HardwareId}),
+                            std::u16string(record->DevClass), record->Location, record->HardwareId}),
                 testing::ElementsAre(u"S", u"PCI\\P", u"name", u"DiskDrive", u"location", u"hardware"));
     cache->Commit();
   }

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <map>
 #include <sstream>
+#include <variant>
 
 #include "platform/text.h"
 #include "platform/wrappers/intercepting_host.h"
@@ -115,7 +116,7 @@ bool Read(ScriptedSets& sets, CZKUMInfoDeviceImpl& record) {
 TEST(InfoDeviceProperties, FillTheirFields) {
   ScriptedSets sets;
   CZKUMInfoDeviceImpl record;
-  const std::pair<std::uint32_t, std::u16string*> fields[] = {
+  const std::pair<std::uint32_t, std::variant<std::u16string*, SharedText*>> fields[] = {
       {kSPDRP_SERVICE, &record.Service},
       {kSPDRP_CLASS, &record.DevClass},
       {kSPDRP_DEVICEDESC, &record.m_strDeviceDescr},
@@ -134,13 +135,16 @@ TEST(InfoDeviceProperties, FillTheirFields) {
   sets.values[kSPDRP_LEGACYBUSTYPE] = {.text = u"\x05", .type = kREG_DWORD};
   sets.values[kSPDRP_UI_NUMBER] = {.text = u"\x09", .type = kREG_MULTI_SZ};
   ASSERT_TRUE(Read(sets, record));
-  for (const auto& [property, field] : fields) EXPECT_EQ(*field, sets.values[property].text) << property;
+  const auto textOf = [](const auto& field) {
+    return std::visit([](const auto* text) { return std::u16string_view(*text); }, field);
+  };
+  for (const auto& [property, field] : fields) EXPECT_EQ(textOf(field), sets.values[property].text) << property;
   // What cannot be read stays, except service and class; what is empty becomes empty.
   sets.values = {{kSPDRP_MFG, {}}, {kSPDRP_DRIVER, {.failure = 0}}};
   ASSERT_TRUE(Read(sets, record));
   for (const auto& [property, field] : fields) {
     const bool emptied = property == kSPDRP_SERVICE || property == kSPDRP_CLASS || property == kSPDRP_MFG;
-    EXPECT_EQ(field->empty(), emptied) << property;
+    EXPECT_EQ(textOf(field).empty(), emptied) << property;
   }
   EXPECT_EQ(record.ClassGuid, (Guid{0xA, 0, 0, {}}));
   EXPECT_EQ(record.LegacyBusType, 4);
@@ -153,7 +157,7 @@ TEST(InfoDeviceProperties, ServicesExcludeIgnoringCaseAndClassesExactly) {
     sets.values = {{kSPDRP_SERVICE, {service}}, {kSPDRP_CLASS, {deviceClass}}};
     CZKUMInfoDeviceImpl record;
     const bool accepted = Read(sets, record);
-    EXPECT_EQ(record.Service + record.DevClass, service + deviceClass);
+    EXPECT_EQ(std::u16string(record.Service) + std::u16string(record.DevClass), service + deviceClass);
     return accepted;
   };
   std::istringstream services(

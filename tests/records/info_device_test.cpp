@@ -47,8 +47,9 @@ TEST(InfoDevice, DumpsEveryFieldAndResetLeavesThree) {
   device.m_nVendorId = device.m_nProductId = 1;
   device.Reset();
   EXPECT_TRUE(device.m_nVendorId == kUnknownId && device.m_nProductId == kUnknownId);
-  EXPECT_EQ(device.m_strSerialNumber + device.Location + device.EnumName, u"Slocationenum");
-  device.m_strSerialNumber = device.Location = device.EnumName = u"";
+  EXPECT_EQ(device.m_strSerialNumber + device.Location + std::u16string(device.EnumName), u"Slocationenum");
+  device.m_strSerialNumber = device.Location = u"";
+  device.EnumName.clear();
   EXPECT_EQ(DumpOf(device, u"> "), DumpWith("", "InterfaceTypeUndefined"));
 }
 
