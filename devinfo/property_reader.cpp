@@ -133,7 +133,8 @@ bool ReadClass(ElementReader& reader, const platform::SP_DEVINFO_DATA& element,
                CZKUMInfoDeviceImpl& record) {
   PropertyAnswer answer;
   record.DevClass.clear();
-  if (reader.Read(element, platform::kSPDRP_CLASS, answer)) record.DevClass = reader.Texts().Of(TextOf(answer));
+  if (reader.Read(element, platform::kSPDRP_CLASS, answer))
+    record.DevClass = reader.Texts().Of(TextOf(answer));
   return !IsExcludedClass(record.DevClass);
 }
 
@@ -141,7 +142,8 @@ bool ReadService(ElementReader& reader, const platform::SP_DEVINFO_DATA& element
                  CZKUMInfoDeviceImpl& record) {
   PropertyAnswer answer;
   record.Service.clear();
-  if (reader.Read(element, platform::kSPDRP_SERVICE, answer)) record.Service = reader.Texts().Of(TextOf(answer));
+  if (reader.Read(element, platform::kSPDRP_SERVICE, answer))
+    record.Service = reader.Texts().Of(TextOf(answer));
   return !IsExcludedService(record.Service);
 }
 
@@ -197,11 +199,11 @@ void ReadOtherProperties(ElementReader& reader, const platform::SP_DEVINFO_DATA&
     record.ClassGuid = ParseGuidText(record.ClassGuidText.c_str());
   }
   readText(platform::kSPDRP_DRIVER, record.m_strDriverKeyName);
-  readText(platform::kSPDRP_FRIENDLYNAME, record.FriendlyName);
+  readShared(platform::kSPDRP_FRIENDLYNAME, record.FriendlyName);
   readText(platform::kSPDRP_LOCATION_INFORMATION, record.Location);
   readShared(platform::kSPDRP_MFG, record.Manufacturer);
   readType(platform::kSPDRP_LEGACYBUSTYPE, record.LegacyBusType);
-  readText(platform::kSPDRP_HARDWAREID, record.HardwareId);
+  readShared(platform::kSPDRP_HARDWAREID, record.HardwareId);
   readText(platform::kSPDRP_PHYSICAL_DEVICE_OBJECT_NAME, record.PhysicalName);
   readType(platform::kSPDRP_UI_NUMBER, record.UiNumber);
   readShared(platform::kSPDRP_ENUMERATOR_NAME, record.EnumName);

@@ -38,11 +38,14 @@ CZKUMInfoDeviceImpl::CZKUMInfoDeviceImpl() : CZKUMUsbTreeNodeImpl(KUDTInfoDevice
 void CZKUMInfoDeviceImpl::Reset() {
   SetSerialNumber({});
   SetInstanceId({});
-  for (std::u16string* text : {&m_strDeviceDescr, &m_strDriverKeyName, &FriendlyName, &HardwareId,
-                               &PhysicalName, &m_strVendor, &m_strProduct, &m_strDevInstIdParent}) {
+  for (std::u16string* text : {&m_strDeviceDescr, &m_strDriverKeyName, &PhysicalName, &m_strVendor,
+                               &m_strProduct, &m_strDevInstIdParent}) {
     text->clear();
   }
-  for (SharedText* text : {&DevClass, &ClassGuidText, &Manufacturer, &Service}) text->clear();
+  for (SharedText* text :
+       {&DevClass, &ClassGuidText, &FriendlyName, &Manufacturer, &HardwareId, &Service}) {
+    text->clear();
+  }
   ClassGuid = {};
   m_nVendorId = m_nProductId = kUnknownId;
   UiNumber = LegacyBusType = -1;

@@ -24,9 +24,9 @@ class CZKUMInfoDeviceImpl final : public CZKUMUsbTreeNodeImpl {
   SharedText ClassGuidText;
   platform::Guid ClassGuid{};
   std::u16string Location;
-  std::u16string FriendlyName;
+  SharedText FriendlyName;
   SharedText Manufacturer;
-  std::u16string HardwareId;  // the first of the list
+  SharedText HardwareId;  // the first of the list
   std::u16string PhysicalName;
   SharedText Service;
   std::int32_t LegacyBusType = -1;  // see ReadInfoDeviceProperties

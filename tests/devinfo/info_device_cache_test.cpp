@@ -112,8 +112,8 @@ TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
                                   {u"USB\\C", u"||other|other|SERIAL|"}}) {
     const InfoDevicePtr record = cache->Current().FindByInstanceId(id);
     ASSERT_TRUE(record);
-    EXPECT_EQ(record->FriendlyName + u"|" + std::u16string(record->Manufacturer) + u"|" + record->Location + u"|" +
-                  std::u16string(record->EnumName) + u"|" + record->m_strSerialNumber + u"|" +
+    EXPECT_EQ(std::u16string(record->FriendlyName) + u"|" + std::u16string(record->Manufacturer) + u"|" +
+                  record->Location + u"|" + std::u16string(record->EnumName) + u"|" + record->m_strSerialNumber + u"|" +
                   std::u16string(record->Service),
               texts);
   }
@@ -213,8 +213,9 @@ TEST_F(InfoDeviceCacheTest, DiskDriveRecordsFollowTheInvertedTest) {
     ASSERT_EQ(cache->Current().size(), 1u);
     const InfoDevicePtr record = *cache->Current().begin();
     EXPECT_EQ(record->m_devInstHandle, kUnknownDevInst);
-    EXPECT_THAT((std::array{record->m_strSerialNumber, record->m_strDevInstIdParent, record->FriendlyName,
-                            std::u16string(record->DevClass), record->Location, record->HardwareId}),
+    EXPECT_THAT((std::array<std::u16string_view, 6>{record->m_strSerialNumber, record->m_strDevInstIdParent,
+                                                    record->FriendlyName, record->DevClass, record->Location,
+                                                    record->HardwareId}),
                 testing::ElementsAre(u"S", u"PCI\\P", u"name", u"DiskDrive", u"location", u"hardware"));
     cache->Commit();
   }
