@@ -16,9 +16,11 @@ void DeviceAnswers::Forget() noexcept {
 }
 
 const DeviceAnswers::Node* DeviceAnswers::Find(platform::DevInst node) const noexcept {
-  const Entry entry =
-      m_index.First(platform::HashOf(node), [&](Entry each) { return m_nodes[each].node == node; });
-  return entry == kNone ? nullptr : &m_nodes[entry];
+  if (m_lastFound >= m_nodes.size() || m_nodes[m_lastFound].node != node) {
+    m_lastFound = m_index.First(platform::HashOf(node),
+                                [&](Entry each) { return m_nodes[each].node == node; });
+  }
+  return m_lastFound == kNone ? nullptr : &m_nodes[m_lastFound];
 }
 
 DeviceAnswers::Node& DeviceAnswers::FindOrAdd(platform::DevInst node) {

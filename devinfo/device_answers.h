@@ -79,6 +79,8 @@ class DeviceAnswers final : public platform::DeviceManager {
   std::vector<Node> m_nodes;
   std::vector<Property> m_properties;
   std::u16string m_texts;
+  // Most questions come in a row about one node.
+  mutable Entry m_lastFound = kNone;
 };
 
 // A device manager for walks over all nodes: a walk that was disturbed has to find the nodes as

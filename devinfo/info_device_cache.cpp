@@ -19,11 +19,11 @@ namespace KelvoUHW {
 namespace {
 
 // Parents by how their ids begin: a device below any other bus is not reported.
-bool HasAdmittedParent(const CZKUMInfoDeviceImpl& record) noexcept {
+bool HasAdmittedParent(const NodeIdentity& node) noexcept {
   static constexpr std::array<std::u16string_view, 5> kPrefixes{u"USB", u"IUSB", u"SD", u"PCI",
                                                                 u"SCSI"};
   return std::ranges::any_of(kPrefixes, [&](std::u16string_view prefix) {
-    return record.m_strDevInstIdParent.starts_with(prefix);
+    return node.m_strDevInstIdParent.starts_with(prefix);
   });
 }
 
@@ -160,17 +160,25 @@ std::uint32_t InfoDeviceCache::EnumerateDeviceNodes(std::u16string_view classNam
   return 0;
 }
 
-// Fills handles and parent. The node's own id is read only where its parent's cannot be told
-// without it.
+// Fills handles and parent of a record that is admitted. The node's own id is read only where its
+// parent's cannot be told without it.
 bool InfoDeviceCache::IsAdmitted(const ElementReader& reader,
                                  const platform::SP_DEVINFO_DATA& element,
                                  CZKUMInfoDeviceImpl& record) {
-  record.m_devInstHandle = element.DevInst;
-  if (ReadParent(m_answers, record)) {
-    record.m_strDevInstId = reader.InstanceId(element);
-    NameDiskAsParent(record);
+  // Most elements are not admitted: their parents' ids take no memory.
+  m_identity.m_devInstHandle = element.DevInst;
+  m_identity.m_devInstHandleParent = kUnknownDevInst;
+  m_identity.m_strDevInstId.clear();
+  if (ReadParent(m_answers, m_identity)) {
+    m_identity.m_strDevInstId = reader.InstanceId(element);
+    NameDiskAsParent(m_identity);
   }
-  return HasAdmittedParent(record);
+  if (!HasAdmittedParent(m_identity)) return false;
+  record.m_devInstHandle = m_identity.m_devInstHandle;
+  record.m_devInstHandleParent = m_identity.m_devInstHandleParent;
+  record.m_strDevInstId = m_identity.m_strDevInstId;
+  record.m_strDevInstIdParent = m_identity.m_strDevInstIdParent;
+  return true;
 }
 
 // A node that was there before keeps the record it has, so nothing more of it is read. One that is

@@ -88,6 +88,7 @@ class InfoDeviceCache {
   platform::DeviceSets& m_sets;
   DeviceAnswers& m_answers;
   std::vector<DeviceNodeRecord> m_diskDrives;
+  NodeIdentity m_identity;  // of the element that is looked at
   InfoDeviceSet m_previous;
   InfoDeviceSet m_current;
   InfoDeviceSet m_removed;

@@ -90,15 +90,20 @@ Decoded DecodeUtf8(std::string_view bytes) {
 
 }  // namespace
 
-std::u16string ToLower(std::u16string_view text) {
-  std::u16string lowered(text);
+void ToLower(std::u16string_view text, std::u16string& lowered) {
+  lowered = text;
   if (IsAscii(text)) {
     for (char16_t& unit : lowered) {
       unit = static_cast<char16_t>(unit + (static_cast<unsigned>(unit - u'A') < 26u ? 32 : 0));
     }
-    return lowered;
+    return;
   }
   for (char16_t& unit : lowered) unit = ToLower(unit);
+}
+
+std::u16string ToLower(std::u16string_view text) {
+  std::u16string lowered;
+  ToLower(text, lowered);
   return lowered;
 }
 

@@ -22,6 +22,8 @@ char16_t ToLower(char16_t unit) noexcept;
 char16_t ToUpper(char16_t unit) noexcept;
 
 std::u16string ToLower(std::u16string_view text);
+// The same into a text whose memory is used again.
+void ToLower(std::u16string_view text, std::u16string& lowered);
 std::u16string ToUpper(std::u16string_view text);
 
 // Equal when both sides are lowered.

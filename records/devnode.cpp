@@ -4,6 +4,7 @@
 #include <array>
 #include <optional>
 #include <string_view>
+#include <utility>
 
 #include "platform/flat_index.h"
 #include "platform/text.h"
@@ -22,10 +23,11 @@ constexpr int kMostWalks = 300;
 
 using TextBuffer = std::array<char16_t, kTextChars>;
 
-// A text property of a node; nothing when the call fails.
-std::optional<std::u16string> ReadTextProperty(platform::DeviceManager& manager,
-                                               platform::DevInst node, std::uint32_t property) {
-  TextBuffer buffer{};
+// A text property of a node, in `buffer`; nothing when the call fails.
+std::optional<std::u16string_view> ReadTextProperty(platform::DeviceManager& manager,
+                                                    platform::DevInst node, std::uint32_t property,
+                                                    TextBuffer& buffer) {
+  buffer.fill(u'\0');
   static_assert(sizeof buffer == 400);
   std::uint32_t bytes = sizeof buffer;
   std::uint32_t type = 0;
@@ -34,7 +36,17 @@ std::optional<std::u16string> ReadTextProperty(platform::DeviceManager& manager,
   }
   const std::size_t received = std::min<std::size_t>(bytes / sizeof(char16_t), buffer.size());
   std::fill(buffer.begin() + static_cast<std::ptrdiff_t>(received), buffer.end(), u'\0');
-  return ReceivedText(buffer);
+  return ReceivedView(buffer);
+}
+
+// As GetDeviceId, into a text whose memory is used again.
+void ReadDeviceId(platform::DeviceManager& manager, platform::DevInst node, std::u16string& id) {
+  id.clear();
+  if (node == 0 || node == kUnknownDevInst) return;
+  TextBuffer buffer{};
+  if (!manager.GetDeviceId(node, buffer.data(), static_cast<std::uint32_t>(buffer.size()))) return;
+  id = ReceivedView(buffer).value_or(u"");
+  id = platform::Replaced(std::move(id), u'/', u'\\');
 }
 
 // The part of a driver key before its last backslash; all of it where it has none.
@@ -80,20 +92,20 @@ bool WalkDevNodes(platform::DeviceManager& manager, Visit visit) {
 
 std::u16string GetDeviceDescription(platform::DeviceManager& manager, platform::DevInst node) {
   if (node == 0) return {};
-  return ReadTextProperty(manager, node, platform::kCM_DRP_DEVICEDESC).value_or(std::u16string());
+  TextBuffer buffer;
+  return std::u16string(
+      ReadTextProperty(manager, node, platform::kCM_DRP_DEVICEDESC, buffer).value_or(u""));
 }
 
 std::u16string GetDeviceId(platform::DeviceManager& manager, platform::DevInst node) {
-  if (node == 0 || node == kUnknownDevInst) return {};
-  TextBuffer buffer{};
-  if (!manager.GetDeviceId(node, buffer.data(), static_cast<std::uint32_t>(buffer.size())))
-    return {};
-  return platform::Replaced(ReceivedText(buffer).value_or(std::u16string()), u'/', u'\\');
+  std::u16string id;
+  ReadDeviceId(manager, node, id);
+  return id;
 }
 
 bool ReadParent(platform::DeviceManager& manager, NodeIdentity& node) {
   manager.GetParent(node.m_devInstHandle, node.m_devInstHandleParent);
-  node.m_strDevInstIdParent = GetDeviceId(manager, node.m_devInstHandleParent);
+  ReadDeviceId(manager, node.m_devInstHandleParent, node.m_strDevInstIdParent);
   return node.m_strDevInstIdParent.starts_with(u"ROOT\\VOLMGR\\");
 }
 
@@ -111,7 +123,8 @@ platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
                                          const std::u16string& driverKey) {
   platform::DevInst found = 0;
   WalkDevNodes(manager, [&](platform::DevInst node) {
-    const auto key = ReadTextProperty(manager, node, platform::kCM_DRP_DRIVER);
+    TextBuffer buffer;
+    const auto key = ReadTextProperty(manager, node, platform::kCM_DRP_DRIVER, buffer);
     if (!key || !platform::EqualIgnoringCase(*key, driverKey)) return false;
     found = node;
     return true;
@@ -121,9 +134,9 @@ platform::DevInst FindDevNodeByDriverKey(platform::DeviceManager& manager,
 
 platform::DevInst DriverKeyIndex::Find(const std::u16string& driverKey) {
   for (int walks = 0; !m_complete && walks < kWalksInARow && m_walks < kMostWalks; ++walks) Fill();
-  const std::u16string key = platform::ToLower(driverKey);
-  const auto found =
-      m_index.First(platform::HashOf(key), [&](auto entry) { return IsKeyOf(entry, key); });
+  platform::ToLower(driverKey, m_lowered);
+  const auto found = m_index.First(platform::HashOf(m_lowered),
+                                   [&](auto entry) { return IsKeyOf(entry, m_lowered); });
   return found == platform::FlatIndex::kNone ? 0 : m_nodes[found].handle;
 }
 
@@ -133,8 +146,10 @@ void DriverKeyIndex::Fill() {
   m_index.Clear();
   ++m_walks;
   m_complete = WalkDevNodes(m_manager, [this](platform::DevInst node) {
-    if (const auto key = ReadTextProperty(m_manager, node, platform::kCM_DRP_DRIVER)) {
-      Add(platform::ToLower(*key), node);
+    TextBuffer buffer;
+    if (const auto key = ReadTextProperty(m_manager, node, platform::kCM_DRP_DRIVER, buffer)) {
+      platform::ToLower(*key, m_lowered);
+      Add(m_lowered, node);
     }
     return false;
   });

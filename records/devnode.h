@@ -68,7 +68,8 @@ class DriverKeyIndex {
   std::vector<std::u16string> m_classes;  // lower-cased
   platform::FlatIndex m_classIndex;
   platform::FlatIndex m_index;
-  bool m_complete = false;  // the walk that filled this came to its end
+  std::u16string m_lowered;  // the key that is looked for or added
+  bool m_complete = false;   // the walk that filled this came to its end
   int m_walks = 0;
 };
 

@@ -113,25 +113,25 @@ bool GetNodeInformation(platform::DeviceIo& io, platform::FileHandle hub,
 
 bool ProbeConnectionInformationEx(platform::DeviceIo& io, platform::FileHandle hub,
                                   std::uint32_t port) {
-  const auto buffer = std::make_unique<platform::ConnectionInformationEx>();
-  buffer->Info.ConnectionIndex = port;
+  platform::ConnectionInformationEx buffer{};
+  buffer.Info.ConnectionIndex = port;
   std::uint32_t received = 0;
   return io
-      .DeviceControl(hub, platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX, buffer.get(),
-                     sizeof *buffer, buffer.get(), sizeof *buffer, received)
+      .DeviceControl(hub, platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION_EX, &buffer,
+                     sizeof buffer, &buffer, sizeof buffer, received)
       .ok;
 }
 
 bool GetConnectionInformation(platform::DeviceIo& io, platform::FileHandle hub, std::uint32_t port,
                               ConnectionRecord& record) {
-  const auto answer = std::make_unique<platform::LegacyConnectionInformation>();
-  answer->Info.ConnectionIndex = port;
+  platform::LegacyConnectionInformation answer{};
+  answer.Info.ConnectionIndex = port;
   std::uint32_t received = 0;
-  if (!io.DeviceControl(hub, platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, answer.get(),
-                        sizeof *answer, answer.get(), sizeof *answer, received)) {
+  if (!io.DeviceControl(hub, platform::kIOCTL_USB_GET_NODE_CONNECTION_INFORMATION, &answer,
+                        sizeof answer, &answer, sizeof answer, received)) {
     return false;
   }
-  const platform::USB_NODE_CONNECTION_INFORMATION& from = answer->Info;
+  const platform::USB_NODE_CONNECTION_INFORMATION& from = answer.Info;
   record.Info.ConnectionIndex = from.ConnectionIndex;
   record.Info.DeviceDescriptor = from.DeviceDescriptor;
   record.Info.CurrentConfigurationValue = from.CurrentConfigurationValue;
@@ -142,7 +142,7 @@ bool GetConnectionInformation(platform::DeviceIo& io, platform::FileHandle hub, 
   record.Info.DeviceAddress = from.DeviceAddress;
   record.Info.NumberOfOpenPipes = from.NumberOfOpenPipes;
   record.Info.ConnectionStatus = from.ConnectionStatus;
-  record.PipeList = answer->PipeList;
+  record.PipeList = answer.PipeList;
   return true;
 }
 

@@ -1,6 +1,7 @@
 #include "tree/publication.h"
 
 #include <algorithm>
+#include <cstdint>
 #include <utility>
 
 #include "devinfo/info_device_linking.h"
@@ -179,22 +180,24 @@ DeviceList Publication::ModifiedDevices(const DeviceList& attached, const TreeIn
 }
 
 CZKUMUsbTreeNodeImpl* HubPortClimbs::From(CZKUMUsbTreeNodeImpl* start) {
-  std::vector<const CZKUMUsbTreeNodeImpl*> way;
+  const std::size_t firstOfWay = m_climbs.size();
   CZKUMUsbTreeNodeImpl* found = nullptr;
   for (CZKUMUsbTreeNodeImpl* node = start; node != nullptr && found == nullptr;) {
     ++m_nSteps;
-    // Nothing is known yet of what is on the way: a circle of parents would end here.
-    const auto [known, isNew] = m_found.try_emplace(node, nullptr);
-    if (!isNew) {
-      found = known->second;
+    const std::size_t hash = platform::HashOf(reinterpret_cast<std::uintptr_t>(node));
+    const auto isNode = [&](auto entry) { return m_climbs[entry].node == node; };
+    if (const auto known = m_index.First(hash, isNode); known != platform::FlatIndex::kNone) {
+      found = m_climbs[known].found;
       break;
     }
-    way.push_back(node);
+    // Nothing is known yet of what is on the way: a circle of parents would end here.
+    m_climbs.push_back({node, nullptr});
+    m_index.Add(hash, static_cast<platform::FlatIndex::Entry>(m_climbs.size() - 1), isNode);
     CZKUMUsbTreeNodeImpl* parent = node->m_pParent;
     if (parent != nullptr && parent->m_nType == KUDTHubPort) found = node;
     node = parent;
   }
-  for (const CZKUMUsbTreeNodeImpl* passed : way) m_found[passed] = found;
+  for (std::size_t i = firstOfWay; i < m_climbs.size(); ++i) m_climbs[i].found = found;
   return found;
 }
 

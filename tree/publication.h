@@ -3,11 +3,11 @@
 
 #include <cstddef>
 #include <string>
-#include <unordered_map>
 #include <unordered_set>
 #include <vector>
 
 #include "devinfo/info_device_cache.h"
+#include "platform/flat_index.h"
 #include "platform/host.h"
 #include "records/device_lists.h"
 #include "records/node.h"
@@ -67,7 +67,12 @@ class HubPortClimbs {
   std::size_t Steps() const noexcept { return m_nSteps; }
 
  private:
-  std::unordered_map<const CZKUMUsbTreeNodeImpl*, CZKUMUsbTreeNodeImpl*> m_found;
+  struct Climb {
+    const CZKUMUsbTreeNodeImpl* node;
+    CZKUMUsbTreeNodeImpl* found;
+  };
+  std::vector<Climb> m_climbs;
+  platform::FlatIndex m_index;
   std::size_t m_nSteps = 0;
 };
 
