@@ -293,21 +293,22 @@ void InfoDeviceCache::SortPending(const NodePtr& treeRoot) {
   const platform::FlatTextSet shown = InstanceIdsOf(treeRoot);
   InfoDeviceSet stillPending;
   InfoDeviceSet nowShown;
+  // Nobody is in both sets that go into one: they are only appended to.
   for (const InfoDevicePtr& record : m_pending) {
     if (!m_current.HasRecord(record.Get()) || m_added.HasRecord(record.Get())) continue;
-    (shown.Contains(record->m_strDevInstId) ? nowShown : stillPending).Insert(record);
+    (shown.Contains(record->m_strDevInstId) ? nowShown : stillPending).Append(record);
   }
   InfoDeviceSet added;
   for (const InfoDevicePtr& record : m_added) {
     if (shown.Contains(record->m_strDevInstId)) {
-      added.Insert(record);
+      added.Append(record);
     } else {
-      stillPending.Insert(record);
+      stillPending.Append(record);
       --m_nAddedCount;
     }
   }
   for (const InfoDevicePtr& record : nowShown) {
-    added.Insert(record);
+    added.Append(record);
     ++m_nAddedCount;
   }
   m_pending = std::move(stillPending);

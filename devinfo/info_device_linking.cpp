@@ -1,6 +1,5 @@
 #include "devinfo/info_device_linking.h"
 
-#include <cstdint>
 #include <vector>
 
 #include "platform/flat_index.h"
@@ -13,34 +12,25 @@ namespace {
 using platform::FlatIndex;
 using Entry = FlatIndex::Entry;
 
-// A record of the set, which has the pointer, and where its parent stands among all of them.
+// A record of the set, which has the pointer, and the number of its parent. By number; null for one
+// that was erased.
 struct Link {
-  const InfoDevicePtr* child;
+  const InfoDevicePtr* child = nullptr;
   Entry parent = FlatIndex::kNone;
 };
 
 std::vector<Link> FindParents(const InfoDeviceSet& records) {
-  std::vector<Link> links;
-  links.reserve(records.size());
-  for (const InfoDevicePtr& child : records) links.push_back({&child});
-
-  const auto hashOf = [](const InfoDevicePtr& record) {
-    return platform::HashOf(reinterpret_cast<std::uintptr_t>(record.Get()));
-  };
-  FlatIndex places;
-  for (Entry place = 0; place < links.size(); ++place) {
-    places.Add(hashOf(*links[place].child), place, [](Entry) { return false; });
-  }
-  for (Link& link : links) {
-    const InfoDevicePtr& parent = records.FindByInstanceId((*link.child)->m_strDevInstIdParent);
-    if (!parent) continue;
-    link.parent =
-        places.First(hashOf(parent), [&](Entry place) { return *links[place].child == parent; });
+  std::vector<Link> links(records.NumbersEnd());
+  for (Entry number = 0; number < links.size(); ++number) {
+    Link& link = links[number];
+    link.child = records.WithNumber(number);
+    if (link.child == nullptr) continue;
+    link.parent = records.NumberByInstanceId((*link.child)->m_strDevInstIdParent);
   }
   return links;
 }
 
-// By place, whether the record is an ancestor of itself. Each has one parent at most, so one walk
+// By number, whether the record is an ancestor of itself. Each has one parent at most, so one walk
 // upwards from each record not yet seen meets every circle once.
 std::vector<bool> FindCircles(const std::vector<Link>& links) {
   std::vector<bool> onCircle(links.size());
@@ -65,6 +55,9 @@ class ChildAdder {
 
   // `place` tells the parent from the others.
   void Add(const NodePtr& child, CZKUMUsbTreeNodeImpl& parent, Entry place) {
+    // Most parents have a child or two, which are compared sooner than entered.
+    constexpr std::size_t kFewChildren = 4;
+    if (parent.m_childs.size() < kFewChildren) return AddChild(child, &parent);
     if (!m_known[place]) {
       m_known[place] = true;
       for (const NodePtr& present : parent.m_childs) {

@@ -78,6 +78,11 @@ const InfoDevicePtr& InfoDeviceSet::Found(Entry entry) const noexcept {
 
 bool InfoDeviceSet::Insert(const InfoDevicePtr& record) {
   if (HasRecord(record.Get())) return false;
+  Append(record);
+  return true;
+}
+
+void InfoDeviceSet::Append(const InfoDevicePtr& record) {
   constexpr std::size_t kFewErased = 16;
   if (m_places.size() > 2 * m_records.size() + kFewErased) Renumber();
   const auto entry = static_cast<Entry>(m_places.size());
@@ -95,7 +100,6 @@ bool InfoDeviceSet::Insert(const InfoDevicePtr& record) {
     m_records.erase(place);
     throw;
   }
-  return true;
 }
 
 bool InfoDeviceSet::Erase(const CZKUMUsbTreeNodeImpl* record) {
@@ -140,6 +144,10 @@ const InfoDevicePtr& InfoDeviceSet::FindByHandle(platform::DevInst handle) const
 
 const InfoDevicePtr& InfoDeviceSet::FindByInstanceId(std::u16string_view id) const {
   return Found(First<ByInstanceId>(id));
+}
+
+InfoDeviceSet::Number InfoDeviceSet::NumberByInstanceId(std::u16string_view id) const {
+  return First<ByInstanceId>(id);
 }
 
 std::vector<InfoDevicePtr> InfoDeviceSet::AllByInstanceId(std::u16string_view id) const {

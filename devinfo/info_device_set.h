@@ -28,6 +28,8 @@ class InfoDeviceSet {
 
   // Appends a record; false, and its place stays, when that object is in the set already.
   bool Insert(const InfoDevicePtr& record);
+  // The same for a record that is known not to be in the set: nothing is looked up.
+  void Append(const InfoDevicePtr& record);
   // False when that object is not in the set. `record` may be the one that the set itself holds.
   bool Erase(const CZKUMUsbTreeNodeImpl* record);
   void Clear() noexcept;
@@ -47,6 +49,16 @@ class InfoDeviceSet {
   const InfoDevicePtr& FindByHandle(platform::DevInst handle) const;
   // The first record with exactly this instance id.
   const InfoDevicePtr& FindByInstanceId(std::u16string_view id) const;
+  // Numbers that tell the records from each other, in order of insertion. They are below
+  // NumbersEnd() and stay until the next insertion.
+  using Number = platform::FlatIndex::Entry;
+  Number NumbersEnd() const noexcept { return static_cast<Number>(m_places.size()); }
+  // Null where the record of that number was erased.
+  const InfoDevicePtr* WithNumber(Number number) const noexcept {
+    return m_places[number].erased ? nullptr : &*m_places[number].record;
+  }
+  // The number of what FindByInstanceId finds, or FlatIndex::kNone.
+  Number NumberByInstanceId(std::u16string_view id) const;
   // Every record with exactly this instance id.
   std::vector<InfoDevicePtr> AllByInstanceId(std::u16string_view id) const;
   // The first record that names exactly this parent and is not `except`.

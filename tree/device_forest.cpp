@@ -26,8 +26,10 @@ constexpr std::uint32_t kClassNameBytes = 520;
 constexpr std::uint32_t kNameBytes = 126;
 constexpr std::uint32_t kClassDescriptionChars = 260;
 
-bool IsClass(const DeviceNodeRecord& record, std::u16string_view name) noexcept {
-  return platform::EqualIgnoringCase(record.ClassName, name);
+// Of a record or a present device.
+template <class Device>
+bool IsClass(const Device& device, std::u16string_view name) noexcept {
+  return platform::EqualIgnoringCase(device.ClassName, name);
 }
 
 class ClassImageList {
@@ -48,14 +50,14 @@ class ClassImageList {
   platform::DeviceSetHandle m_handle = platform::kInvalidHandle;
 };
 
-// The text of a property that fits a buffer of fixed size; a longer one counts as not there.
-std::optional<std::u16string> ReadText(ElementReader& elements,
-                                       const platform::SP_DEVINFO_DATA& element,
-                                       std::uint32_t property, std::uint32_t bufferBytes) {
+// The text of a property that fits a buffer of fixed size; a longer one counts as not there. Valid
+// until the next one is read.
+std::optional<std::u16string_view> ReadText(ElementReader& elements,
+                                            const platform::SP_DEVINFO_DATA& element,
+                                            std::uint32_t property, std::uint32_t bufferBytes) {
   PropertyAnswer answer;
   if (!elements.ReadAndKeep(element, property, answer)) return std::nullopt;
-  const std::optional<std::u16string_view> text = TextWithin(answer, bufferBytes);
-  return text ? std::optional<std::u16string>(*text) : std::nullopt;
+  return TextWithin(answer, bufferBytes);
 }
 
 }  // namespace
@@ -84,51 +86,61 @@ bool DeviceRecordReader::IsShown(const platform::Guid& guid, platform::DeviceSet
   return true;
 }
 
-std::vector<DeviceNodeRecord> DeviceRecordReader::Read() {
-  std::vector<DeviceNodeRecord> records;
+std::vector<PresentDevice> DeviceRecordReader::Read() {
+  std::vector<PresentDevice> devices;
   const ClassImageList images(m_host);
   m_set.Open(nullptr,
              platform::kDIGCF_PRESENT | platform::kDIGCF_ALLCLASSES | platform::kDIGCF_PROFILE);
-  if (m_set.Get() == platform::kInvalidHandle) return records;
+  if (m_set.Get() == platform::kInvalidHandle) return devices;
   m_elements.emplace(m_host, m_set.Get(), m_answers);
 
   for (std::uint32_t index = 0; index < kMostElements; ++index) {
-    platform::SP_DEVINFO_DATA data{.cbSize = sizeof data};
+    PresentDevice device;
+    platform::SP_DEVINFO_DATA& data = device.Element;
+    data = {.cbSize = sizeof data};
     if (!m_host.EnumDeviceInfo(m_set.Get(), index, data)) break;
-    std::optional<std::u16string> className =
-        ReadText(*m_elements, data, platform::kSPDRP_CLASS, kClassNameBytes);
+    const auto className = ReadText(*m_elements, data, platform::kSPDRP_CLASS, kClassNameBytes);
     if (!className || !IsShown(data.ClassGuid, images.Get())) continue;
 
-    DeviceNodeRecord record;
-    record.DevInst = data.DevInst;
-    if (!m_answers.GetParent(data.DevInst, record.ParentDevInst)) {
+    device.DevInst = data.DevInst;
+    if (!m_answers.GetParent(data.DevInst, device.ParentDevInst)) {
       // Everything read so far is dropped and the set stays open. Deliberate: a PC that shows a
       // device without parent has no device-manager side at all.
       m_set.Release();
       return {};
     }
-    record.ClassName = std::move(*className);
-    if (IsClass(record, u"Processor") || IsClass(record, u"Computer")) continue;
-    record.Element = data;
-    records.push_back(std::move(record));
+    device.ClassName = m_elements->Texts().Of(*className);
+    if (IsClass(device, u"Processor") || IsClass(device, u"Computer")) continue;
+    devices.push_back(std::move(device));
   }
-  return records;
+  return devices;
+}
+
+DeviceNodeRecord RecordOf(const PresentDevice& device) {
+  DeviceNodeRecord record;
+  record.DevInst = device.DevInst;
+  record.ParentDevInst = device.ParentDevInst;
+  record.Element = device.Element;
+  record.ClassName = device.ClassName;
+  return record;
 }
 
 void DeviceRecordReader::Complete(DeviceNodeRecord& record) {
-  const auto read = [&](std::uint32_t property, std::uint32_t bufferBytes) {
-    return ReadText(*m_elements, record.Element, property, bufferBytes);
+  const auto read = [&](std::uint32_t property, std::uint32_t bufferBytes, std::u16string& text) {
+    const auto answer = ReadText(*m_elements, record.Element, property, bufferBytes);
+    text = answer.value_or(u"");
+    return answer.has_value();
   };
   record.InstanceId = m_elements->InstanceId(record.Element);
   record.ParentInstanceId = GetDeviceId(m_answers, record.ParentDevInst);
-  std::optional<std::u16string> name = read(platform::kSPDRP_FRIENDLYNAME, kNameBytes);
-  if (!name) name = read(platform::kSPDRP_DEVICEDESC, kNameBytes);
+  if (!read(platform::kSPDRP_FRIENDLYNAME, kNameBytes, record.Name)) {
+    read(platform::kSPDRP_DEVICEDESC, kNameBytes, record.Name);
+  }
   if (const SetupClass* setupClass = FindClass(record.Element.ClassGuid)) {
     record.ClassDescription = setupClass->description;
   }
-  record.Name = std::move(name).value_or(u"");
-  record.Location = read(platform::kSPDRP_LOCATION_INFORMATION, kClassNameBytes).value_or(u"");
-  record.HardwareId = read(platform::kSPDRP_HARDWAREID, kClassNameBytes).value_or(u"");
+  read(platform::kSPDRP_LOCATION_INFORMATION, kClassNameBytes, record.Location);
+  read(platform::kSPDRP_HARDWAREID, kClassNameBytes, record.HardwareId);
 }
 
 namespace {
@@ -137,19 +149,19 @@ namespace {
 // the top-level records that wait for it, then goes below its own parent or waits at the top.
 class Forest {
  public:
-  explicit Forest(std::vector<DeviceNodeRecord>& records) : m_records(records) {
-    m_places.resize(records.size());
-    for (Index index = 0; index < records.size(); ++index) Link(index);
-    for (Index index = 0; index < records.size(); ++index) {
-      if (IsClass(records[index], u"DiskDrive")) MarkWayTo(index);
+  explicit Forest(const std::vector<PresentDevice>& devices) : m_devices(devices) {
+    m_places.resize(devices.size());
+    for (Index index = 0; index < devices.size(); ++index) Link(index);
+    for (Index index = 0; index < devices.size(); ++index) {
+      if (IsClass(devices[index], u"DiskDrive")) MarkWayTo(index);
     }
   }
 
   std::vector<DeviceNodeRecord> TakePruned() {
     std::vector<DeviceNodeRecord> top;
-    for (Index index = 0; index < m_records.size(); ++index) {
+    for (Index index = 0; index < m_devices.size(); ++index) {
       if (m_places[index].parent == kNone && m_places[index].leadsToDisk) {
-        top.push_back(std::move(m_records[index]));
+        top.push_back(RecordOf(m_devices[index]));
         TakeWhatIsBelow(index, top.back());
       }
     }
@@ -170,28 +182,28 @@ class Forest {
 
   // Where a number is entered twice the first record counts.
   auto HasHandle(platform::DevInst handle) const {
-    return [this, handle](Index index) { return m_records[index].DevInst == handle; };
+    return [this, handle](Index index) { return m_devices[index].DevInst == handle; };
   }
   auto WaitsFor(platform::DevInst parent) const {
-    return [this, parent](Index index) { return m_records[index].ParentDevInst == parent; };
+    return [this, parent](Index index) { return m_devices[index].ParentDevInst == parent; };
   }
 
   void Link(Index index) {
-    const DeviceNodeRecord& record = m_records[index];
-    const std::size_t hash = platform::HashOf(record.DevInst);
-    for (Index child; (child = m_waiting.First(hash, WaitsFor(record.DevInst))) != kNone;) {
-      m_waiting.Remove(hash, child, WaitsFor(record.DevInst));
+    const PresentDevice& device = m_devices[index];
+    const std::size_t hash = platform::HashOf(device.DevInst);
+    for (Index child; (child = m_waiting.First(hash, WaitsFor(device.DevInst))) != kNone;) {
+      m_waiting.Remove(hash, child, WaitsFor(device.DevInst));
       Adopt(index, child);
     }
-    const std::size_t parentHash = platform::HashOf(record.ParentDevInst);
-    const Index parent = m_byHandle.First(parentHash, HasHandle(record.ParentDevInst));
+    const std::size_t parentHash = platform::HashOf(device.ParentDevInst);
+    const Index parent = m_byHandle.First(parentHash, HasHandle(device.ParentDevInst));
     // Parents that form a circle leave the record that closes it at the top.
     if (parent != kNone && TopOf(parent) != index) {
       Adopt(parent, index);
     } else {
-      m_waiting.Add(parentHash, index, WaitsFor(record.ParentDevInst));
+      m_waiting.Add(parentHash, index, WaitsFor(device.ParentDevInst));
     }
-    m_byHandle.Add(hash, index, HasHandle(record.DevInst));
+    m_byHandle.Add(hash, index, HasHandle(device.DevInst));
   }
 
   void Adopt(Index parent, Index child) {
@@ -230,15 +242,15 @@ class Forest {
       std::size_t place = waiting.size();
       for (Index child = m_places[index].firstChild; child != kNone;
            child = m_places[child].nextSibling) {
-        if (!m_places[child].leadsToDisk || IsClass(m_records[child], u"USB")) continue;
-        record->Children.push_back(std::move(m_records[child]));
+        if (!m_places[child].leadsToDisk || IsClass(m_devices[child], u"USB")) continue;
+        record->Children.push_back(RecordOf(m_devices[child]));
         waiting.push_back({child, nullptr});
       }
       for (DeviceNodeRecord& child : record->Children) waiting[place++].record = &child;
     }
   }
 
-  std::vector<DeviceNodeRecord>& m_records;
+  const std::vector<PresentDevice>& m_devices;
   std::vector<Place> m_places;
   platform::FlatIndex m_byHandle;
   platform::FlatIndex m_waiting;  // top-level records, by the parent they wait for
@@ -292,8 +304,8 @@ void AddController(const DeviceNodeRecord& record, CZKUMUsbTreeNodeImpl& root) {
 
 }  // namespace
 
-std::vector<DeviceNodeRecord> LinkDeviceForest(std::vector<DeviceNodeRecord> records) {
-  return Forest(records).TakePruned();
+std::vector<DeviceNodeRecord> LinkDeviceForest(const std::vector<PresentDevice>& devices) {
+  return Forest(devices).TakePruned();
 }
 
 std::vector<DeviceNodeRecord> ReadDeviceForest(platform::Host& host, DeviceAnswers& answers) {

@@ -12,8 +12,17 @@
 #include "records/device_node_record.h"
 #include "records/device_set.h"
 #include "records/node.h"
+#include "records/shared_text.h"
 
 namespace KelvoUHW {
+
+// A present device before it is known whether anything is shown of it.
+struct PresentDevice {
+  platform::DevInst DevInst = 0;
+  platform::DevInst ParentDevInst = 0;
+  platform::SP_DEVINFO_DATA Element;  // of the set that was read
+  SharedText ClassName;
+};
 
 // Reads the present devices of every class, in two steps: most devices lead to no disk drive, and
 // of those nothing is shown. One thread; `host` and `answers` must outlive the reader.
@@ -24,10 +33,9 @@ class DeviceRecordReader {
 
   // Handles, class and element of every device, in the system's order. A device without parent ends
   // the reading at once with nothing read, and the device-information set stays open: this is
-  // deliberate. A failing set or image list gives an empty result. The records have no children
-  // yet.
-  std::vector<DeviceNodeRecord> Read();
-  // Fills the texts of a record that Read gave.
+  // deliberate. A failing set or image list gives an empty result.
+  std::vector<PresentDevice> Read();
+  // Fills the texts of the record of a device that Read gave.
   void Complete(DeviceNodeRecord& record);
 
  private:
@@ -46,11 +54,14 @@ class DeviceRecordReader {
   std::optional<ElementReader> m_elements;  // of the open set
 };
 
-// Links the records by their handles and prunes: what remains are the top-level records that are a
+// A record with what is known of a device, without texts but its class and without children.
+DeviceNodeRecord RecordOf(const PresentDevice& device);
+
+// Links the devices by their handles and prunes: what remains are the top-level records that are a
 // disk drive or hold one, below them only what leads to a disk drive, and no record of class "USB"
 // except at the top. Class names are compared ignoring case. Children and top level keep the order
 // of reading.
-std::vector<DeviceNodeRecord> LinkDeviceForest(std::vector<DeviceNodeRecord> records);
+std::vector<DeviceNodeRecord> LinkDeviceForest(const std::vector<PresentDevice>& devices);
 
 // The forest of the PC: reads, links, and completes what remains.
 std::vector<DeviceNodeRecord> ReadDeviceForest(platform::Host& host, DeviceAnswers& answers);

@@ -35,7 +35,8 @@ NodePtr TreeIndex::FindPortDevice(const std::u16string& instanceId) const {
   Entry entry = first;
   while (entry != FlatIndex::kNone && !isPortDevice(entry)) entry = m_byId.Next(entry);
   if (entry == FlatIndex::kNone) return {};
-  NodePtr node = Find(instanceId);
+  NodePtr node = m_byId.Next(first) == FlatIndex::kNone ? m_nodes[first]
+                                                        : FindByInstanceId(m_root, instanceId);
   return node && node->m_nType == KUDTPortDevice ? node : NodePtr();
 }
 

@@ -30,8 +30,8 @@ Machine ThreeDevices() {
 Records ReadAll(platform::Host& host) {
   DeviceAnswers answers(host);
   DeviceRecordReader reader(host, answers);
-  Records records = reader.Read();
-  for (DeviceNodeRecord& record : records) reader.Complete(record);
+  Records records;
+  for (const PresentDevice& device : reader.Read()) reader.Complete(records.emplace_back(RecordOf(device)));
   return records;
 }
 
@@ -93,22 +93,21 @@ TEST(DeviceRecords, FieldsAreThoseOfTheDevice) {
             u"PCI\\B < ACPI\\A, Display: Display adapters, slot 3, PCI\\FIRST");
 }
 
-// Records from words such as "d*b": name, class, parent ("-" for one that is nowhere).
-Records FromText(const std::string& text) {
-  Records records;
+// Devices from words such as "d*b": name, class, parent ("-" for one that is nowhere).
+std::vector<PresentDevice> FromText(const std::string& text) {
+  std::vector<PresentDevice> devices;
   std::istringstream words(text);
   for (std::string word; words >> word;) {
-    DeviceNodeRecord record;
-    record.DevInst = static_cast<platform::DevInst>(word.front());
-    record.ParentDevInst = static_cast<platform::DevInst>(word.back());
-    record.ClassName = u"System";
-    if (word[1] == '*') record.ClassName = u"DiskDrive";
-    if (word[1] == '+') record.ClassName = u"diskDRIVE";
-    if (word[1] == '!') record.ClassName = u"USB";
-    if (word[1] == '~') record.ClassName = u"usB";
-    records.push_back(std::move(record));
+    PresentDevice& device = devices.emplace_back();
+    device.DevInst = static_cast<platform::DevInst>(word.front());
+    device.ParentDevInst = static_cast<platform::DevInst>(word.back());
+    device.ClassName = u"System";
+    if (word[1] == '*') device.ClassName = u"DiskDrive";
+    if (word[1] == '+') device.ClassName = u"diskDRIVE";
+    if (word[1] == '!') device.ClassName = u"USB";
+    if (word[1] == '~') device.ClassName = u"usB";
   }
-  return records;
+  return devices;
 }
 
 // "a(b(d) e)".
@@ -199,15 +198,15 @@ TEST(ForestNodes, DiskDriveRecordsAreCopiedAsFoundFirst) {
 }
 
 // Each device below the one before.
-Records ChainOf(platform::DevInst length, bool parentsFirst, bool disksOnly) {
-  Records records(length);
+std::vector<PresentDevice> ChainOf(platform::DevInst length, bool parentsFirst, bool disksOnly) {
+  std::vector<PresentDevice> devices(length);
   for (platform::DevInst i = 0; i < length; ++i) {
-    DeviceNodeRecord& record = records[parentsFirst ? i : length - 1 - i];
-    record.DevInst = i + 1;
-    record.ParentDevInst = i;
-    record.ClassName = disksOnly || i + 1 == length ? u"DiskDrive" : u"System";
+    PresentDevice& device = devices[parentsFirst ? i : length - 1 - i];
+    device.DevInst = i + 1;
+    device.ParentDevInst = i;
+    device.ClassName = disksOnly || i + 1 == length ? u"DiskDrive" : u"System";
   }
-  return records;
+  return devices;
 }
 
 // A recursion anywhere would end in a stack overflow.
