@@ -72,13 +72,22 @@ std::size_t ObjectWorkload::ReadAll() const {
   });
 }
 
+// As a client gets it: nothing but the component's own work.
+void ObjectWorkload::Dump() const {
+  BSTR text = nullptr;
+  const HRESULT result = Root().As<IZKUMUsbDevice>()->get_ToString(&text);
+  const KelvoUHW::Variant owner = KelvoUHW::Variant::OfBstr(text);
+  Expect(result);
+  if (SysStringLen(text) == 0) throw std::logic_error("no dump");
+}
+
 std::size_t ObjectWorkload::Run(ObjectWork work) const {
   NodeList list;
   switch (work) {
     case ObjectWork::Read:
       return ReadAll();
     case ObjectWork::Dump:
-      if (testing_support::DumpOf(Root()).empty()) throw std::logic_error("no dump");
+      Dump();
       return m_nodes;
     case ObjectWork::Subtree:
       Expect(Root()->get_InSubtreeDevicesOfType(KUDTInterfaceDevice, list.Put()));

@@ -48,6 +48,7 @@ class ObjectWorkload {
  private:
   KelvoUHW::ComPtr<IZKUMUsbTreeNode> Root() const;
   std::size_t ReadAll() const;
+  void Dump() const;
 
   platform::simulated::SimulatedPc m_pc;
   KelvoUHW::ComPtr<IZKUMUsbTree> m_tree;

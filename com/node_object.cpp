@@ -22,6 +22,19 @@ HRESULT CopyUntested(const std::u16string& text, BSTR* out) noexcept {
   return S_OK;
 }
 
+// As many characters as most nodes of the kind write, without their children. That of a device goes
+// on with what the device manager has of it.
+std::size_t CharsOfDump(const CZKUMUsbTreeNodeImpl& node) noexcept {
+  switch (node.m_nType) {
+    case KUDTHubPort:
+      return 256;
+    case KUDTPortDevice:
+      return 6'144;
+    default:
+      return 1'024;
+  }
+}
+
 }  // namespace
 
 CZKUMUsbTreeNode::~CZKUMUsbTreeNode() = default;
@@ -132,11 +145,10 @@ HRESULT CZKUMUsbTreeNode::get_DriverKeyName(BSTR* pVal) {
 HRESULT CZKUMUsbTreeNode::get_ToString(BSTR* pVal) {
   return ReadTextOf(m_node, E_FAIL, pVal, [](const auto& node) {
     // Room for most dumps from the start: a large one would be copied again and again as it grows.
-    constexpr std::size_t kCharsForEachNode = 1'024;
-    std::size_t chars = kCharsForEachNode;
+    std::size_t chars = CharsOfDump(node);
     for (const NodePtr& child : node.m_childs) {
-      VisitPreOrder(child, [&chars](const NodePtr&) {
-        chars += kCharsForEachNode;
+      VisitPreOrder(child, [&chars](const NodePtr& below) {
+        chars += CharsOfDump(*below);
         return true;
       });
     }

@@ -33,7 +33,9 @@ HRESULT ReadText(BSTR* out, Read read) {
   return GuardedRaising([&] {
     if (out) *out = nullptr;
     const RecordReadLock lock;
-    return IntermediateBstr(read()).CopyTo(out);
+    // What was read is freed before the second copy: a dump may have many megabytes.
+    const IntermediateBstr text(read());
+    return text.CopyTo(out);
   });
 }
 

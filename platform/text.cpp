@@ -136,6 +136,13 @@ std::u16string_view UpToZero(std::u16string_view buffer) noexcept {
   // zero may look like one then, so the four are looked at again.
   constexpr std::uint64_t kOnes = 0x0001000100010001u, kTops = 0x8000800080008000u;
   std::size_t at = 0;
+  // Without a branch for each unit, over many units at a time.
+  constexpr std::size_t kBlock = 64;
+  for (; at + kBlock <= buffer.size(); at += kBlock) {
+    unsigned zeros = 0;
+    for (std::size_t i = 0; i < kBlock; ++i) zeros |= buffer[at + i] == u'\0' ? 1u : 0u;
+    if (zeros != 0) break;
+  }
   for (; at + 4 <= buffer.size(); at += 4) {
     const std::uint64_t four = FourUnits(buffer.data() + at);
     if (((four - kOnes) & ~four & kTops) != 0) break;

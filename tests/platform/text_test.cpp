@@ -46,6 +46,15 @@ TEST(Texts, CasePartsAndReplacement) {
   EXPECT_EQ(Replaced(u"a/b//c", u'/', u'\\'), u"a\\b\\\\c");
   EXPECT_EQ(UpToZero(std::u16string_view(u"ab\0cd\0", 6)), u"ab");
   EXPECT_EQ(UpToZero(std::u16string_view(u"\0ab", 3)), u"");
+  // Many units are looked at together; 0x100 has a byte that is zero.
+  for (const std::size_t size : {std::size_t{63}, std::size_t{64}, std::size_t{200}}) {
+    for (std::size_t zero = 0; zero <= size; ++zero) {
+      std::u16string text(size, u'\x100');
+      if (zero < size) text[zero] = u'\0';
+      if (zero + 1 < size) text[size - 1] = u'\0';
+      EXPECT_EQ(UpToZero(text).size(), zero) << size;
+    }
+  }
 }
 
 TEST(Texts, Numbers) {
