@@ -1,5 +1,5 @@
 // What a build asks of four real PCs and two generated ones, counted: whoever adds a call has to
-// say so here.
+// say so here. And what it leaves on the heap.
 #include <gtest/gtest.h>
 
 #include "bench/build_costs.h"
@@ -41,6 +41,16 @@ TEST(CallCounts, OfBuildsOverGeneratedPcs) {
   Expect({"wide", 6753, 3992, 473}, GenerateMachine(GeneratedShape::Wide, 100));
   Expect({"deep", 8899, 5883, 1344}, GenerateMachine(GeneratedShape::Deep, 100));
 }
+
+#ifdef __GLIBC__  // other C libraries do not tell
+TEST(RetainedBytes, OfARecordAreAKibibyteAtMost) {
+  using platform::simulated::GeneratedShape, platform::simulated::GenerateMachine;
+  for (const GeneratedShape shape : {GeneratedShape::Wide, GeneratedShape::Deep}) {
+    const double bytes = RetainedBytesForEachNode(GenerateMachine(shape, 100));
+    EXPECT_TRUE(bytes > 500 && bytes <= 1'024) << bytes;
+  }
+}
+#endif
 
 }  // namespace
 }  // namespace bench

@@ -63,6 +63,7 @@ InfoDeviceSet::Entry InfoDeviceSet::First(const Value& value) const {
   auto& index = std::get<Index<Key>>(m_indexes);
   if (!index.filled) {
     index.entries.Clear();  // what a filling that ran out of memory left
+    index.entries.Reserve(m_records.size());
     for (Entry entry = 0; entry < m_places.size(); ++entry) {
       if (!m_places[entry].erased) Enter(index, entry);
     }

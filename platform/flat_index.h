@@ -72,10 +72,18 @@ class FlatIndex {
     return entry < m_links.size() ? m_links[entry].next : kNone;
   }
 
+  // Makes room for so many keys at once: growing moves them all.
+  void Reserve(std::size_t keys) {
+    if (keys * 4 <= m_slots.size() * 3) return;
+    std::size_t slots = std::max(m_slots.size(), kFewestSlots);
+    while (keys * 4 > slots * 3) slots *= 2;
+    Resize(slots);
+  }
+
   // `entry` must not be in the index.
   template <class Same>
   void Add(std::size_t hash, Entry entry, Same same) {
-    Reserve();
+    Reserve(m_used + 1);
     const std::size_t slot = SlotOf(hash, same);
     if (slot == kNoSlot) {
       if (entry < m_links.size()) m_links[entry] = {};
@@ -162,9 +170,8 @@ class FlatIndex {
     m_slots[free] = {};
   }
 
-  void Reserve() {
-    if ((m_used + 1) * 4 <= m_slots.size() * 3) return;
-    std::vector<Slot> old(m_slots.empty() ? kFewestSlots : m_slots.size() * 2);
+  void Resize(std::size_t slots) {
+    std::vector<Slot> old(slots);
     old.swap(m_slots);
     for (const Slot& key : old) {
       if (key.first != kNone) Put(key);

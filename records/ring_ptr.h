@@ -123,6 +123,11 @@ class RingPtr : private RingLink {
     return result;
   }
 
+  // One more of the pointers that share the record. The caller knows that one of them stays.
+  static RingPtr SharedWithOthers(T* record) noexcept requires std::derived_from<T, RecordRings> {
+    return RingPtr(record);
+  }
+
   RingPtr(const RingPtr& other) noexcept { Join(other); }
   template <class U>
   requires std::is_convertible_v<U*, T*> RingPtr(const RingPtr<U>& other)

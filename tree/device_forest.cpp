@@ -151,6 +151,7 @@ class Forest {
  public:
   explicit Forest(const std::vector<PresentDevice>& devices) : m_devices(devices) {
     m_places.resize(devices.size());
+    m_byHandle.Reserve(devices.size());
     for (Index index = 0; index < devices.size(); ++index) Link(index);
     for (Index index = 0; index < devices.size(); ++index) {
       if (IsClass(devices[index], u"DiskDrive")) MarkWayTo(index);

@@ -133,8 +133,11 @@ void Publication::IdentifyHubs(const InfoDevicePtr& entry, CZKUMPortDeviceImpl& 
 }
 
 DeviceList Publication::RemovedDevices() {
-  TreeIndex index(m_published);
-  DeviceList removed = MatchAll(m_devices.Removed(), index);
+  DeviceList removed;
+  if (!m_devices.Removed().empty()) {
+    TreeIndex index(m_published);
+    removed = MatchAll(m_devices.Removed(), index);
+  }
   platform::FlatTextSet known = IdsOf(removed);
   platform::FlatTextSet present;
   VisitPreOrder(m_building, [&](const NodePtr& node) {

@@ -21,7 +21,7 @@ TreeIndex::Entry TreeIndex::First(std::u16string_view instanceId) const noexcept
 NodePtr TreeIndex::Find(const std::u16string& instanceId) const {
   const Entry found = First(instanceId);
   if (found == FlatIndex::kNone) return {};
-  if (m_byId.Next(found) == FlatIndex::kNone) return m_nodes[found];
+  if (m_byId.Next(found) == FlatIndex::kNone) return NodePtr::SharedWithOthers(m_nodes[found]);
   // Which of several comes first depends on where they hang by now: the search knows.
   return FindByInstanceId(m_root, instanceId);
 }
@@ -35,14 +35,14 @@ NodePtr TreeIndex::FindPortDevice(const std::u16string& instanceId) const {
   Entry entry = first;
   while (entry != FlatIndex::kNone && !isPortDevice(entry)) entry = m_byId.Next(entry);
   if (entry == FlatIndex::kNone) return {};
-  NodePtr node = m_byId.Next(first) == FlatIndex::kNone ? m_nodes[first]
+  NodePtr node = m_byId.Next(first) == FlatIndex::kNone ? NodePtr::SharedWithOthers(m_nodes[first])
                                                         : FindByInstanceId(m_root, instanceId);
   return node && node->m_nType == KUDTPortDevice ? node : NodePtr();
 }
 
 void TreeIndex::Added(const NodePtr& node) {
   VisitPreOrder(node, [this](const NodePtr& each) {
-    m_nodes.push_back(each);
+    m_nodes.push_back(each.Get());
     Enter(static_cast<Entry>(m_nodes.size() - 1));
     return true;
   });
@@ -58,12 +58,12 @@ void TreeIndex::Renamed(const CZKUMUsbTreeNodeImpl& node, const std::u16string& 
   if (earlierId == node.m_strDevInstId) return;
   // Where it stands it stands under its earlier id still.
   const auto hadEarlierId = [&](Entry entry) {
-    const NodePtr& each = m_nodes[entry];
-    return each.Get() == &node || SameText(each->m_strDevInstId, earlierId);
+    const CZKUMUsbTreeNodeImpl* each = m_nodes[entry];
+    return each == &node || SameText(each->m_strDevInstId, earlierId);
   };
   const std::size_t hash = HashOf(earlierId);
   Entry entry = m_byId.First(hash, hadEarlierId);
-  while (entry != FlatIndex::kNone && m_nodes[entry].Get() != &node) entry = m_byId.Next(entry);
+  while (entry != FlatIndex::kNone && m_nodes[entry] != &node) entry = m_byId.Next(entry);
   if (entry == FlatIndex::kNone) return;
   m_byId.Remove(hash, entry, hadEarlierId);
   Enter(entry);

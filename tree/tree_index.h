@@ -1,16 +1,17 @@
 // Nodes of a tree by instance id, answered as the depth-first search would, but without searching.
 #pragma once
 
-#include <deque>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/flat_index.h"
 #include "records/node.h"
 
 namespace KelvoUHW {
 
-// Made for one publication, by one thread. It must be told of every change to the tree.
+// Made for one publication, by one thread. It must be told of every change to the tree, from which
+// nothing may be taken meanwhile.
 class TreeIndex {
  public:
   explicit TreeIndex(NodePtr root);
@@ -31,7 +32,8 @@ class TreeIndex {
   void Enter(Entry entry);
 
   NodePtr m_root;
-  std::deque<NodePtr> m_nodes;  // stay in their place: moving a pointer touches its whole ring
+  // The tree holds them. Pointers of its own would touch a neighbour of each one's ring.
+  std::vector<CZKUMUsbTreeNodeImpl*> m_nodes;
   platform::FlatIndex m_byId;
 };
 

@@ -29,6 +29,7 @@ TEST(FlatIndex, AnswersAsListsByKeyDo) {
         FlatIndex taken = std::move(index);
         EXPECT_EQ(index.First(hashOf(0), has(0)), FlatIndex::kNone);
         index = std::move(taken);
+        index.Reserve(static_cast<std::size_t>(step) / 10);  // keeps what is there, whatever its size
       }
       const auto entry = static_cast<std::uint32_t>(random() % kEntries);
       const unsigned key = keyOf[entry];

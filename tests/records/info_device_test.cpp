@@ -72,5 +72,23 @@ TEST(InfoDevice, ClassLinesAndBusTypes) {
   }
 }
 
+TEST(SharedTexts, EqualTextsAreOneCopyThatOutlivesThePool) {
+  std::vector<SharedText> texts;
+  {
+    SharedTexts pool;
+    for (const std::u16string_view text : {u"USB", u"usb", u"", u"USB\\", u"USB", u""}) texts.push_back(pool.Of(text));
+  }
+  SharedText other(u"USB");
+  EXPECT_EQ(other, texts[0]);
+  EXPECT_NE(other.c_str(), texts[0].c_str());
+  EXPECT_EQ(texts[4].c_str(), texts[0].c_str());
+  texts[4] = other;
+  other.clear();
+  EXPECT_TRUE(other.empty() && texts[2].empty() && texts[5].empty() && !texts[0].empty());
+  std::u16string all;
+  for (const SharedText& text : texts) all.append(text).append(text.c_str()).append(u"|");
+  EXPECT_EQ(all, u"USBUSB|usbusb||USB\\USB\\|USBUSB||");
+}
+
 }  // namespace
 }  // namespace KelvoUHW
