@@ -1,13 +1,16 @@
 // Prints one line for each of many made-up PCs: a digest of everything that its builds publish. Two versions of the
 // component that answer alike print the same lines: compare the outputs after a change that must not change results.
 //
-//   zkusb_build_digests [FIRST [COUNT]]
+//   zkusb_build_digests [FIRST [COUNT [flaky]]]
 //
 // Each PC goes through a script of random changes with a build after most of them. Between the PC and the component
 // stands a host whose answers are odd in a way that only depends on what is asked, and never on how often or in which
 // order: texts too long for any buffer, without their zero, of an odd size or with none, properties that a device
 // lacks or that cannot be read, devices without parent, elements that end early; some of it differs from build to
 // build, and in some builds every call of one operation fails.
+//
+// With "flaky", in every other build single calls fail, a question that is repeated is answered otherwise, and texts of
+// an odd size are not ASCII. Two versions print the same lines then if they also make the same calls in the same order.
 #include <cstring>
 #include <iostream>
 #include <map>
@@ -39,7 +42,8 @@ std::uint64_t HashText(std::u16string_view text) {
 
 class OddHost final : public wrappers::InterceptingHost {
  public:
-  OddHost(Host& base, std::uint32_t seed) : InterceptingHost(base), m_base(base), m_seed(seed) {}
+  OddHost(Host& base, std::uint32_t seed, bool flaky)
+      : InterceptingHost(base), m_base(base), m_seed(seed), m_flaky(flaky) {}
 
   // The oddities of `build`, one in so many questions; 0: none.
   void StartBuild(std::uint32_t build, std::uint32_t oneIn, std::optional<Operation> failing) {
@@ -202,7 +206,7 @@ class OddHost final : public wrappers::InterceptingHost {
     return choice % m_oneIn == 0 ? choice / m_oneIn | 1u << 20 : 0;
   }
 
-  static Status OddProperty(std::uint64_t odd, Status status, std::uint32_t& type, std::vector<std::uint8_t>& value) {
+  Status OddProperty(std::uint64_t odd, Status status, std::uint32_t& type, std::vector<std::uint8_t>& value) const {
     if (odd == 0) return status;
     const auto text = [&](std::u16string_view units, bool zero = true) {
       type = kREG_SZ;
@@ -244,7 +248,7 @@ class OddHost final : public wrappers::InterceptingHost {
       case 15:
         return text(u"", false);
       case 16:
-        text(u"odd");
+        text(m_flaky ? u"\u6D6D\u6D6D\u6D6D" : u"odd");
         value.resize(3);
         return Status::Success();
       case 17:
@@ -278,12 +282,16 @@ class OddHost final : public wrappers::InterceptingHost {
   }
 
   Status BeforeCall(const HostCall& call) noexcept override {
-    if (m_failing != call.operation || IsReleasing(call.operation)) return Status::Success();
+    if (IsReleasing(call.operation)) return Status::Success();
+    const bool fails = m_flaky && m_build % 2 == 1 && Mix(Mix(m_seed, 17), ++m_calls) % 32 == 0;
+    if (!fails && m_failing != call.operation) return Status::Success();
     return Status::Failure(IsConfigurationManager(call.operation) ? kCmFailure : kGeneralFailure);
   }
 
   Host& m_base;
   std::uint32_t m_seed, m_build = 0, m_oneIn = 0;
+  bool m_flaky;
+  std::uint64_t m_calls = 0;
   std::optional<Operation> m_failing;
   std::set<DeviceSetHandle> m_profileSets;
   std::map<FileHandle, std::uint64_t> m_paths;
@@ -329,11 +337,11 @@ class Digest {
   std::uint64_t m_value = 1;
 };
 
-std::uint64_t DigestOf(std::uint32_t seed, std::size_t& open) {
+std::uint64_t DigestOf(std::uint32_t seed, bool flaky, std::size_t& open) {
   constexpr std::uint32_t kBuilds = 10;
   testing_support::RandomPc pc(seed);
   for (int i = 0; i < 8; ++i) pc.Change();
-  OddHost host(pc.Pc(), seed);
+  OddHost host(pc.Pc(), seed, flaky);
   Digest digest;
   {
     CZKUMUsbTreeBuilder builder(host);
@@ -363,7 +371,7 @@ int main(int argc, char** argv) {
   const std::uint32_t first = argument(1, 1), count = argument(2, 2000);
   for (std::uint32_t seed = first; seed < first + count; ++seed) {
     std::size_t open = 0;
-    const std::uint64_t digest = DigestOf(seed, open);
+    const std::uint64_t digest = DigestOf(seed, argc > 3, open);
     std::cout << seed << ' ' << std::hex << digest << std::dec << ' ' << open << '\n';
   }
 }
