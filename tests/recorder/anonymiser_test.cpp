@@ -100,6 +100,8 @@ Machine PersonalPc() {
       u"00A0C91EFB8B}",
       u"Volume", u"E:\\");
   device(u"USB\\VID_0781&PID_5580\\K7B2", u"USB", u"SanDisk Extreme");
+  // What stands behind the last & is the number of a unit only where it is a number.
+  device(u"USB\\VID_0781&PID_5581\\QX77ZK&ANNA8812", u"USB", u"SanDisk Extreme");
   device(u"STORAGE\\VOLUME\\1&19F7E59C&0&SIGNATURE1A2B3C4DOFFSET7E00LENGTH100", u"Volume", u"C:\\");
   device(u"STORAGE\\VOLUME\\1&19F7E59C&0&SIGNATURE1A2B3C4DOFFSET9000LENGTH200", u"Volume", u"D:\\");
   device(u"PCI\\VEN_10EC&DEV_8168&SUBSYS_85051043&REV_0C\\01000000684CE00000", u"Net", u"Realtek GbE");
@@ -152,15 +154,15 @@ TEST(Anonymiser, LeavesNothingOfAPerson) {
   const auto serial = devices[0].id.substr(devices[0].id.rfind(u'\\') + 1);
   EXPECT_EQ(devices[1].id.substr(devices[1].id.rfind(u'\\') + 1), serial + u"&0");
   EXPECT_NE(devices[2].id.find(u"#" + serial + u"&0#"), std::u16string::npos);
-  EXPECT_EQ(devices[4].id.substr(0, devices[4].id.find(u"OFFSET")),
-            devices[5].id.substr(0, devices[5].id.find(u"OFFSET")));
+  EXPECT_EQ(devices[5].id.substr(0, devices[5].id.find(u"OFFSET")),
+            devices[6].id.substr(0, devices[6].id.find(u"OFFSET")));
   EXPECT_EQ(anonymous.volumes[0].serial, anonymous.volumes[1].serial);
   EXPECT_EQ(anonymous.volumes[0].folderMounts[0].volume, anonymous.volumes[0].name);
   EXPECT_TRUE(platform::EqualIgnoringCase(anonymous.volumes[0].paths[1],
                                           u"C:\\" + anonymous.volumes[0].folderMounts[0].folder));
   EXPECT_EQ(anonymous.storage[0].serial->size(), pc.storage[0].serial->size());
   EXPECT_EQ(ToUtf8(anonymiser.Report()),
-            "Replaced, equal ones by equal ones: 8 serial numbers, 3 volume GUIDs and other ids, 1 volume serial "
+            "Replaced, equal ones by equal ones: 9 serial numbers, 3 volume GUIDs and other ids, 1 volume serial "
             "number, 1 Bluetooth address, 5 folder names, 8 words of names that people gave.");
 }
 

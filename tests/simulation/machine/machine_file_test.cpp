@@ -55,6 +55,15 @@ TEST(MachineFile, RefusesEachMistakeWithItsPlace) {
   EXPECT_EQ(cases, 49);
 }
 
+TEST(MachineFile, CollectsEachFaultOnce) {
+  std::vector<std::string> faults;
+  ParseMachine(R"({"devices": [{"id": "HTREE\\ROOT\\0"}, {"id": "htree\\root\\0"}, {"id": "A"}, {"id": "a"}]})", "f",
+               faults);
+  EXPECT_THAT(faults, ElementsAre("f: devices[0].id: is the root device, which is always there",
+                                  "f: devices[1].id: is the root device, which is always there",
+                                  StartsWith("f: devices[3].id: ")));
+}
+
 TEST(MachineFile, ReadsEveryMember) {
   const Machine machine = LoadMachine(ZKUSB_SOURCE_DIR "/tests/simulation/machine/every-member.json");
   EXPECT_EQ(machine.name, u"a PC");
