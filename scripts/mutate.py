@@ -54,12 +54,12 @@ PROGRAM_LIMIT = 4 << 30  # bytes of address space: a mutant may ask for memory w
 
 
 class Tests:
-    """The test programs of a build, cheapest first; those of the mutant's own room before all others."""
+    """The test programs of a build and the exact counts, cheapest first; those of the mutant's own room before all others."""
 
     def __init__(self, build, seconds):
         self.build, self.seconds = build, seconds
         listed = subprocess.run(["ninja", "-C", str(build), "-t", "targets", "all"], check=True, capture_output=True, text=True)
-        self.names = sorted(set(re.findall(r"^(zkusb_\w+_tests): phony", listed.stdout, re.M)))
+        self.names = sorted(set(re.findall(r"^(zkusb_\w+_tests|zkusb_growth): phony", listed.stdout, re.M)))
         self.cost = {}
 
     def make(self, targets):
