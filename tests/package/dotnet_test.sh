@@ -12,7 +12,10 @@ skip() {
 }
 command -v dotnet >/dev/null || skip "there is no dotnet command"
 export DOTNET_CLI_TELEMETRY_OPTOUT=1 DOTNET_NOLOGO=1 DOTNET_CLI_HOME=$work/home
-rm -rf "$work"
+# What the network brought is kept: the next run works without one. The package under test is not.
+mkdir -p "$work"
+find "$work" -mindepth 1 -maxdepth 1 ! -name home ! -name packages -exec rm -rf {} +
+rm -rf "$work/packages/zkusbmonitor.interop"
 mkdir -p "$work/native/x64" "$work/feed"
 cp -r "$source/dotnet/ZKUsbMonitor.Interop" "$work/library"
 cp -r "$source/samples/dotnet" "$work/sample"
@@ -27,7 +30,10 @@ fi
 cd "$work"
 
 # Restoring needs packages of the run-time, once; compiling what is restored must work.
-dotnet restore library -p:NativeFolder="$work/native" >log 2>&1 || skip "the reference assemblies cannot be restored: $(grep -m1 error log)"
+restore() { # PROJECT OPTION...: first from what is here
+  dotnet restore "$@" --source "$work/feed" >log 2>&1 || dotnet restore "$@" >log 2>&1
+}
+restore library -p:NativeFolder="$work/native" || skip "the reference assemblies cannot be restored: $(grep -m1 error log)"
 dotnet pack library --no-restore -c Release -p:Version="$(cat "$source/build/windows-x64/generated/version.txt")" \
   -p:NativeFolder="$work/native" -o feed >log 2>&1 || { tail -20 log; exit 1; }
 cmake -E tar tf feed/*.nupkg | sed 's/.* //' >names
@@ -40,7 +46,7 @@ if [ -d native/x86 ] && ! grep -qx runtimes/win-x86/native/ZKUsbMonitor.dll name
 fi
 
 # Its packages lie in a folder of their own: this one may not be the one that an earlier run left in the user's.
-dotnet restore sample -r win-x64 -p:RestoreAdditionalProjectSources="$work/feed" --packages "$work/packages" >log 2>&1 ||
+restore sample -r win-x64 -p:RestoreAdditionalProjectSources="$work/feed" --packages "$work/packages" ||
   skip "the run-time for win-x64 cannot be restored: $(grep -m1 error log)"
 dotnet publish sample --no-restore -c Release -r win-x64 --self-contained -p:RestorePackagesPath="$work/packages" \
   -p:RestoreAdditionalProjectSources="$work/feed" -o out >log 2>&1 || { tail -20 log; exit 1; }
