@@ -38,10 +38,7 @@ test_preset() { # PRESET [OPTION OF CTEST...]
   local preset=$1 log passed failed skipped reasons
   shift
   log=build/log/$preset-ctest.log
-  # Under Wine a test waits for most of its time.
-  local jobs=$(nproc)
-  case $preset in windows-*) jobs=$((2 * jobs)) ;; esac
-  ctest --preset "$preset" -V -j"$jobs" "${which_tests[@]}" "$@" >"$log" 2>&1 &
+  ctest --preset "$preset" -V -j"$(nproc)" "${which_tests[@]}" "$@" >"$log" 2>&1 &
   local ctest_process=$!
   # What the line of progress reads.
   tail -n +1 -f --pid=$ctest_process "$log" 2>/dev/null | grep -aE --line-buffered '^ *[0-9]+/[0-9]+ Test' || true
