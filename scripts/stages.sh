@@ -14,14 +14,14 @@ fi
 about() {
   case $1 in
     tree) echo 'the tree of files: order of the rooms, format, test lists|5' ;;
-    native) echo 'all native tests under the address sanitizer|300' ;;
-    windows-x64) echo 'the 64-bit Windows tests under Wine|320' ;;
-    windows-x86) echo 'the 32-bit Windows tests under Wine|320' ;;
-    plain) echo 'growth by exact counts, what the module exports, 10,000 orders of threads, 200,000 broadcasts|120' ;;
+    native) echo 'all native tests under the address sanitizer|220' ;;
+    windows-x64) echo 'the 64-bit Windows tests under Wine|300' ;;
+    windows-x86) echo 'the 32-bit Windows tests under Wine|280' ;;
+    plain) echo 'growth by exact counts, what the module exports, 10,000 orders of threads, 200,000 broadcasts|130' ;;
     threads) echo 'what shares memory, under the thread sanitizer|90' ;;
     fuzz) echo 'each fuzz target for a moment|70' ;;
     tidy) echo 'clang-tidy over every source file|75' ;;
-    reproducible) echo 'the Windows files, built twice: the same bytes|240' ;;
+    reproducible) echo 'the Windows files, built twice: the same bytes|110' ;;
   esac
 }
 
