@@ -24,10 +24,24 @@ endfunction()
 zkusb_header_library(nlohmann_json::nlohmann_json nlohmann json.hpp)
 zkusb_header_library(CLI11::CLI11 CLI CLI.hpp)
 
+option(ZKUSB_CLANG_FOR_TESTS "Compile with clang what is only tested with" OFF)
+
+# For the targets that are added to this folder, and to those below it, from now on.
+macro(zkusb_compile_tests_with_clang)
+  if(ZKUSB_CLANG_FOR_TESTS)
+    foreach(tool CXX_COMPILER CXX_LINKER)
+      list(PREPEND CMAKE_${tool}_LAUNCHER ${CMAKE_SOURCE_DIR}/scripts/clang-for-mingw.sh)
+    endforeach()
+  endif()
+endmacro()
+
 if(ZKUSB_BUILD_TESTS)
   # The test library, from its sources: the building system has it compiled for itself only.
   find_path(ZKUSB_GOOGLETEST CMakeLists.txt PATHS /usr/src/googletest NO_DEFAULT_PATH REQUIRED)
-  add_subdirectory(${ZKUSB_GOOGLETEST} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
+  block()
+    zkusb_compile_tests_with_clang()
+    add_subdirectory(${ZKUSB_GOOGLETEST} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
+  endblock()
   target_compile_options(gtest PRIVATE -O0)
   target_compile_options(gmock PRIVATE -O0)
 endif()

@@ -20,7 +20,7 @@ build_packages=(g++ cmake ninja-build nlohmann-json3-dev libcli11-dev)
 test_packages=(libgtest-dev libgmock-dev libbenchmark-dev clang-14 libclang-rt-14-dev
   clang-format-14 git)
 windows_build_packages=("${build_packages[@]}" g++-mingw-w64-i686-posix g++-mingw-w64-x86-64-posix
-  mingw-w64-tools googletest perl)
+  mingw-w64-tools googletest perl clang-14 lld-14)
 windows_run_packages=(wine wine64)
 # Beyond those, for ./test all. Without a browser and without a typesetter the tests that use them are skipped, aloud.
 all_packages=(clang-tidy-14)

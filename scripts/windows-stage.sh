@@ -27,7 +27,7 @@ run_windows_stage() {
     outcome 0 0 1 'the cross compilers cannot be installed'
     return 0
   fi
-  build_preset "$preset" || { outcome 0 1 0; return 1; }
+  build_preset "$preset" "${windows_targets[@]}" || { outcome 0 1 0; return 1; }
   if [ "$preset" = windows-x86 ] && ! kernel_runs_32_bits; then
     outcome 0 0 1 'built, tests not run: this kernel runs no 32-bit programs'
     return 0

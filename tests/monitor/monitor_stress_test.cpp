@@ -3,6 +3,7 @@
 #include <thread>
 
 #include "monitor/usb_event_receiver.h"
+#include "tests/support/cases.h"
 #include "tests/support/monitor_process.h"
 #include "tests/support/rendezvous.h"
 
@@ -43,11 +44,11 @@ TEST(MonitorStress, FourThreadsShareTheLock) {
 }
 
 TEST(MonitorStress, StartsAndTearsDownInFreshProcesses) {
-  constexpr std::size_t kProcesses = 200;
+  const std::size_t processes = testing_support::Cases(200u, 40u);
   constexpr std::size_t kBroadcasts = 8;
   std::size_t calls = 0;
   const std::int32_t locks = ModuleLockCount();
-  for (std::size_t number = 0; number < kProcesses; ++number) {
+  for (std::size_t number = 0; number < processes; ++number) {
     MonitorProcess process(ClockMode::Real);
     RecordingTarget target(process.desktop);
     auto receiver = std::make_unique<CZKUMUsbEventReceiver>();
@@ -69,7 +70,7 @@ TEST(MonitorStress, StartsAndTearsDownInFreshProcesses) {
   }
   EXPECT_EQ(ModuleLockCount(), locks);
   // At least the volumes of the processes that stopped before they tore down.
-  EXPECT_GE(calls, kProcesses / 4 * kBroadcasts / 2);
+  EXPECT_GE(calls, processes / 4 * kBroadcasts / 2);
 }
 
 }  // namespace

@@ -10,6 +10,7 @@
 #include <set>
 
 #include "platform/wrappers/intercepting_host.h"
+#include "tests/support/cases.h"
 #include "tests/support/module_process.h"
 #include "tests/support/test_sink.h"
 
@@ -104,7 +105,8 @@ std::uint32_t Count(const char* variable, std::uint32_t usual) {
 }
 
 TEST(Schedules, RandomOrdersEndAlike) {
-  const std::uint32_t seed = Count("ZKUSB_RANDOM_SEED", 1), schedules = Count("ZKUSB_SCHEDULES", 100);
+  const std::uint32_t seed = Count("ZKUSB_RANDOM_SEED", 1),
+                      schedules = Count("ZKUSB_SCHEDULES", testing_support::Cases(100u, 40u));
   std::cout << "ZKUSB_RANDOM_SEED=" << seed << " ZKUSB_SCHEDULES=" << schedules << '\n';
   for (std::uint32_t i = 0; i < schedules && !testing::Test::HasFailure(); ++i) {
     SCOPED_TRACE(seed + i);

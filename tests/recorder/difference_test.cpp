@@ -97,8 +97,9 @@ std::vector<std::string> LinesOf(const SimulatedPc& pc) {
 
 // Each state of PCs that change at random leads to the next.
 TEST(StepsBetween, TellWhatMadeUpPcsDo) {
+  const std::uint32_t pcs = testing_support::Cases(10u, 3u);
   std::size_t steps = 0;
-  for (std::uint32_t seed = 1; seed <= 10; ++seed) {
+  for (std::uint32_t seed = 1; seed <= pcs; ++seed) {
     testing_support::RandomPc pc(seed);
     Listener original(pc.Pc().Snapshot());
     Machine state = RecordMachine(pc.Pc());
@@ -114,7 +115,7 @@ TEST(StepsBetween, TellWhatMadeUpPcsDo) {
       ASSERT_EQ(LinesOf(replayed), LinesOf(pc.Pc())) << "seed " << seed << ":" << pc.Script();
     }
   }
-  EXPECT_GE(steps, 80u);
+  EXPECT_GE(steps, 8 * pcs);
 }
 
 TEST(StepsBetween, SayWhenAChangeIsMoreThanStepsCanSay) {

@@ -65,7 +65,8 @@ void ExpectSameBuilds(std::uint32_t firstSeed, std::uint32_t count) {
 
 TEST(Recorder, ShowsMadeUpPcsAsTheyAre) {
   const char* many = std::getenv("ZKUSB_RECORDED_PCS");
-  ExpectSameBuilds(1, many == nullptr ? 30 : static_cast<std::uint32_t>(std::strtoul(many, nullptr, 10)));
+  ExpectSameBuilds(1, many == nullptr ? testing_support::Cases(30u, 10u)
+                                      : static_cast<std::uint32_t>(std::strtoul(many, nullptr, 10)));
 }
 
 // What failed is left out, and what is there can be read, built over and recorded again; nothing stays open.
@@ -77,7 +78,8 @@ TEST(Recorder, WritesWhatItGetsWhenCallsFail) {
   RecordMachine(host);
   const std::uint64_t calls = host.Calls();
   std::uint64_t partial = 0, tried = 0;
-  for (std::uint64_t call = 1; call <= calls && !testing::Test::HasFailure(); call += 3) {
+  for (std::uint64_t call = 1; call <= calls && !testing::Test::HasFailure();
+       call += testing_support::Cases<std::uint64_t>(3, 17)) {
     SCOPED_TRACE("call " + std::to_string(call));
     host.SetPlan({.call = call, .onwards = call % 2 == 0});
     const Machine recorded = RecordMachine(host);

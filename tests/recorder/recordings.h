@@ -4,6 +4,7 @@
 #include "simulation/machine/machine_file.h"
 #include "simulation/machine/machine_writer.h"
 #include "simulation/pc/simulated_pc.h"
+#include "tests/support/cases.h"
 #include "tests/support/outline.h"
 #include "tests/support/random_pc.h"
 #include "tree/tree_builder.h"

@@ -6,6 +6,7 @@
 #include <string_view>
 
 #include "platform/wrappers/intercepting_host.h"
+#include "tests/support/cases.h"
 #include "tests/support/desk_pc.h"
 #include "tests/support/outline.h"
 
@@ -170,7 +171,7 @@ TEST_P(BuildFaults, AreForgottenAfterAFewBuilds) {
   const Shown unharmed = AfterFault(stage, kNoCall, stage.mostCleanBuilds, failed);
   ASSERT_EQ(failed, std::nullopt);
   std::size_t most = 0;
-  for (std::uint64_t call = 1;; ++call) {
+  for (std::uint64_t call = 1;; call += testing_support::Cases<std::uint64_t>(1, 9)) {
     SCOPED_TRACE(call);
     std::size_t builds = 0;
     Shown shown = AfterFault(stage, call, builds, failed);
@@ -185,7 +186,10 @@ TEST_P(BuildFaults, AreForgottenAfterAFewBuilds) {
     }
     ASSERT_FALSE(HasFailure());
   }
-  EXPECT_EQ(most, stage.mostCleanBuilds);
+  // Few calls are so bad.
+  if (testing_support::EveryCase()) {
+    EXPECT_EQ(most, stage.mostCleanBuilds);
+  }
 }
 
 INSTANTIATE_TEST_SUITE_P(Stages, BuildFaults,

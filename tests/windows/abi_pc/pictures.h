@@ -12,11 +12,13 @@
 #include <string>
 
 #include "simulation/machine/machine_file.h"
+#include "tests/support/cases.h"
 #include "tests/windows/abi_pc/shipping_module.h"
 
 namespace abi_pc {
 
 namespace sim = platform::simulated;
+using testing_support::Cases;
 
 // What each build leaves open, which is documented: the sets of volumes, disks and their like.
 inline constexpr std::size_t kSetsOfABuild = 4;
