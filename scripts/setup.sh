@@ -17,7 +17,7 @@ need_packages() {
 }
 
 build_packages=(g++ cmake ninja-build nlohmann-json3-dev libcli11-dev)
-test_packages=(libgtest-dev libgmock-dev libbenchmark-dev clang-14 libclang-rt-14-dev
+test_packages=(libgtest-dev libgmock-dev libbenchmark-dev clang-14 libclang-rt-14-dev lld-14
   clang-format-14 git)
 windows_build_packages=("${build_packages[@]}" g++-mingw-w64-i686-posix g++-mingw-w64-x86-64-posix
   mingw-w64-tools googletest perl clang-14 lld-14)

@@ -30,7 +30,7 @@ outcome() { printf '%s|%s|%s|%s\n' "$1" "$2" "$3" "${4:-}" >"$outcome_file"; }
 build_preset() { # PRESET [TARGET...]
   local preset=$1
   shift
-  cmake --preset "$preset" && cmake --build --preset "$preset" --target "${@:-all}"
+  cmake --preset "$preset" && cmake --build --preset "$preset" -j "$(nproc)" --target "${@:-all}"
 }
 
 # Runs the tests of a preset, reads the counts from the log and says the outcome.
@@ -77,41 +77,63 @@ progress_of() {
     sed -E 's/^\[(.*)\]/building \1, /; s/^ *([0-9]+\/[0-9]+) Test/testing \1, /' || true
 }
 
-# Runs one stage with a line of progress, on a terminal anew each second, else once a minute.
-run_stage() { # NUMBER OF NAME
-  local number=$1 of=$2 name=$3 log=build/log/$3.log started=$SECONDS status=0 line
-  outcome_file=build/log/$name.outcome
-  rm -f "$outcome_file"
-  local title
-  title=$(about "$name")
-  title="[$number/$of] $name: ${title%|*}"
-  echo "$title"
+# Begins a stage in the background.
+begin_stage() { # NAME
+  local name=$1 log=build/log/$1.log
+  rm -f "build/log/$name.outcome"
   (
     set -eo pipefail
+    outcome_file=build/log/$name.outcome
     "stage_$name"
   ) >"$log" 2>&1 </dev/null &
-  local process=$!
-  while kill -0 "$process" 2>/dev/null; do
-    sleep 1
-    line="      $(progress_of "$log")$((SECONDS - started)) s"
-    if [ -t 1 ]; then
-      printf '\r\033[K%s' "$line"
-    elif [ $(((SECONDS - started) % 60)) -eq 59 ]; then
-      echo "$line"
-    fi
-  done
-  wait "$process" || status=$?
-  [ ! -t 1 ] || printf '\r\033[K'
-  [ -f "$outcome_file" ] || outcome 0 1 0 "it ended before its tests"
-  [ "$status" -eq 0 ] || tail -100 "$log"
-  echo "      $((SECONDS - started)) s"
-  local passed failed skipped reason
-  IFS='|' read -r passed failed skipped reason <"$outcome_file"
+  process_of[$name]=$!
+}
+
+# Takes the outcome of a stage that has ended into the table.
+end_stage() { # NAME SECONDS
+  local name=$1 seconds=$2 status=0 passed failed skipped reason
+  wait "${process_of[$name]}" || status=$?
+  unset "process_of[$name]"
+  [ -f "build/log/$name.outcome" ] || outcome_file=build/log/$name.outcome outcome 0 1 0 "it ended before its tests"
+  [ "$status" -eq 0 ] || tail -100 "build/log/$name.log"
+  echo "      $name: $seconds s"
+  IFS='|' read -r passed failed skipped reason <"build/log/$name.outcome"
   # A stage that failed in something else than a test has failed all the same.
   [ "$status" -eq 0 ] || [ "$failed" -gt 0 ] || failed=1
   all_passed=$((all_passed + passed))
   all_failed=$((all_failed + failed))
   all_skipped=$((all_skipped + skipped))
-  rows+=("$(printf '%-14s %7d %7d %8d %8d' "$name" "$passed" "$failed" "$skipped" $((SECONDS - started)))")
+  rows+=("$(printf '%-14s %7d %7d %8d %8d' "$name" "$passed" "$failed" "$skipped" "$seconds")")
   [ -z "$reason" ] || rows+=("$(tr ';' '\n' <<<"$reason" | sed 's/^/    skipped: /')")
+}
+
+# Runs stages side by side with a line of progress, on a terminal anew each second, else once a minute.
+declare -A process_of
+run_stages() { # NAME...
+  local started=$SECONDS name line
+  for name; do
+    stage_number=$((stage_number + 1))
+    line=$(about "$name")
+    echo "[$stage_number/$stage_count] $name: ${line%|*}"
+    begin_stage "$name"
+  done
+  while [ "${#process_of[@]}" -gt 0 ]; do
+    sleep 1
+    line=
+    for name; do
+      [ -n "${process_of[$name]-}" ] || continue
+      if kill -0 "${process_of[$name]}" 2>/dev/null; then
+        line+="$name: $(progress_of "build/log/$name.log")$((SECONDS - started)) s  "
+      else
+        [ ! -t 1 ] || printf '\r\033[K'
+        end_stage "$name" $((SECONDS - started))
+      fi
+    done
+    if [ -t 1 ]; then
+      printf '\r\033[K      %s' "$line"
+    elif [ -n "$line" ] && [ $(((SECONDS - started) % 60)) -eq 59 ]; then
+      echo "      $line"
+    fi
+  done
+  [ ! -t 1 ] || printf '\r\033[K'
 }

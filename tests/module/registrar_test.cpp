@@ -8,6 +8,7 @@
 
 #include "module/scripts.h"
 #include "platform/wrappers/failing_registry.h"
+#include "tests/support/cases.h"
 #include "tests/support/golden.h"
 #include "tests/support/registry_lines.h"
 
@@ -165,7 +166,7 @@ TEST(Registrar, RandomScriptsEndAndUndoWhatTheyDo) {
   std::mt19937 random(7);
   const auto below = [&](std::size_t bound) { return random() % bound; };
   std::size_t taken = 0;
-  for (int round = 0; round < 4'000; ++round) {
+  for (int round = 0; round < testing_support::Cases(4'000, 800); ++round) {
     std::u16string script = u"HKCR { ";
     // Every other one is made of whole statements, or hardly any would be taken.
     const bool whole = round % 2 == 0;

@@ -70,7 +70,7 @@ Mapping ExpectSameButForAMapping(const Machine& machine, std::size_t fewest) {
 }
 
 TEST(Anonymiser, ShowsTheSamePcButForAMappingOfWords) {
-  for (const char* name : kMachines) {
+  for (const char* name : SomeMachines()) {
     SCOPED_TRACE(name);
     const Mapping mapping = ExpectSameButForAMapping(Recorded(LoadMachine(name)), 1);
     // Makes and places stay.

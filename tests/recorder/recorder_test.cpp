@@ -30,7 +30,7 @@ void ExpectSameBuild(const Machine& machine) {
 }
 
 TEST(Recorder, ShowsEveryMachineAsItIs) {
-  for (const char* name : kMachines) {
+  for (const char* name : SomeMachines()) {
     SCOPED_TRACE(name);
     const Machine machine = LoadMachine(name);
     ExpectSameBuild(machine);

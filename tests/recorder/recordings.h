@@ -1,6 +1,8 @@
 // What a build over a PC shows, and PCs to look at.
 #pragma once
 
+#include <span>
+
 #include "simulation/machine/machine_file.h"
 #include "simulation/machine/machine_writer.h"
 #include "simulation/pc/simulated_pc.h"
@@ -13,7 +15,10 @@ namespace recorder {
 
 using platform::simulated::Machine;
 
-inline constexpr const char* kMachines[] = {"asus-b560", "dell-precision", "hp-cardreader", "vmware-win7"};
+inline constexpr const char* kMachines[] = {"hp-cardreader", "asus-b560", "dell-precision", "vmware-win7"};
+inline std::span<const char* const> SomeMachines() {
+  return std::span(kMachines).first(testing_support::Cases<std::size_t>(4, 1));
+}
 
 inline Machine LoadMachine(const std::string& name) {
   return platform::simulated::LoadMachine(ZKUSB_SOURCE_DIR "/machines/" + name + ".json");

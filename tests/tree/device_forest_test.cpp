@@ -8,6 +8,7 @@
 #include "platform/wrappers/failing_host.h"
 #include "simulation/pc/simulated_pc.h"
 #include "tests/support/best_time.h"
+#include "tests/support/cases.h"
 #include "tests/support/outline.h"
 
 namespace KelvoUHW {
@@ -211,16 +212,16 @@ std::vector<PresentDevice> ChainOf(platform::DevInst length, bool parentsFirst, 
 
 // A recursion anywhere would end in a stack overflow.
 TEST(DeviceForest, ChainsAreLoopsHoweverLong) {
-  constexpr platform::DevInst kLength = 200'000;
+  const platform::DevInst length = testing_support::Cases(200'000u, 100'000u);
   for (const bool disksOnly : {true, false}) {
-    Records forest = LinkDeviceForest(ChainOf(kLength, !disksOnly, disksOnly));
+    Records forest = LinkDeviceForest(ChainOf(length, !disksOnly, disksOnly));
     const auto root = MakeRecord<CZKUMUsbTreeRootImpl>();
     AddForestNodes(forest, *root);
     const Records disks = DiskDriveRecords(forest);
     forest = disks;
     std::size_t depth = 0;
     for (const Records* level = &forest; !level->empty(); level = &level->front().Children) ++depth;
-    EXPECT_EQ(depth, disksOnly ? kLength : 1);
+    EXPECT_EQ(depth, disksOnly ? length : 1);
     EXPECT_EQ(root->m_childs.size() + disks.size(), 1u);
   }
 }
@@ -228,6 +229,7 @@ TEST(DeviceForest, ChainsAreLoopsHoweverLong) {
 // A climb at each device would take 35 times as long and more below each other as side by side.
 TEST(DeviceForest, ChainsTakeTheirLengthAndNotItsSquare) {
   for (const bool parentsFirst : {true, false}) {
+    if (!parentsFirst && !testing_support::EveryCase()) break;
     const auto time = [&](bool below) {
       return testing_support::BestOfThree(
           [&] { EXPECT_FALSE(LinkDeviceForest(ChainOf(40'000, parentsFirst, true, below)).empty()); });

@@ -5,6 +5,7 @@
 #include <fstream>
 
 #include "platform/host.h"
+#include "tests/support/cases.h"
 
 namespace platform::simulated {
 namespace {
@@ -39,13 +40,16 @@ TEST(MachineFile, RefusesEachMistakeWithItsPlace) {
        "escaped to \\u0001"},
       {"{\"name\": \"'; expected secret\" \"'; expected secret\"}",
        "line 1, column 50: syntax error while parsing object - unexpected string literal; expected '}'"},
-      {R"({"notes": [)" + Repeated("\"\",", 2'000'000) + "]}", "notes: the file has more than 2000000 values"},
       {std::string("{}\0{}", 5), "line 1, column 3: unexpected zero byte"},
       {Repeated("[", 100000), Repeated("[0]", 15) + ": is nested too deeply (at most 16 levels)"},
       {R"({"devices": [{"id": ")" + std::string(200, 'A') + R"("}]})", "devices[0].id: is longer than 199 characters"},
       {ports + R"("pipes": [{})" + Repeated(", {}", 30) + "]}]}]}", port + "pipes: has more than 30 entries"},
       {ports + "}" + Repeated(", {}", 254) + "]}]}", "hubs[0].ports: has more than 255 entries"}};
   for (const auto& [json, error] : kCases) EXPECT_EQ(MachineError(json), "pc.json: " + error) << json.substr(0, 300);
+  if (testing_support::EveryCase()) {
+    EXPECT_EQ(MachineError(R"({"notes": [)" + Repeated("\"\",", 2'000'000) + "]}"),
+              "pc.json: notes: the file has more than 2000000 values");
+  }
   // The others in a file: the text, a tab, the error.
   std::ifstream file(ZKUSB_SOURCE_DIR "/tests/simulation/machine/machine-file-errors.tsv");
   int cases = 0;

@@ -71,7 +71,7 @@ TEST(AbiPc, ClientShowsWhatTheNativeBuildShows) {
     for (Lines args : {Lines{"tree"}, Lines{"dump"}, Lines{"volumes"}, Lines{"find", "--vendor", "413C"},
                        Lines{"find", "--vendor", "0781"}}) {
       for (const bool json : {false, true}) {
-        if (json && args[0] == "dump") continue;
+        if (json && (args[0] == "dump" || (args[0] != "tree" && !testing_support::EveryCase()))) continue;
         if (json) args.push_back("--json");
         const std::string what = machine + " " + args[0] + (json ? " as JSON" : "");
         const Watched shown = RunInPc("client", MachinePath(machine), args);
