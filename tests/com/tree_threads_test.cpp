@@ -1,4 +1,5 @@
 // Clients on threads of their own read and release while builds replace the tree. Made for the thread sanitizer.
+#include <algorithm>
 #include <array>
 #include <atomic>
 #include <cstddef>
@@ -126,22 +127,24 @@ TEST(TreeThreads, ClientsDestroyParentsWhileBuildsReplaceTheTree) {
   ASSERT_EQ(desk.Rebuild(), S_OK);
   const std::size_t builds = testing_support::Cases(150u, 60u);
   std::array<std::array<Node, 16>, 3> kept;
-  std::array<std::size_t, 3> parents{};
+  std::array<std::atomic<std::size_t>, 3> parents{};
   {
     std::atomic<bool> done = false;
     std::vector<std::jthread> threads;
     for (std::size_t i = 0; i < kept.size(); ++i) {
       threads.emplace_back([&, i] {
-        while (!done) AskForParents(*desk.tree.Get(), kept[i], parents[i]);
+        for (std::size_t asked = 0; !done; parents[i] = asked) AskForParents(*desk.tree.Get(), kept[i], asked);
       });
     }
-    for (std::size_t build = 0; build < builds && !HasFailure(); ++build) {
+    // However the system shares its time, each of them is at it meanwhile.
+    const auto isTooEarly = [&] { return std::ranges::any_of(parents, [](const auto& asked) { return asked < 100; }); };
+    for (std::size_t build = 0; (build < builds || (build < 10'000 && isTooEarly())) && !HasFailure(); ++build) {
       desk.Do(build % 2 == 0 ? Change(Stick(u"S2", 4, u'F')) : Change(Unplug{UsbId(u"S2")}));
       EXPECT_EQ(desk.Rebuild(), S_OK);
     }
     done = true;
   }
-  for (const std::size_t asked : parents) EXPECT_GE(asked, builds * 2 / 3);
+  for (const std::size_t asked : parents) EXPECT_GE(asked, 100u);
   kept = {};
   // Devices whose data was destroyed come anew: two builds later all is there again.
   for (const Change& change :
