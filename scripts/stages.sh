@@ -38,6 +38,7 @@ test_preset() { # PRESET [OPTION OF CTEST...]
   local preset=$1 log passed failed skipped reasons
   shift
   log=build/log/$preset-ctest.log
+  : >"$log"
   ctest --preset "$preset" -V -j"$(nproc)" "${which_tests[@]}" "$@" >"$log" 2>&1 &
   local ctest_process=$!
   # What the line of progress reads.
