@@ -73,7 +73,7 @@ TEST(TreeThreads, ClientsReadAndReleaseWhileBuildsReplaceTheTree) {
 
   std::vector<Reader> readers(kReaders, Reader(*desk.tree.Get()));
   testing_support::Announcement publications;
-  const int builds = testing_support::Cases(1000, 150);
+  const int builds = testing_support::Cases(1000, 60);
   int published = 0;
   {
     std::vector<std::jthread> threads;
@@ -125,7 +125,7 @@ TEST(TreeThreads, ClientsDestroyParentsWhileBuildsReplaceTheTree) {
                                              Stick(u"S1", 2, u'E'), CardReader(u"CR", 3)})
                     .pc.Snapshot());
   ASSERT_EQ(desk.Rebuild(), S_OK);
-  const std::size_t builds = testing_support::Cases(150u, 60u);
+  const std::size_t builds = testing_support::Cases(150u, 40u);
   std::array<std::array<Node, 16>, 3> kept;
   std::array<std::atomic<std::size_t>, 3> parents{};
   {

@@ -84,7 +84,7 @@ class BusySink final : public testing_support::Callable {
 using NotifierStress = ComObjects;
 
 TEST_F(NotifierStress, ClientsComeAndGoWhileBroadcastsArrive) {
-  const int broadcasts = testing_support::Cases(1000, 250);
+  const int broadcasts = testing_support::Cases(1000, 150);
   Seen seen;
   {
     ModuleProcess process(ClockMode::Real);

@@ -65,7 +65,7 @@ void ExpectSameBuilds(std::uint32_t firstSeed, std::uint32_t count) {
 
 TEST(Recorder, ShowsMadeUpPcsAsTheyAre) {
   const char* many = std::getenv("ZKUSB_RECORDED_PCS");
-  ExpectSameBuilds(1, many == nullptr ? testing_support::Cases(30u, 10u)
+  ExpectSameBuilds(1, many == nullptr ? testing_support::Cases(30u, 5u)
                                       : static_cast<std::uint32_t>(std::strtoul(many, nullptr, 10)));
 }
 
@@ -79,7 +79,7 @@ TEST(Recorder, WritesWhatItGetsWhenCallsFail) {
   const std::uint64_t calls = host.Calls();
   std::uint64_t partial = 0, tried = 0;
   for (std::uint64_t call = 1; call <= calls && !testing::Test::HasFailure();
-       call += testing_support::Cases<std::uint64_t>(3, 17)) {
+       call += testing_support::Cases<std::uint64_t>(3, 41)) {
     SCOPED_TRACE("call " + std::to_string(call));
     host.SetPlan({.call = call, .onwards = call % 2 == 0});
     const Machine recorded = RecordMachine(host);

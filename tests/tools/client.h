@@ -12,6 +12,7 @@
 #include <sstream>
 
 #include "platform/text.h"
+#include "tests/support/cases.h"
 #include "tests/support/golden.h"
 #include "tests/support/program.h"
 #include "tests/tools/json_schema.h"
@@ -28,6 +29,19 @@ inline std::vector<std::string> Lines(const std::string& text) {
   std::istringstream stream(text);
   for (std::string line; std::getline(stream, line);) lines.push_back(line);
   return lines;
+}
+
+// Cases that start a program each. Programs start slowly under Wine, so `./test` runs every fourth there, and all of
+// them natively.
+template <class Case, std::size_t count>
+std::vector<Case> ProgramCases(const Case (&cases)[count]) {
+  std::size_t step = 1;
+#ifdef _WIN32
+  step = testing_support::Cases<std::size_t>(1, 4);
+#endif
+  std::vector<Case> some;
+  for (std::size_t at = 0; at < count; at += step) some.push_back(cases[at]);
+  return some;
 }
 
 // All JSON that any test makes is held against the schema: that of watch and record line by line.

@@ -47,7 +47,7 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
       {{"dump", "--script", noSteps.Path()}, noSteps.Path() + ": ", "steps: is missing"},
       {{"--script", badStep.Path(), "watch"}, badStep.Path() + ": ", "steps[0]: "},
   };
-  for (const auto& [args, file, reason] : cases) {
+  for (const auto& [args, file, reason] : ProgramCases(cases)) {
     SCOPED_TRACE(testing::PrintToString(args));
     const ProgramResult result = RunClient(args);
     EXPECT_EQ(result.code, kRefused);
@@ -92,7 +92,7 @@ TEST(CommandLine, SaysWhatWasNotFound) {
       {{"tree", "--json", "--machine", storageOnly.Path()}, noController, R"("Childs": [])"},
       {{"dump", "--json", "--machine", storageOnly.Path()}, noController, R"("ToString": "")"},
   };
-  for (const auto& [args, message, out] : cases) {
+  for (const auto& [args, message, out] : ProgramCases(cases)) {
     SCOPED_TRACE(testing::PrintToString(args));
     const ProgramResult result = RunOverSimulatedPc(args);
     EXPECT_EQ(result.code, kNothingFound);

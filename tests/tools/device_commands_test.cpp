@@ -105,7 +105,7 @@ TEST(FindCommand, FindsByWhatAPersonKnows) {
       {{"find", "e"}, {camera, module, stick}},
       {{"find", "--product", "8197"}, {module}},
   };
-  for (const auto& [args, ids] : cases) {
+  for (const auto& [args, ids] : ProgramCases(cases)) {
     SCOPED_TRACE(testing::PrintToString(args));
     Args all = args;
     all.insert(all.end(), {"--json", "--machine", folder.Path()});

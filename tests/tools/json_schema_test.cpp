@@ -26,7 +26,7 @@ TEST(JsonSchema, HasTheDocumentsOfEveryCommand) {
 #endif
   };
   std::size_t damaged = 0;
-  for (auto [args, least] : cases) {
+  for (auto [args, least] : ProgramCases(cases)) {
     SCOPED_TRACE(testing::PrintToString(args));
     args.push_back("--json");
     const ProgramResult result = RunOverSimulatedPc(args);
@@ -53,7 +53,7 @@ TEST(JsonSchema, HasTheDocumentsOfEveryCommand) {
       }
     }
   }
-  EXPECT_GE(damaged, 60u);
+  EXPECT_GE(damaged, std::size(ProgramCases(cases)) * 5);
   std::filesystem::remove(file.Path() + ".script.json");
 }
 

@@ -155,7 +155,7 @@ TEST(RecordCommand, RefusesWhatCannotBeDone) {
       {{"check"}, "is required"},
       {{"check", "/no/such/file"}, "cannot be read"},
   };
-  for (const auto& [args, reason] : cases) {
+  for (const auto& [args, reason] : ProgramCases(cases)) {
     SCOPED_TRACE(testing::PrintToString(args));
     const ProgramResult result = RunClient(args);
     EXPECT_EQ(result.code, kRefused);

@@ -171,7 +171,7 @@ TEST_P(BuildFaults, AreForgottenAfterAFewBuilds) {
   const Shown unharmed = AfterFault(stage, kNoCall, stage.mostCleanBuilds, failed);
   ASSERT_EQ(failed, std::nullopt);
   std::size_t most = 0;
-  for (std::uint64_t call = 1;; call += testing_support::Cases<std::uint64_t>(1, 9)) {
+  for (std::uint64_t call = 1;; call += testing_support::Cases<std::uint64_t>(1, 29)) {
     SCOPED_TRACE(call);
     std::size_t builds = 0;
     Shown shown = AfterFault(stage, call, builds, failed);

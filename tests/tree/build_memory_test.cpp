@@ -70,7 +70,7 @@ TEST(BuildWithoutMemory, PublishesNothingAndTheNextOneWorks) {
     desk.builder.CommitDeviceCache();
     desk.Do({newcomer.plug});
     const auto allocations = DistinctAllocations([&] { desk.builder.Build(); });
-    for (std::size_t i = 0; i < allocations.size(); i += testing_support::Cases<std::size_t>(1, 7)) {
+    for (std::size_t i = 0; i < allocations.size(); i += testing_support::Cases<std::size_t>(1, 23)) {
       const std::uint64_t allocation = allocations[i];
       bool failed = false;
       EXPECT_THAT(BuildAfterFailure(machine, newcomer, allocation, failed),

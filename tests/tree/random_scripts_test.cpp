@@ -211,7 +211,7 @@ class Watcher {
 };
 
 TEST(RandomScripts, PublishWhatIsThereAndReportWhatChanged) {
-  const std::uint32_t firstSeed = FirstSeed(), scripts = testing_support::Cases(500u, 60u);
+  const std::uint32_t firstSeed = FirstSeed(), scripts = testing_support::Cases(500u, 25u);
   std::cout << "ZKUSB_RANDOM_SEED=" << firstSeed << '\n';
   std::size_t publications = 0, devices = 0;
   for (std::uint32_t seed = firstSeed; seed < firstSeed + scripts; ++seed) {

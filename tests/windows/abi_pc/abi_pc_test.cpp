@@ -91,7 +91,7 @@ void MakeOdd(Json& machine, std::mt19937& random) {
 }
 
 TEST(AbiPc, MadeUpPcsAreShownAlike) {
-  const unsigned pcs = FromEnvironment("ZKUSB_PCS", Cases(200u, 40u)), first = FromEnvironment("ZKUSB_RANDOM_SEED", 1);
+  const unsigned pcs = FromEnvironment("ZKUSB_PCS", Cases(200u, 20u)), first = FromEnvironment("ZKUSB_RANDOM_SEED", 1);
   unsigned odd = 0, distinct = 0;
   std::string before;
   for (unsigned seed = first; seed < first + pcs && !HasFailure(); ++seed) {
@@ -195,7 +195,7 @@ TEST(AbiPc, AStickIsPulledOutWhileABuildLooks) {
   const std::string rest = PictureOf(without, "without it"), last = PictureOf(later, "without another");
   ASSERT_TRUE(whole != rest && rest != last);
   int between = 0, kept = 0;
-  for (unsigned at = 0; at < calls; at += 1 + calls / Cases(150u, 40u)) {
+  for (unsigned at = 0; at < calls; at += 1 + calls / Cases(150u, 20u)) {
     const std::string what = "pulled out before call " + std::to_string(at);
     Begin(machine);
     bool gone = false;

@@ -104,7 +104,7 @@ void RegisterOnce() {
 }
 
 TEST(AbiPc, IsLoadedAndUnloadedAnyNumberOfTimes) {
-  const int cycles = static_cast<int>(FromEnvironment("ZKUSB_CYCLES", Cases(5000u, 800u)));
+  const int cycles = static_cast<int>(FromEnvironment("ZKUSB_CYCLES", Cases(5000u, 300u)));
   const sim::Machine machine = sim::LoadMachine(MachinePath("vmware-win7"));
   Counts early;
   for (int cycle = 0; cycle < cycles && !HasFailure(); ++cycle) {
