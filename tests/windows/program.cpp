@@ -6,6 +6,9 @@
 
 namespace {
 
+// A test says which program hangs before it is ended itself.
+constexpr DWORD kLongestRunMilliseconds = 180'000;
+
 // A file that is gone when it is closed, for output of any length: a pipe would have to be read while the other fills.
 class OutputFile {
  public:
@@ -71,11 +74,13 @@ ProgramResult RunProgram(const std::string& program, const std::vector<std::stri
     return result;
   }
   DWORD code = 0;
-  WaitForSingleObject(process.hProcess, INFINITE);
-  if (GetExitCodeProcess(process.hProcess, &code)) result.code = static_cast<int>(code);
+  const bool ended = WaitForSingleObject(process.hProcess, kLongestRunMilliseconds) == WAIT_OBJECT_0;
+  if (!ended) TerminateProcess(process.hProcess, 0);
+  if (ended && GetExitCodeProcess(process.hProcess, &code)) result.code = static_cast<int>(code);
   CloseHandle(process.hThread);
   CloseHandle(process.hProcess);
   result.out = out.Contents();
   result.err = err.Contents();
+  if (!ended) result.err += "\nwas ended: it took over three minutes";
   return result;
 }
