@@ -90,7 +90,9 @@ TEST_F(InfoDeviceCacheTest, AdmitsByTheStartOfTheParentId) {
     devices.insert(devices.end(), {BareDevice(parent), BareDevice(u"_" + parent, parent)});
   }
   Start(devices);
+  host->SetPlan({.operation = Operation::EnumDeviceInfo});
   EXPECT_TRUE(Collect());
+  EXPECT_EQ(host->Calls(), devices.size() + 1);
   EXPECT_EQ(Ids(cache->Current()),
             "V\\_??_SCSI#DISK#1#{x} _USB\\P _USBSTOR\\P _IUSB\\P _SD\\P _SDX\\P _PCI\\P _SCSI\\P");
 }
@@ -310,6 +312,32 @@ TEST(InfoDeviceSet, AnswersAsALinearSearchDoes) {
   set.Clear();
   EXPECT_TRUE(set.empty());
   for (const InfoDevicePtr& record : all) EXPECT_FALSE(set.HasRecord(record.Get()));
+  // Those that left leave no room behind them for good.
+  for (int round = 0; round < 100; ++round) {
+    EXPECT_TRUE(set.Insert(all[0]) && set.Erase(all[0].Get()));
+    EXPECT_LE(set.NumbersEnd(), 20u);
+  }
+}
+
+// Places of records that were erased, and of records that others destroyed, are in no index made later.
+TEST(InfoDeviceSet, FindsNothingOfErasedAndDestroyedRecords) {
+  InfoDeviceSet set;
+  std::vector<InfoDevicePtr> records;
+  for (const platform::DevInst handle : {1, 2, 3, 4}) {
+    records.push_back(Record(handle, std::u16string(1, static_cast<char16_t>(u'A' + handle)), u"P"));
+    set.Insert(records.back());
+  }
+  EXPECT_TRUE(set.Erase(records[0].Get()));
+  EXPECT_FALSE(set.HasHandle(1));
+  InfoDevicePtr::InARingOfItsOwn(records[1].Get()).Reset();
+  set.DropDestroyed();
+  EXPECT_EQ(Ids(set), "D E");
+  for (const auto& [handle, id] : {std::pair{1u, u"B"}, {2, u"C"}, {3, u"D"}, {4, u"E"}}) {
+    EXPECT_EQ(set.HasHandle(handle), handle > 2);
+    EXPECT_EQ(static_cast<bool>(set.FindByInstanceId(id)), handle > 2);
+  }
+  EXPECT_TRUE(set.Erase(records[2].Get()));
+  EXPECT_EQ(set.FindByParentId(u"P", nullptr), records[3]);
 }
 
 }  // namespace

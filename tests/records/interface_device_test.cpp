@@ -79,6 +79,17 @@ TEST(InterfaceDetail, IsAskedForAgainWhereThePathIsLong) {
     EXPECT_EQ(host.calls, calls) << needed;
     EXPECT_EQ(static_cast<bool>(status), told) << needed;
   }
+  // The shared query asks for nothing without a set, an interface and an element to fill.
+  const platform::SP_DEVICE_INTERFACE_DATA data{};
+  platform::SP_DEVINFO_DATA element;
+  LongPaths host(pc);
+  host.needed = 8;
+  for (const int missing : {1, 2, 3, 0}) {
+    const InterfaceDetail detail = GetInterfaceDetail(host, host, missing == 1 ? 0 : 1, missing == 2 ? nullptr : &data,
+                                                      missing == 3 ? nullptr : &element);
+    EXPECT_EQ(detail.DevicePath(), missing == 0 ? u"x" : u"") << missing;
+    EXPECT_EQ(host.calls, missing == 0 ? 1u : 0u) << missing;
+  }
 }
 
 }  // namespace

@@ -7,6 +7,7 @@
 #include "bench/small_pcs.h"
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/logging_host.h"
+#include "records/device_set.h"
 #include "simulation/pc/simulated_pc.h"
 #include "tests/support/outline.h"
 #include "tests/support/scripted_driver.h"
@@ -70,6 +71,8 @@ TEST(Walk, EveryPortThatAnswersIsInTheTree) {
   CZKUMTopologyWalker walker(pc);
   walker.StartWalk();
   EXPECT_EQ(OutlineOf(walker.m_building), kBusyOutline);
+  const auto nodeless = [](const auto& node) { return node.m_nType == KUDTPortDevice && node.m_devInstHandle == 0; };
+  EXPECT_EQ(Count(walker.m_building, nodeless), 3u);
   EXPECT_EQ(std::pair(walker.m_nConnectedDevices, walker.m_nConnectedHubs), std::pair(4u, 1u));
   EXPECT_EQ(pc.Open(), OpenCounts{});
   walker.Commit();
@@ -191,6 +194,29 @@ TEST(Walk, SourcesAndIdentityOfControllers) {
     const auto interfaces = static_cast<std::ptrdiff_t>(machine.interfaces.size());
     EXPECT_EQ(count(u"GetDeviceInterfaceDetail"), interfaces) << what;
     EXPECT_EQ(count(u"OpenDevice \\\\?\\"), interfaces) << what;
+  }
+}
+
+TEST(Walk, AControllerIsAddedOnce) {
+  Machine machine = OneController(1);
+  AddHcd1(machine, u"{usb}\\0077");
+  SimulatedPc pc(machine);
+  DeviceFile first(pc), second(pc);
+  EXPECT_TRUE(first.Open(u"\\\\.\\HCD0", platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE));
+  EXPECT_TRUE(second.Open(u"\\\\.\\HCD1", platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE));
+  CZKUMTopologyWalker walker(pc);
+  const auto add = [&](const DeviceFile& file) { return walker.AddHostController(file.Get(), u"name"); };
+  EXPECT_FALSE(add(first)) << "no walk has begun";
+  walker.m_building = MakeRecord<CZKUMUsbTreeRootImpl>();
+  EXPECT_TRUE(add(first));
+  EXPECT_FALSE(add(first));
+  second.Close();
+  EXPECT_FALSE(add(second)) << "it has no key";
+  EXPECT_EQ(walker.m_building->m_childs.size(), 1u);
+  const auto controller = MakeRecord<CZKUMHostControllerImpl>();
+  for (const auto& [key, known] : {std::pair{u"{usb}\\0000", true}, {u"{usb}\\0077", false}}) {
+    controller->m_strDriverKeyName = key;
+    EXPECT_EQ(walker.AddRootHub(controller, first.Get()), known);
   }
 }
 
