@@ -12,6 +12,7 @@
 #include "platform/wrappers/failing_host.h"
 #include "records/devnode.h"
 #include "simulation/pc/simulated_pc.h"
+#include "tests/support/best_time.h"
 
 namespace KelvoUHW {
 namespace {
@@ -266,6 +267,18 @@ TEST(LinkToParents, HangsEachRecordBelowTheFirstThatFits) {
     }
     EXPECT_EQ(children, expected);
   }
+}
+
+// Comparing each child with all of its parent's would take some hundred times as long.
+TEST(LinkToParents, ManyChildrenOfOneParentTakeNoLonger) {
+  const auto time = [](bool oneParent) {
+    InfoDeviceSet set;
+    for (std::int32_t i = 0; i < 3'000; ++i) {
+      set.Insert(Record(1, platform::Decimal(i), platform::Decimal(oneParent ? 0 : i - 1)));
+    }
+    return testing_support::BestOfThree([&] { LinkToParents(set); });
+  };
+  EXPECT_LT(time(true), 20 * time(false));
 }
 
 // The set against a plain list and searches from its front.

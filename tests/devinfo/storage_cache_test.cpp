@@ -32,6 +32,7 @@ struct OddStorage final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
   Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
                        void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
+    EXPECT_EQ(in == nullptr, inBytes == 0) << code;
     if (closedFilesAnswer && handle == platform::kInvalidHandle) return Status::Success();
     const Status status = InterceptingHost::DeviceControl(handle, code, in, inBytes, out, outBytes, returned);
     if (shortNumbers && code == platform::kIOCTL_STORAGE_GET_DEVICE_NUMBER) returned = 11;

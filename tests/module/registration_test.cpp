@@ -243,6 +243,7 @@ struct Recorder final : platform::Registry, platform::TypeLibraries, platform::M
     return attributesResult;
   }
   HRESULT GetHelpFile(Library, char16_t* name, std::uint32_t chars, std::uint32_t& length) noexcept override {
+    EXPECT_EQ(name == nullptr, chars == 0);
     length = 6;
     if (chars > length) std::char_traits<char16_t>::copy(name, u"D:\\h.x", 7);
     return helpResult;

@@ -5,6 +5,8 @@
 #include <algorithm>
 
 #include "bench/small_pcs.h"
+#include "devinfo/disk_letters.h"
+#include "devinfo/info_device_cache.h"
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/logging_host.h"
 #include "records/device_set.h"
@@ -313,6 +315,39 @@ struct EndlessHubs final : ScriptedDriver {
   platform::FileHandle hubs = 0, closed = 0;
   std::int32_t names = 0;
 };
+
+// Every set has an element more, of which nothing can be read.
+struct EndlessSets final : platform::wrappers::InterceptingHost {
+  using InterceptingHost::InterceptingHost;
+  platform::Status BeforeCall(const platform::wrappers::HostCall& call) noexcept override {
+    const bool reads =
+        call.operation == Operation::GetDeviceRegistryProperty || call.operation == Operation::GetDeviceInterfaceDetail;
+    return reads ? platform::Status::Failure(platform::kERROR_INVALID_DATA) : platform::Status::Success();
+  }
+  platform::Status EnumDeviceInfo(platform::DeviceSetHandle, std::uint32_t index,
+                                  platform::SP_DEVINFO_DATA& data) noexcept override {
+    return data.DevInst = 1'000 + index, ++devices, platform::Status::Success();
+  }
+  platform::Status EnumDeviceInterfaces(platform::DeviceSetHandle, const platform::Guid&, std::uint32_t,
+                                        platform::SP_DEVICE_INTERFACE_DATA&) noexcept override {
+    return ++interfaces, platform::Status::Success();
+  }
+  std::pair<std::uint32_t, std::uint32_t> Taken() { return {std::exchange(devices, 0), std::exchange(interfaces, 0)}; }
+  std::uint32_t devices = 0, interfaces = 0;
+};
+
+TEST(Walk, SetsWithoutEndAreLeft) {
+  SimulatedPc pc(OneController(0));
+  EndlessSets endless(pc);
+  CZKUMTopologyWalker walker(endless);
+  walker.StartWalk();
+  EXPECT_EQ(endless.Taken(), std::pair(kMostElements, kMostElements));
+  EXPECT_EQ(InfoDeviceCache(endless, walker.Answers()).EnumerateDeviceNodes({}), 0u);
+  EXPECT_EQ(endless.Taken(), std::pair(kMostElements, 0u));
+  EXPECT_EQ(DiskLetterFinder(endless).FindStorageDevInstByDeviceNumber(1, platform::kDRIVE_FIXED, u""), 0u);
+  EXPECT_EQ(endless.Taken(), std::pair(0u, kMostElements));
+  EXPECT_EQ(pc.Open(), OpenCounts{});
+}
 
 TEST(Walk, HubsWithoutEndAreLeft) {
   SimulatedPc pc(OneController(0));
