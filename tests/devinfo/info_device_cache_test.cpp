@@ -122,6 +122,18 @@ TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
   }
 }
 
+// What cannot be read at the moment is missing in the record of a device that is there.
+TEST_F(InfoDeviceCacheTest, ADeviceThatIsThereIsKeptWhateverCannotBeRead) {
+  for (std::uint64_t call = 1, failures = 1; failures != 0; ++call) {
+    Start({BareDevice(u"USB\\P"), BareDevice(u"USB\\A", u"USB\\P")});
+    host->SetPlan({.call = call, .operation = Operation::GetDeviceRegistryProperty});
+    EXPECT_TRUE(Collect());
+    EXPECT_EQ(Ids(cache->Current()), "USB\\A") << call;
+    failures = host->Failures();
+    EXPECT_TRUE(failures != 0 || call > 10);
+  }
+}
+
 TEST_F(InfoDeviceCacheTest, APresentDeviceKeepsItsRecordAndFirstProperties) {
   Device node = BareDevice(u"USB\\A", u"USB\\P");
   node.description = u"first";

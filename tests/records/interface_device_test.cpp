@@ -55,7 +55,7 @@ struct LongPaths final : platform::wrappers::InterceptingHost {
                                             platform::SP_DEVINFO_DATA*) noexcept override {
     ++calls;
     *required = needed;
-    if (bytes < needed) return platform::Status::Failure(platform::kERROR_INSUFFICIENT_BUFFER);
+    if (bytes < needed || refuses) return platform::Status::Failure(platform::kERROR_INSUFFICIENT_BUFFER);
     for (std::uint32_t at = platform::kInterfaceDetailPathOffset; at < needed; at += sizeof(char16_t)) {
       const char16_t unit = at + sizeof unit < needed ? u'x' : u'\0';
       std::memcpy(static_cast<char*>(detail) + at, &unit, sizeof unit);
@@ -63,6 +63,7 @@ struct LongPaths final : platform::wrappers::InterceptingHost {
     return platform::Status::Success();
   }
   std::uint32_t needed = 0, calls = 0;
+  bool refuses = false;  // whatever the size
 };
 
 TEST(InterfaceDetail, IsAskedForAgainWhereThePathIsLong) {
@@ -79,6 +80,12 @@ TEST(InterfaceDetail, IsAskedForAgainWhereThePathIsLong) {
     EXPECT_EQ(host.calls, calls) << needed;
     EXPECT_EQ(static_cast<bool>(status), told) << needed;
   }
+  LongPaths refusing(pc);
+  refusing.needed = 1024;
+  refusing.refuses = true;
+  platform::Status status;
+  EXPECT_FALSE(ReadInterfaceDetail(refusing, 1, {}, nullptr, status));
+  EXPECT_EQ(refusing.calls, 1u) << "it is told no other size";
   // The shared query asks for nothing without a set, an interface and an element to fill.
   const platform::SP_DEVICE_INTERFACE_DATA data{};
   platform::SP_DEVINFO_DATA element;

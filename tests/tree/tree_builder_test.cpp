@@ -184,6 +184,21 @@ TEST(Builds, ARemovedReaderShowsTheCardThatLeft) {
             static_cast<CZKUMUsbTreeNodeImpl*>(removed->m_pParent));
 }
 
+// Its node gets another, in a place of its own.
+TEST(Builds, ARecordThatAClientDestroyedLeavesNoEmptyPlace) {
+  BuildDesk desk(BarePc(), {Stick(u"S1", 1, u'E')});
+  EXPECT_EQ(desk.Build(), "S1 | S1 | - | -");
+  const auto stick = desk.builder.GetDeviceList(kConnectedList)->at(0).StaticCast<CZKUMPortDeviceImpl>();
+  const DeviceList& children = stick->m_infoDevice->m_childs;
+  NodePtr::InARingOfItsOwn(children.at(0).Get()).Reset();
+  EXPECT_EQ(children, DeviceList(1));
+  desk.Do({Gadget(u"M1", 2)});
+  EXPECT_EQ(desk.Build(), "S1 M1 | M1 | - | S1");
+  ASSERT_EQ(children.size(), 1u);
+  ASSERT_TRUE(children[0]);
+  EXPECT_EQ(children[0]->m_strDevInstId, DiskId(u"S1"));
+}
+
 // Unplugs devices while the driver keys are read: each as soon as its own key was asked for.
 struct HostThatLoses final : platform::wrappers::InterceptingHost {
   explicit HostThatLoses(SimulatedPc& simulated) : InterceptingHost(simulated), pc(simulated) {}
