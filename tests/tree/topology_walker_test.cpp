@@ -196,6 +196,7 @@ TEST(Walk, SourcesAndIdentityOfControllers) {
     const auto interfaces = static_cast<std::ptrdiff_t>(machine.interfaces.size());
     EXPECT_EQ(count(u"GetDeviceInterfaceDetail"), interfaces) << what;
     EXPECT_EQ(count(u"OpenDevice \\\\?\\"), interfaces) << what;
+    EXPECT_EQ(count(u"OpenDevice \\\\.\\ "), 0) << what << ": a root hub without name";
   }
 }
 
