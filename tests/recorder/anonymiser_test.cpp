@@ -1,5 +1,7 @@
 #include "recorder/anonymiser.h"
 
+#include <array>
+#include <fstream>
 #include <map>
 
 #include "recorder/recorder.h"
@@ -128,6 +130,77 @@ Machine PersonalPc() {
   pc.drives.push_back({u'S', 3, u"\\??\\C:\\Users\\Anna", {}});
   pc.drives.push_back({u'E', 2, u"\\Device\\HarddiskVolume5", {}});
   return pc;
+}
+
+// Where words were replaced, a star for each of their letters and digits.
+std::string Masked(const std::string& before, const std::string& after) {
+  std::string masked = before;
+  for (std::size_t begin = 0, end = 0; begin < before.size(); begin = end + 1) {
+    for (end = begin; end < before.size() && IsWord(before[end]); ++end) continue;
+    if (before.substr(begin, end - begin) != after.substr(begin, end - begin))
+      masked.replace(begin, end - begin, end - begin, '*');
+  }
+  return masked;
+}
+
+// What stands where, the text, and what becomes of it.
+TEST(Anonymiser, ReplacesWhatLeadsToAPersonAndNothingElse) {
+  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/recorder/anonymised.tsv");
+  Machine pc;
+  pc.interfaces.push_back({platform::GUID_DEVINTERFACE_DISK, u"P", {}});
+  std::vector<std::array<std::string, 3>> rows;
+  for (std::string line; std::getline(file, line);) {
+    const std::size_t first = line.find('\t'), second = line.find('\t', first + 1);
+    rows.push_back({line.substr(0, first), line.substr(first + 1, second - first - 1), line.substr(second + 1)});
+  }
+  // The text of each row, where it stands in the machine: made by the first pass, found again by the second.
+  const auto textOf = [](Machine& machine, const std::string& kind, std::size_t i) -> std::optional<Text>& {
+    machine.devices.resize(std::max(machine.devices.size(), i + 1));
+    auto& device = machine.devices[i];
+    const std::map<std::string, std::u16string> ids = {
+        {"swd", u"SWD\\X\\"}, {"umb", u"umb\\X\\"}, {"wpd", u"WpdBusEnumRoot\\X\\"}, {"daf", u"SWD\\DAFX\\"}};
+    if (device.id.empty())
+      device.id = (ids.contains(kind) ? ids.at(kind) : u"ROOT\\X\\") + platform::Decimal(static_cast<int>(i));
+    if (kind.starts_with("name ")) device.deviceClass = platform::FromUtf8(kind.substr(5));
+    return kind == "daf" ? device.description : device.friendlyName;
+  };
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    const Text text = platform::FromUtf8(rows[i][1]);
+    textOf(pc, rows[i][0], i);
+    if (rows[i][0] == "id")
+      pc.devices[i].id = text;
+    else if (rows[i][0] == "note")
+      pc.notes.push_back(text);
+    else if (rows[i][0] == "serial")
+      pc.storage.emplace_back().serial = rows[i][1];
+    else if (rows[i][0] == "media")
+      pc.storage.emplace_back().mediaSerialNumber = text;
+    else if (rows[i][0] == "volume")
+      pc.volumes.emplace_back().name = text;
+    else if (rows[i][0] == "path")
+      pc.volumes.emplace_back().paths = {text};
+    else if (rows[i][0] == "dos")
+      pc.drives.emplace_back().dosDevice = text;
+    else
+      textOf(pc, rows[i][0], i) = text;
+  }
+  pc.devices[0].classGuid = u"{36FC9E60-C465-11CF-8056-444553540000}";
+  pc.drives.emplace_back();
+  Anonymiser().Anonymise(pc);
+  std::size_t notes = 0, storage = 0, volumes = 0, drives = 0;
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    const auto& [kind, before, masked] = rows[i];
+    const Text after = kind == "id"       ? pc.devices[i].id
+                       : kind == "note"   ? pc.notes[notes++]
+                       : kind == "serial" ? platform::FromUtf8(*pc.storage[storage++].serial)
+                       : kind == "media"  ? *pc.storage[storage++].mediaSerialNumber
+                       : kind == "volume" ? pc.volumes[volumes++].name
+                       : kind == "path"   ? pc.volumes[volumes++].paths[0]
+                       : kind == "dos"    ? *pc.drives[drives++].dosDevice
+                                          : *textOf(pc, kind, i);
+    EXPECT_EQ(Masked(before, ToUtf8(after)), masked) << kind << "\t" << before;
+  }
+  EXPECT_EQ(rows.size(), 66u);
 }
 
 TEST(Anonymiser, LeavesNothingOfAPerson) {
