@@ -29,13 +29,18 @@ TEST(Case, PairsMapToEachOther) {
   }
   EXPECT_EQ(ToUpper(u'\x03C2'), u'\x03A3') << "final sigma is raised";
   EXPECT_EQ(ToLower(u'\x03C2'), u'\x03C2');
-  int raised = 0;
+  unsigned raised = 0, raisedBack = 0, sum = 0;
   for (unsigned unit = 0; unit < 0x10000; ++unit) {
     const auto lowered = ToLower(static_cast<char16_t>(unit));
     raised += lowered == unit ? 0 : 1;
+    raisedBack += ToUpper(static_cast<char16_t>(unit)) == unit ? 0 : 1;
+    sum += lowered == unit ? 0 : unit * lowered;
     ASSERT_TRUE(lowered == unit || ToUpper(lowered) == unit) << std::hex << unit;
   }
-  EXPECT_EQ(raised, 531) << "letters of which the upper one is lowered";
+  EXPECT_EQ(raised, 531u) << "letters of which the upper one is lowered";
+  EXPECT_EQ(raisedBack, 532u) << "and the final sigma";
+  EXPECT_EQ(sum, 0x7998CACAu)
+      << "of upper by lower, over the one-to-one pairs of these scripts in the tables of Unicode";
 }
 
 TEST(Texts, CasePartsAndReplacement) {

@@ -6,9 +6,7 @@
 
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/failing_host.h"
-#include "platform/wrappers/failing_registry.h"
 #include "platform/wrappers/logging_host.h"
-#include "simulation/process/registry.h"
 #include "tests/simulation/stick_pc.h"
 
 namespace platform::wrappers {
@@ -132,34 +130,6 @@ TEST(Wrappers, FailWhatThePlanSays) {
     AskEverything(host);
     EXPECT_EQ(Counts(host.Calls(), host.Failures()), Counts(calls, failures));
   }
-}
-
-TEST(Wrappers, FailEachCallOfARegistry) {
-  simulated::SimulatedRegistry registry;
-  FailingRegistry failing(registry);
-  const auto askEverything = [&] {
-    RegistryKeyHandle made = 7, opened = 7;
-    std::uint32_t number = 0, chars = 20;
-    char16_t name[20];
-    const std::uint32_t errors[] = {Error(failing.CreateKey(kHKEY_CLASSES_ROOT, u"Key", kKEY_WRITE, made, number)),
-                                    Error(failing.OpenKey(kHKEY_CLASSES_ROOT, u"Key", kKEY_READ, opened)),
-                                    Error(failing.SetValue(made, u"v", kREG_SZ, u"", 2)),
-                                    Error(failing.QueryValue(opened, u"v", nullptr, nullptr, number)),
-                                    Error(failing.EnumKey(kHKEY_CLASSES_ROOT, 0, name, chars)),
-                                    Error(failing.DeleteValue(made, u"v")),
-                                    Error(failing.DeleteKey(kHKEY_CLASSES_ROOT, u"Key"))};
-    for (const RegistryKeyHandle key : {made, opened}) EXPECT_TRUE(key == kNoRegistryKey || failing.CloseKey(key));
-    return std::vector<std::uint32_t>(std::begin(errors), std::end(errors));
-  };
-  EXPECT_EQ(askEverything(), std::vector<std::uint32_t>(7, 0));
-  EXPECT_EQ(failing.Calls(), 7u);
-  failing.SetPlan({.call = 1, .onwards = true, .error = 8});
-  EXPECT_EQ(askEverything(), std::vector<std::uint32_t>(7, 8));
-  failing.SetPlan({.call = 5, .onwards = false, .error = 8});
-  EXPECT_EQ(askEverything(), (std::vector<std::uint32_t>{0, 0, 0, 0, 8, 0, 0}));
-  failing.SetPlan({.call = 6, .onwards = true, .error = 8});
-  EXPECT_EQ(askEverything(), (std::vector<std::uint32_t>{0, 0, 0, 0, 0, 8, 8}));
-  EXPECT_TRUE(registry.Misuses().empty());
 }
 
 }  // namespace
