@@ -23,10 +23,10 @@ using Json = nlohmann::ordered_json;
 using Args = std::vector<std::string>;
 using testing_support::Golden;
 
-inline std::vector<std::string> Lines(const std::string& text) {
+inline std::vector<std::string> Lines(const std::string& text, char end = '\n') {
   std::vector<std::string> lines;
   std::istringstream stream(text);
-  for (std::string line; std::getline(stream, line);) lines.push_back(line);
+  for (std::string line; std::getline(stream, line, end);) lines.push_back(line);
   return lines;
 }
 
