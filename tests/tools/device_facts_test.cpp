@@ -1,11 +1,9 @@
-// What the client makes of devices that no PC at hand has, told by the copies of nodes that its commands work on.
 #include "tools/zkusb/device_facts.h"
 
 #include <sstream>
 
 #include "tests/tools/client.h"
 #include "tools/zkusb/commands.h"
-#include "tools/zkusb/json.h"
 
 namespace zkusb {
 namespace {
@@ -83,10 +81,6 @@ TEST(DeviceFacts, OfDevicesThatNoPcAtHandHas) {
   }
   std::ifstream file(ZKUSB_SOURCE_DIR "/tests/tools/odd-devices.txt", std::ios::binary);
   EXPECT_EQ(stream.str(), std::string((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>()));
-  std::string speeds;
-  for (const PlacedDevice& placed : PortDevices(root))
-    speeds += NodeJson(*placed.device, placed.place).at("speed").get<std::string>() + " ";
-  EXPECT_EQ(speeds, "high unknown (3) full low low ");
 }
 
 }  // namespace

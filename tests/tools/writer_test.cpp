@@ -77,8 +77,8 @@ TEST(Writer, FitsALineIntoItsColumns) {
   }
   // In parts, and never within a pair.
   for (const std::size_t before : {65534u, 65535u, 65536u}) {
-    const std::string long_(before, 'x');
-    EXPECT_EQ(Written([&](Writer& out) { out.Verbatim(times(before, u'x') + u"\U0001F5B4y"); }), long_ + "\U0001F5B4y");
+    EXPECT_EQ(Written([&](Writer& out) { out.Verbatim(times(before, u'x') + u"\U0001F5B4y"); }),
+              std::string(before, 'x') + "\U0001F5B4y");
   }
   EXPECT_EQ(Tidied(u"  USB   SanDisk 3.2Gen1  "), u"USB SanDisk 3.2Gen1");
   EXPECT_EQ(Tidied(u"    "), u"");

@@ -30,8 +30,7 @@ TEST(Generated, ASmallPcIsTheOneAtHand) {
   const std::string expected((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
   const Machine deep = GenerateMachine(GeneratedShape::Deep, 4), wide = GenerateMachine(GeneratedShape::Wide, 13);
   const std::string found = WriteMachine(deep) + WriteScript({PlugOneMoreStick(deep)}, {});
-  const auto differs = std::ranges::mismatch(found, expected).in1;
-  EXPECT_TRUE(found == expected) << "from " << std::string(differs, found.end()).substr(0, 200);
+  EXPECT_TRUE(found == expected) << found;
   const Plug more = std::get<Plug>(PlugOneMoreStick(wide).change);
   EXPECT_EQ(more.ports.at(0).hub, wide.hubs[9].name);
   EXPECT_EQ(more.ports[0].index, 2u);
