@@ -82,7 +82,7 @@ std::string Outline(const Machine& pc) {
   return text;
 }
 
-// How many devices, interfaces, controllers, hubs, storages, volumes, drives and notes are left without an answer.
+// What is left without an answer, section by section, and the notes.
 TEST(Recorder, LeavesOutWhatACallWouldHaveTold) {
   const Machine machine = platform::simulated::LoadMachine(ZKUSB_SOURCE_DIR "/tests/recorder/whole-pc.json");
   SimulatedPc pc(machine);
@@ -141,7 +141,6 @@ TEST(Recorder, WritesDownWhatAFileCanSay) {
   EXPECT_EQ(WriteMachine(RecordedCleanly(machine)), WriteMachine(expected));
 }
 
-// A device manager whose parents changed while it was asked.
 struct ChangingPc final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
   platform::Status BeforeCall(const platform::wrappers::HostCall&) noexcept override {
