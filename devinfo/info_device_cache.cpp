@@ -323,8 +323,7 @@ void InfoDeviceCache::Commit() {
 }
 
 void InfoDeviceCache::AttachToParentInfoDevice(const NodePtr& node) const {
-  const InfoDevicePtr& parent = m_current.FindByInstanceId(node->m_strDevInstIdParent);
-  if (parent && parent != node) AddChild(node, parent.Get());
+  AddChild(node, m_current.FindByInstanceId(node->m_strDevInstIdParent).Get());
 }
 
 }  // namespace KelvoUHW

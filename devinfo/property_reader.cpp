@@ -121,7 +121,6 @@ bool ElementReader::Read(const platform::SP_DEVINFO_DATA& element, std::uint32_t
 
 bool ElementReader::ReadAndKeep(const platform::SP_DEVINFO_DATA& element, std::uint32_t property,
                                 PropertyAnswer& answer) {
-  if (m_answers.FindProperty(element.DevInst, property, answer)) return answer.has;
   const platform::Status status = Ask(element, property, answer);
   if (status || status.error == platform::kERROR_INVALID_DATA) {
     m_answers.KeepProperty(element.DevInst, property, answer);

@@ -31,8 +31,7 @@ ComPtr<IUnknown> SinkSlots::Take(DWORD cookie) noexcept {
 
 ComPtr<IUnknown> SinkSlots::At(LONG index) const noexcept {
   const std::lock_guard lock(m_lock);
-  const auto place = static_cast<std::size_t>(index);
-  return place < m_slots.size() ? ComPtr<IUnknown>(m_slots[place]) : ComPtr<IUnknown>();
+  return ComPtr<IUnknown>(m_slots[static_cast<std::size_t>(index)]);
 }
 
 std::vector<SinkSlots::Connection> SinkSlots::Occupied() const {

@@ -32,7 +32,7 @@ class SinkSlots {
   // Empties the slot and hands its reference to the caller, who lets go outside the lock; empty for
   // a cookie that names no sink.
   ComPtr<IUnknown> Take(DWORD cookie) noexcept;
-  // Empty for a free slot and behind the end.
+  // Empty for a free slot. `index` is below a Size() that was told before.
   ComPtr<IUnknown> At(LONG index) const noexcept;
   // Free ones included; read without the lock.
   LONG Size() const noexcept { return m_nSlots; }

@@ -24,17 +24,9 @@ void CThreadLock::Lock() {
 
 void CThreadLock::Unlock() noexcept {
   if (m_nOwner != platform::CurrentSystem().threads->CurrentThreadId()) return;
-  if (m_nCount > 1) {
-    --m_nCount;
-    return;
-  }
-  m_nCount = 0;
-  m_nOwner.exchange(0);
+  if (--m_nCount == 0) m_nOwner = 0;
 }
 
-void CThreadLock::Forget() noexcept {
-  m_nCount = 0;
-  m_nOwner = 0;
-}
+void CThreadLock::Forget() noexcept { m_nOwner = 0; }
 
 }  // namespace KelvoUHW

@@ -24,7 +24,7 @@ class CThreadLock {
   void Forget() noexcept;
 
  private:
-  std::int32_t m_nCount = 0;                // the owner's alone; 0 when free
+  std::int32_t m_nCount = 0;                // the owner's alone; no matter when free
   std::atomic<std::uint32_t> m_nOwner = 0;  // a thread's id; 0 when free
 };
 

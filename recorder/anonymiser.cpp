@@ -13,6 +13,7 @@ using platform::simulated::Device;
 constexpr std::size_t kFewestUnits = 4;     // a shorter serial number tells nobody apart
 constexpr std::size_t kFewestAnywhere = 6;  // a shorter one may be part of something else
 constexpr std::size_t kAddressUnits = 12;
+constexpr std::u16string_view kSeparators = u"\\#&";  // of the parts of ids and paths
 
 bool IsHex(std::u16string_view text) {
   return std::all_of(text.begin(), text.end(), [](char16_t unit) {
@@ -169,7 +170,9 @@ void Anonymiser::CollectSerial(std::u16string_view serial) {
   if (units < kFewestUnits || (units == kFewestUnits && IsNumber(serial)) || m_texts.Has(serial)) {
     return;
   }
-  m_serials += (units < kFewestAnywhere ? m_instances : m_texts).Add(serial) ? 1 : 0;
+  // An instance ends at a separator, so one that has a separator is looked for everywhere.
+  const bool isPart = units < kFewestAnywhere && serial.find_first_of(kSeparators) == serial.npos;
+  m_serials += (isPart ? m_instances : m_texts).Add(serial) ? 1 : 0;
 }
 
 void Anonymiser::ReplaceText(Text& text) const {
@@ -179,7 +182,7 @@ void Anonymiser::ReplaceText(Text& text) const {
   Text out;
   std::size_t at = 0;
   while (at <= text.size()) {
-    const std::size_t end = std::min(text.find_first_of(u"\\#&", at), text.size());
+    const std::size_t end = std::min(text.find_first_of(kSeparators, at), text.size());
     out += m_instances.Of(text.substr(at, end - at));
     if (end < text.size()) out += text[end];
     at = end + 1;

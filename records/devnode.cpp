@@ -158,8 +158,10 @@ void DriverKeyIndex::Fill() {
 // A key that an earlier node has is entered behind that one, and never found.
 void DriverKeyIndex::Add(std::u16string_view key, platform::DevInst node) {
   const std::u16string_view keyClass = ClassOf(key);
-  m_nodes.push_back({m_rests.size(), PlaceOfClass(keyClass), node});
-  m_rests += key.substr(keyClass.size());
+  const std::u16string_view rest = key.substr(keyClass.size());
+  m_nodes.push_back({static_cast<std::uint32_t>(m_rests.size()),
+                     static_cast<std::uint32_t>(rest.size()), PlaceOfClass(keyClass), node});
+  m_rests += rest;
   m_index.Add(platform::HashOf(key), static_cast<platform::FlatIndex::Entry>(m_nodes.size() - 1),
               [&](auto entry) { return IsKeyOf(entry, key); });
 }
@@ -177,12 +179,11 @@ std::uint32_t DriverKeyIndex::PlaceOfClass(std::u16string_view keyClass) {
 
 bool DriverKeyIndex::IsKeyOf(platform::FlatIndex::Entry entry,
                              std::u16string_view key) const noexcept {
-  const std::size_t begin = m_nodes[entry].restBegin;
-  const std::size_t end =
-      entry + 1 < m_nodes.size() ? m_nodes[entry + 1].restBegin : m_rests.size();
-  const std::u16string_view keyClass = m_classes[m_nodes[entry].keyClass];
+  const Node& node = m_nodes[entry];
+  const std::u16string_view keyClass = m_classes[node.keyClass];
   return key.starts_with(keyClass) &&
-         key.substr(keyClass.size()) == std::u16string_view(m_rests).substr(begin, end - begin);
+         key.substr(keyClass.size()) ==
+             std::u16string_view(m_rests).substr(node.restBegin, node.restChars);
 }
 
 }  // namespace KelvoUHW

@@ -52,8 +52,8 @@ class DriverKeyIndex {
  private:
   // A key is its class, "{...}", which most others have too, and what tells it from those.
   struct Node {
-    std::size_t restBegin;   // in m_rests, up to where the next one's begins
-    std::uint32_t keyClass;  // position in m_classes
+    std::uint32_t restBegin, restChars;  // in m_rests
+    std::uint32_t keyClass;              // position in m_classes
     platform::DevInst handle;
   };
 

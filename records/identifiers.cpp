@@ -39,8 +39,8 @@ class Scanner {
     return true;
   }
 
-  // One "%x" field. Blanks in front do not count against `width`, sign and "0x" do. A "0x" without
-  // a digit behind it within the width is no number.
+  // One "%x" field of one character at least. Blanks in front do not count against `width`, sign
+  // and "0x" do. A "0x" without a digit behind it within the width is no number.
   bool Hex(std::uint32_t& value, std::size_t width = kNoWidth) noexcept {
     while (IsBlank(Peek())) ++m_taken;
     std::size_t left = width;
@@ -48,8 +48,8 @@ class Scanner {
       ++m_taken;
       --left;
     };
-    const bool negative = left > 0 && Peek() == u'-';
-    if (left > 0 && (negative || Peek() == u'+')) take();
+    const bool negative = Peek() == u'-';
+    if (negative || Peek() == u'+') take();
     if (left >= 2 && Peek() == u'0' && (Peek(1) == u'x' || Peek(1) == u'X')) {
       take();
       take();

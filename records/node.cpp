@@ -1,10 +1,9 @@
 #include "records/node.h"
 
 #include <algorithm>
-#include <mutex>
+#include <atomic>
 #include <utility>
 
-#include "platform/process_lock.h"
 #include "platform/text.h"
 #include "records/devnode.h"
 #include "records/record_lock.h"
@@ -20,25 +19,24 @@ struct Deletions {
 };
 thread_local Deletions t_deletions;
 
-// The records of all threads that are deleted when nobody uses records any more.
-constinit platform::ProcessLock g_usesLock;
-int g_nUses = 0;
-CZKUMUsbTreeNodeImpl* g_keptForUses = nullptr;
+// The records of all threads that are deleted when nobody uses records any more. Uses come and go
+// as readers of the record lock, and records are added by its writer.
+constinit std::atomic<int> g_nUses = 0;
+constinit std::atomic<CZKUMUsbTreeNodeImpl*> g_keptForUses = nullptr;
 
 }  // namespace
 
 // As a reader: a deletion that has begun ends first, and the next one sees the count.
 RecordsInUse::RecordsInUse() noexcept {
   const RecordReadLock reading;
-  const std::lock_guard lock(g_usesLock);
   ++g_nUses;
 }
 
 RecordsInUse::~RecordsInUse() {
   CZKUMUsbTreeNodeImpl* kept = nullptr;
   {
-    const std::lock_guard lock(g_usesLock);
-    if (--g_nUses == 0) kept = std::exchange(g_keptForUses, nullptr);
+    const RecordReadLock reading;
+    if (--g_nUses == 0) kept = g_keptForUses.exchange(nullptr);
   }
   while (kept) {
     CZKUMUsbTreeNodeImpl* const next = std::exchange(kept->m_pNextToDelete, nullptr);
@@ -47,13 +45,8 @@ RecordsInUse::~RecordsInUse() {
   }
 }
 
-void CZKUMUsbTreeNodeImpl::DeleteLater(CZKUMUsbTreeNodeImpl* record,
-                                       CZKUMUsbTreeNodeImpl*& list) noexcept {
-  record->m_pNextToDelete = std::exchange(list, record);
-}
-
 void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
-  DeleteLater(record, t_deletions.waiting);
+  record->m_pNextToDelete = std::exchange(t_deletions.waiting, record);
   if (t_deletions.running) return;
   // Whoever reads follows links to records that it does not hold, a build while it joins them and a
   // client on the way to a parent: none may die under it.
@@ -61,13 +54,10 @@ void CZKUMUsbTreeNodeImpl::Destroy(CZKUMUsbTreeNodeImpl* record) noexcept {
   t_deletions.running = true;
   while (CZKUMUsbTreeNodeImpl* next = t_deletions.waiting) {
     t_deletions.waiting = next->m_pNextToDelete;
-    {
-      // Asked with the lock held: a build may have begun while this thread waited for it.
-      const std::lock_guard uses(g_usesLock);
-      if (g_nUses > 0 && next->IsHeld()) {
-        DeleteLater(next, g_keptForUses);
-        continue;
-      }
+    // Asked with the lock held: a build may have begun while this thread waited for it.
+    if (g_nUses > 0 && next->IsHeld()) {
+      next->m_pNextToDelete = g_keptForUses.exchange(next);
+      continue;
     }
     next->LetAllGo();
     delete next;
@@ -149,7 +139,6 @@ bool CZKUMUsbTreeNodeImpl::HasChildWithDriverKey(const std::u16string& driverKey
 }
 
 bool CZKUMUsbTreeNodeImpl::IsSameNode(const CZKUMUsbTreeNodeImpl& other) const noexcept {
-  if (this == &other) return true;
   using platform::SameText;
   return m_nProductId == other.m_nProductId && SameText(m_strDevInstId, other.m_strDevInstId) &&
          SameText(m_strProduct, other.m_strProduct) &&

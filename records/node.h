@@ -98,8 +98,6 @@ class CZKUMUsbTreeNodeImpl : public NodeIdentity, public RecordRings {
 
  private:
   friend class RecordsInUse;
-  static void DeleteLater(CZKUMUsbTreeNodeImpl* record, CZKUMUsbTreeNodeImpl*& list) noexcept;
-
   CZKUMUsbTreeNodeImpl* m_pNextToDelete = nullptr;
 
  protected:

@@ -49,7 +49,7 @@ class Generator {
     std::size_t left = devices;
     for (std::size_t i = 0; i < kControllers; ++i) {
       const std::size_t share = Share(chains, kControllers, i);
-      const HubPlace root = AddController(i, share + 1 <= kMostPorts ? share + 1 : share);
+      const HubPlace root = AddController(i, std::min(share + 1, kMostPorts));
       for (std::size_t chain = 0; chain < share; ++chain) {
         HubPlace hub = AddHub(root, chain, 4);
         for (std::size_t level = 2; level < kChainLength; ++level) hub = AddHub(hub, 0, 4);

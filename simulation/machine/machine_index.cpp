@@ -6,56 +6,13 @@
 #include "platform/text.h"
 
 namespace platform::simulated {
-namespace {
-
-// The value of a hexadecimal digit, or 16.
-unsigned DigitValue(char16_t unit) {
-  if (unit >= u'0' && unit <= u'9') return unit - u'0';
-  const char16_t lowered = ToLower(unit);
-  return lowered >= u'a' && lowered <= u'f' ? lowered - u'a' + 10u : 16u;
-}
-
-// Reads `digits` digits at the start of `text` and takes them away; false where they are none.
-template <class Number>
-bool TakeHex(std::u16string_view& text, std::size_t digits, Number& number) {
-  std::uint64_t value = 0;
-  for (std::size_t i = 0; i < digits; ++i) {
-    const unsigned digit = i < text.size() ? DigitValue(text[i]) : 16u;
-    if (digit == 16) return false;
-    value = value * 16 + digit;
-  }
-  text.remove_prefix(digits);
-  number = static_cast<Number>(value);
-  return true;
-}
-
-bool TakeUnit(std::u16string_view& text, char16_t unit) {
-  if (text.empty() || text.front() != unit) return false;
-  text.remove_prefix(1);
-  return true;
-}
-
-bool ParseGuid(std::u16string_view text, Guid& guid) {
-  if (!TakeUnit(text, u'{') || !TakeHex(text, 8, guid.Data1) || !TakeUnit(text, u'-') ||
-      !TakeHex(text, 4, guid.Data2) || !TakeUnit(text, u'-') || !TakeHex(text, 4, guid.Data3)) {
-    return false;
-  }
-  for (std::size_t i = 0; i < guid.Data4.size(); ++i) {
-    if ((i == 0 || i == 2) && !TakeUnit(text, u'-')) return false;
-    if (!TakeHex(text, 2, guid.Data4[i])) return false;
-  }
-  return text == u"}";
-}
-
-}  // namespace
 
 bool GuidOrder::operator()(const Guid& a, const Guid& b) const noexcept {
   return std::memcmp(&a, &b, sizeof(Guid)) < 0;
 }
 
 Guid GuidOf(const std::optional<Text>& text) {
-  Guid guid;
-  return text && ParseGuid(*text, guid) ? guid : kNullGuid;
+  return text ? ParseGuid(*text).value_or(kNullGuid) : kNullGuid;
 }
 
 bool IsDriveName(std::u16string_view loweredName) {

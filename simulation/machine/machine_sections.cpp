@@ -1,8 +1,5 @@
 #include "simulation/machine/machine_sections.h"
 
-#include <algorithm>
-#include <array>
-
 #include "platform/text.h"
 
 namespace platform::simulated {
@@ -10,32 +7,6 @@ namespace {
 
 constexpr std::size_t kMostIdCharacters = 199;  // 200 with the zero behind it
 constexpr std::size_t kMostHubPorts = 255;
-
-// A GUID as "{8-4-4-4-12}", digits in either case.
-std::optional<Guid> GuidFrom(const std::u16string& text) {
-  constexpr std::u16string_view kShape = u"{xxxxxxxx-xxxx-xxxx-xxxx-xxxxxxxxxxxx}";
-  if (text.size() != kShape.size()) return std::nullopt;
-  std::array<std::uint8_t, 16> bytes{};
-  std::size_t digits = 0;
-  for (std::size_t i = 0; i < text.size(); ++i) {
-    if (kShape[i] != u'x') {
-      if (text[i] != kShape[i]) return std::nullopt;
-      continue;
-    }
-    constexpr std::u16string_view kDigits = u"0123456789abcdef";
-    const std::size_t digit = kDigits.find(ToLower(text[i]));
-    if (digit == std::u16string_view::npos) return std::nullopt;
-    std::uint8_t& byte = bytes[digits++ / 2];
-    byte = static_cast<std::uint8_t>(byte * std::size_t{16} + digit);
-  }
-  Guid guid;
-  guid.Data1 = std::uint32_t{bytes[0]} << 24 | std::uint32_t{bytes[1]} << 16 |
-               std::uint32_t{bytes[2]} << 8 | bytes[3];
-  guid.Data2 = static_cast<std::uint16_t>(bytes[4] << 8 | bytes[5]);
-  guid.Data3 = static_cast<std::uint16_t>(bytes[6] << 8 | bytes[7]);
-  std::copy(bytes.begin() + 8, bytes.end(), guid.Data4.begin());
-  return guid;
-}
 
 // A text by which something is found or opened.
 struct Name {
@@ -83,7 +54,7 @@ void FromJson(const JsonValue& value, DriveType& out) {
 }  // namespace
 
 void FromJson(const JsonValue& value, Guid& out) {
-  const std::optional<Guid> guid = GuidFrom(value.AsText());
+  const std::optional<Guid> guid = ParseGuid(value.AsText());
   if (!guid) value.Fail("is not a GUID");
   out = *guid;
 }

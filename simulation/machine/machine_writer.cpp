@@ -295,7 +295,4 @@ std::string WriteScript(const Script& script, const ScriptText& about) {
   return Printed(json);
 }
 
-std::string WriteRecord(const Device& device) { return JsonOf(device).dump(); }
-std::string WriteRecord(const Port& port) { return JsonOf(port).dump(); }
-
 }  // namespace platform::simulated

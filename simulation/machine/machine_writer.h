@@ -20,8 +20,4 @@ struct ScriptText {
 };
 std::string WriteScript(const Script& script, const ScriptText& about);
 
-// The text of one record, which two equal records have in common.
-std::string WriteRecord(const Device& device);
-std::string WriteRecord(const Port& port);
-
 }  // namespace platform::simulated

@@ -174,6 +174,7 @@ TEST_F(Collection, RefusesWhatItCannotDo) {
   const auto without = Make(nullptr);
   EXPECT_EQ(Next(without.Get(), 1), "E_FAIL 0:");
   EXPECT_EQ(without->Reset(), E_FAIL);
+  for (const ULONG celt : {0u, 1u}) EXPECT_EQ(without->Skip(celt), celt == 0 ? S_OK : E_FAIL);
 }
 
 TEST_F(Collection, ACopyThatFailsTakesTheOthersOfItsCallBack) {

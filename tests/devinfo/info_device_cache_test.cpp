@@ -12,6 +12,7 @@
 #include "platform/wrappers/failing_host.h"
 #include "records/devnode.h"
 #include "simulation/pc/simulated_pc.h"
+#include "tests/support/best_time.h"
 
 namespace KelvoUHW {
 namespace {
@@ -90,7 +91,9 @@ TEST_F(InfoDeviceCacheTest, AdmitsByTheStartOfTheParentId) {
     devices.insert(devices.end(), {BareDevice(parent), BareDevice(u"_" + parent, parent)});
   }
   Start(devices);
+  host->SetPlan({.operation = Operation::EnumDeviceInfo});
   EXPECT_TRUE(Collect());
+  EXPECT_EQ(host->Calls(), devices.size() + 1);
   EXPECT_EQ(Ids(cache->Current()),
             "V\\_??_SCSI#DISK#1#{x} _USB\\P _USBSTOR\\P _IUSB\\P _SD\\P _SDX\\P _PCI\\P _SCSI\\P");
 }
@@ -116,6 +119,18 @@ TEST_F(InfoDeviceCacheTest, LeftOversReachTheNextNode) {
                   record->Location + u"|" + std::u16string(record->EnumName) + u"|" + record->m_strSerialNumber + u"|" +
                   std::u16string(record->Service),
               texts);
+  }
+}
+
+// What cannot be read at the moment is missing in the record of a device that is there.
+TEST_F(InfoDeviceCacheTest, ADeviceThatIsThereIsKeptWhateverCannotBeRead) {
+  for (std::uint64_t call = 1, failures = 1; failures != 0; ++call) {
+    Start({BareDevice(u"USB\\P"), BareDevice(u"USB\\A", u"USB\\P")});
+    host->SetPlan({.call = call, .operation = Operation::GetDeviceRegistryProperty});
+    EXPECT_TRUE(Collect());
+    EXPECT_EQ(Ids(cache->Current()), "USB\\A") << call;
+    failures = host->Failures();
+    EXPECT_TRUE(failures != 0 || call > 10);
   }
 }
 
@@ -266,6 +281,18 @@ TEST(LinkToParents, HangsEachRecordBelowTheFirstThatFits) {
   }
 }
 
+// Comparing each child with all of its parent's would take some hundred times as long.
+TEST(LinkToParents, ManyChildrenOfOneParentTakeNoLonger) {
+  const auto time = [](bool oneParent) {
+    InfoDeviceSet set;
+    for (std::int32_t i = 0; i < 3'000; ++i) {
+      set.Insert(Record(1, platform::Decimal(i), platform::Decimal(oneParent ? 0 : i - 1)));
+    }
+    return testing_support::BestOfThree([&] { LinkToParents(set); });
+  };
+  EXPECT_LT(time(true), 20 * time(false));
+}
+
 // The set against a plain list and searches from its front.
 TEST(InfoDeviceSet, AnswersAsALinearSearchDoes) {
   std::mt19937 random(1);
@@ -310,6 +337,32 @@ TEST(InfoDeviceSet, AnswersAsALinearSearchDoes) {
   set.Clear();
   EXPECT_TRUE(set.empty());
   for (const InfoDevicePtr& record : all) EXPECT_FALSE(set.HasRecord(record.Get()));
+  // Those that left leave no room behind them for good.
+  for (int round = 0; round < 100; ++round) {
+    EXPECT_TRUE(set.Insert(all[0]) && set.Erase(all[0].Get()));
+    EXPECT_LE(set.NumbersEnd(), 20u);
+  }
+}
+
+// Places of records that were erased, and of records that others destroyed, are in no index made later.
+TEST(InfoDeviceSet, FindsNothingOfErasedAndDestroyedRecords) {
+  InfoDeviceSet set;
+  std::vector<InfoDevicePtr> records;
+  for (const platform::DevInst handle : {1, 2, 3, 4}) {
+    records.push_back(Record(handle, std::u16string(1, static_cast<char16_t>(u'A' + handle)), u"P"));
+    set.Insert(records.back());
+  }
+  EXPECT_TRUE(set.Erase(records[0].Get()));
+  EXPECT_FALSE(set.HasHandle(1));
+  InfoDevicePtr::InARingOfItsOwn(records[1].Get()).Reset();
+  set.DropDestroyed();
+  EXPECT_EQ(Ids(set), "D E");
+  for (const auto& [handle, id] : {std::pair{1u, u"B"}, {2, u"C"}, {3, u"D"}, {4, u"E"}}) {
+    EXPECT_EQ(set.HasHandle(handle), handle > 2);
+    EXPECT_EQ(static_cast<bool>(set.FindByInstanceId(id)), handle > 2);
+  }
+  EXPECT_TRUE(set.Erase(records[2].Get()));
+  EXPECT_EQ(set.FindByParentId(u"P", nullptr), records[3]);
 }
 
 }  // namespace

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <array>
 #include <cstring>
 #include <map>
 #include <sstream>
@@ -77,7 +79,9 @@ TEST(DeviceProperty, IsReadWithinWhatWasReceived) {
       {{.text = u"abc", .claimedBytes = 0xFFFFFFFF, .outgrown = 1}, u"failure 122", {kFirst}},
       {{.failure = kERROR_INVALID_DATA}, u"failure 13", {kFirst}},
       {{.failure = 0}, u"failure 0", {kFirst}},
-      {{.text = tooLong}, tooLong, {kFirst, kFirst + 2}}};
+      {{.text = tooLong}, tooLong, {kFirst, kFirst + 2}},
+      {{.text = u"a", .claimedBytes = kMostPropertyBytes + 1, .outgrown = 1}, u"failure 122", {kFirst + 2}},
+      {{.text = u"a", .claimedBytes = kMostPropertyBytes, .outgrown = 1}, u"a", {kFirst + 2, kMostPropertyBytes}}};
   PropertyBuffer buffer;
   for (const auto& [value, read, offered] : cases) {
     ScriptedSets sets;
@@ -95,11 +99,75 @@ TEST(DeviceProperty, IsReadWithinWhatWasReceived) {
       {{.text = u"ABCDEF", .claimedBytes = 3}, u"ABC"},
       {{.text = std::u16string(300, u'L')}, std::u16string(300, u'L')},
       {{.text = std::u16string(300, u'L'), .claimedBytes = 0xFFFFFFFF}, u""},
+      {{.text = std::u16string(300, u'L'), .claimedBytes = 65537}, u""},
+      {{.text = std::u16string(300, u'L'), .claimedBytes = 65536}, std::u16string(300, u'L')},
+      // There is room for one character more than was told.
+      {{.text = std::u16string(302, u'L'), .withoutZero = true, .claimedBytes = 301}, std::u16string(302, u'L')},
       {{.text = u"AB", .claimedBytes = 0}, u""}};
   for (const auto& [value, id] : ids) {
     ScriptedSets sets;
     sets.id = value;
     EXPECT_EQ(GetInstanceId(sets, 1, {}), id);
+  }
+}
+
+// What is kept answers like what was read: to a reader with a buffer of eight bytes, too, of which the last character
+// has to be a zero. Of an odd number of bytes the last one counts as a character.
+TEST(DeviceProperty, IsKeptAsItWasRead) {
+  const std::tuple<Value, std::optional<std::u16string>, std::u16string> cases[] = {
+      {{.text = u"abc"}, u"abc", u"abc"},
+      {{.text = u"abc", .withoutZero = true}, u"abc", u"abc"},
+      {{.text = u"ab\u4363", .claimedAfter = 5}, u"abc", u"ab"},
+      {{.text = std::u16string(u"a\0b", 3)}, u"a", u"a"},
+      {{.text = u"abcd", .withoutZero = true}, std::nullopt, u"abcd"},
+      {{.text = u"abcd"}, std::nullopt, u"abcd"},
+      {{.failure = kERROR_INVALID_DATA}, std::nullopt, u""}};
+  for (const auto& [value, within, whole] : cases) {
+    ScriptedSets sets;
+    sets.values[kSPDRP_MFG] = value;
+    DeviceAnswers answers(sets);
+    ElementReader reader(sets, 1, answers);
+    PropertyAnswer answer;
+    const bool has = reader.ReadAndKeep({}, kSPDRP_MFG, answer);
+    EXPECT_EQ(has, !value.failure);
+    reader.ReadAndKeep({}, kSPDRP_CLASS, answer);  // kept as not there
+    for (const bool kept : {false, true}) {
+      EXPECT_EQ(reader.Read({}, kSPDRP_MFG, answer), has);
+      EXPECT_EQ(TextOf(answer), whole) << kept;
+      const auto text = has ? TextWithin(answer, 8) : std::nullopt;
+      EXPECT_EQ(text ? std::optional(std::u16string(*text)) : std::nullopt, within) << kept;
+      EXPECT_FALSE(reader.Read({}, kSPDRP_CLASS, answer));
+      EXPECT_EQ(sets.offered.size(), 2u);
+    }
+  }
+}
+
+// An id that leaves no zero at the end of the buffer is asked for each time, and so is one for a smaller buffer.
+TEST(DeviceAnswers, IdsAreKeptWhereTheyFit) {
+  struct Ids final : wrappers::InterceptingHost {
+    using InterceptingHost::InterceptingHost;
+    Status BeforeCall(const wrappers::HostCall&) noexcept override { return {}; }
+    Status GetDeviceId(DevInst, char16_t* buffer, std::uint32_t chars) noexcept override {
+      ++calls;
+      std::fill_n(buffer, chars, u'\0');
+      std::fill_n(buffer, std::min(length, chars), u'i');
+      return Status::Success();
+    }
+    std::uint32_t length = 0;
+    int calls = 0;
+  };
+  simulated::SimulatedPc pc{{}};
+  for (const auto& [length, chars, calls] : {std::tuple{7u, 8u, 1}, {8, 8, 2}, {7, 7, 2}}) {
+    Ids ids(pc);
+    ids.length = length;
+    DeviceAnswers answers(ids);
+    for (const std::uint32_t offered : {8u, chars}) {
+      std::array<char16_t, 9> buffer;
+      buffer.fill(u'|');
+      EXPECT_TRUE(answers.GetDeviceId(5, buffer.data(), offered));
+      EXPECT_EQ(std::u16string_view(buffer.data(), buffer.size()).find(u'|'), offered) << length;
+    }
+    EXPECT_EQ(ids.calls, calls) << length << " " << chars;
   }
 }
 

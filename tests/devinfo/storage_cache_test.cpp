@@ -32,6 +32,7 @@ struct OddStorage final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
   Status DeviceControl(platform::FileHandle handle, std::uint32_t code, const void* in, std::uint32_t inBytes,
                        void* out, std::uint32_t outBytes, std::uint32_t& returned) noexcept override {
+    EXPECT_EQ(in == nullptr, inBytes == 0) << code;
     if (closedFilesAnswer && handle == platform::kInvalidHandle) return Status::Success();
     const Status status = InterceptingHost::DeviceControl(handle, code, in, inBytes, out, outBytes, returned);
     if (shortNumbers && code == platform::kIOCTL_STORAGE_GET_DEVICE_NUMBER) returned = 11;
@@ -256,7 +257,7 @@ TEST_F(StorageCacheTest, DevicesByDeviceNumber) {
   machine.storage[0].deviceNumber->type = 2;
   machine.storage[0].deviceNumber->partition = 5;
   Start();
-  DiskLetterFinder finder(*pc);
+  DiskLetterFinder finder(*odd);
   const auto find = [&](std::uint32_t number, std::uint32_t driveType, const char16_t* dosName = u"") {
     return finder.FindStorageDevInstByDeviceNumber(number, driveType, dosName);
   };
@@ -267,6 +268,7 @@ TEST_F(StorageCacheTest, DevicesByDeviceNumber) {
   EXPECT_THAT((std::vector{find(7, 2, floppy), find(11, 2, u"\\Device\\floppy0"), find(11, 2, u"Floppy0"), find(8, 2),
                            find(9, 3), find(12, 3), find(7, 0), find(7, 1), find(7, 4), find(7, 6)}),
               Each(0));
+  EXPECT_THAT(odd->opened, testing::Not(Contains(FieldsAre(u"", _, _))));  // nothing for a path that is not told
   odd->shortNumbers = true;
   EXPECT_EQ(DiskLetterFinder(*odd).FindStorageDevInstByDeviceNumber(7, 3, u""), 0u);
   EXPECT_EQ(pc->Open(), (OpenCounts{0, 1, 0, 0}));
@@ -284,12 +286,13 @@ TEST_F(StorageCacheTest, DriveLettersOfDisks) {
   AddDrive(machine, u'F', 1, platform::kDRIVE_REMOTE);
   Start();
   DiskLetterFinder finder(*pc);
-  for (const auto id : {u"Disk\\a", u"DISK\\A", u"Disk\\b"}) {
+  // A letter of no disk is neither a disk's without id nor the first device's.
+  for (const auto id : {u"Disk\\a", u"DISK\\A", u"Disk\\b", u"", kVolumeManager}) {
     CZKUMInterfaceDeviceImpl disk;
     disk.m_strDevInstId = id;
     Texts roots;
     finder.FindDriveLettersForDisk(disk, roots);
-    EXPECT_EQ(roots, id == std::u16string(u"Disk\\b") ? Texts{} : (Texts{u"A:\\", u"Z:\\"}));
+    EXPECT_EQ(roots, platform::EqualIgnoringCase(id, u"disk\\a") ? (Texts{u"A:\\", u"Z:\\"}) : Texts{});
   }
 }
 

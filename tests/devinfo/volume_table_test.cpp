@@ -3,6 +3,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+
+#include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/failing_host.h"
 #include "simulation/pc/simulated_pc.h"
 #include "tests/devinfo/storage_machine.h"
@@ -11,6 +14,7 @@ namespace KelvoUHW {
 namespace {
 
 using platform::Status, platform::simulated::SimulatedPc;
+using namespace std::string_view_literals;
 
 // Wants `more` characters for path names than it is given (above 1: always that many), and has any
 // drives.
@@ -102,6 +106,25 @@ TEST(VolumeTable, TheOlderWay) {
   }
 }
 
+// Which letter each volume has is asked for once, however many have folders.
+TEST(VolumeTable, TheOlderWayReadsTheLettersOnce) {
+  Machine machine = EmptyPc();
+  for (const unsigned number : {1u, 2u}) {
+    AddDrive(machine, static_cast<char16_t>(u'B' + number), number, platform::kDRIVE_FIXED);
+    auto& holder = AddVolume(machine, number, {number == 1 ? u"C:\\" : u"D:\\"}, platform::kDRIVE_FIXED);
+    holder.reparsePoints = true;
+    holder.serial = 1;
+    holder.folderMounts.push_back({u"Here\\", u""});
+  }
+  AddVolume(machine, 9, {u"C:\\Here\\", u"D:\\Here\\"});
+  SimulatedPc pc(machine);
+  platform::wrappers::CountingHost counting(pc);
+  platform::wrappers::FailingHost host(
+      counting, {.call = 1, .onwards = true, .error = 1, .operation = platform::wrappers::Operation::VolumePathNames});
+  EXPECT_EQ(BuildVolumeTable(host).Paths, (Texts{u"C:\\Here\\", u"D:\\Here\\"}));
+  EXPECT_EQ(counting.Count(platform::wrappers::Operation::LogicalDriveStrings), 1u);
+}
+
 // A list that does not fit is asked for again, and a system that never has enough is left after a
 // few calls; the stick's root is still found.
 TEST(VolumeTable, ListsThatDoNotFit) {
@@ -111,30 +134,37 @@ TEST(VolumeTable, ListsThatDoNotFit) {
   AddVolume(machine, 6, longPaths);
   SimulatedPc pc(machine);
   EXPECT_EQ(MountPointsOf(pc, u"\\\\?\\Volume{6}\\"), longPaths);
-  for (const std::uint32_t more : {0u, 1u, 0xFFFFFFFFu}) {
+  // What is wanted, and the calls for five volumes; with a buffer that has grown to it one does for each.
+  for (const auto& [more, calls] : {std::pair{0u, 5}, {1, 5 * 8}, {1U << 20, 6}, {(1U << 20) + 1, 5}, {~0U, 5}}) {
     GreedyVolumes greedy(pc);
     greedy.more = more;
     EXPECT_EQ(MountPointsOf(greedy, u"\\\\?\\Volume{2}\\"), Texts{u"E:\\"});
-    EXPECT_EQ(greedy.calls, more == 1 ? 5 * 8 : 5);  // five volumes
+    EXPECT_EQ(greedy.calls, calls) << more;
   }
   GreedyVolumes greedy(pc);
-  for (int i = 0; i < 90; ++i) greedy.drives += std::u16string(u"E:\\\0", 4);
-  EXPECT_EQ(ReadDriveRoots(greedy), Texts(90, u"E:\\"));
-  greedy.drives = std::u16string(1 << 20, u'C');
-  EXPECT_EQ(ReadDriveRoots(greedy), Texts{});
+  for (const std::size_t count : {90u, 8'000u, 10'000u}) {
+    greedy.drives.clear();
+    for (std::size_t i = 0; i < count; ++i) greedy.drives += std::u16string(u"E:\\\0", 4);
+    EXPECT_EQ(ReadDriveRoots(greedy), Texts(count > 8'000 ? 0 : count, u"E:\\"));
+  }
+  for (const std::u16string_view unended : {u"E:\\\0F:\\"sv, u"E:\\\0\0F:\\\0"sv}) {
+    greedy.drives = unended;
+    EXPECT_EQ(ReadDriveRoots(greedy), Texts{u"E:\\"});
+  }
 }
 
 // Has another volume after each, or another folder, or path names without end.
 struct EndlessVolumes final : platform::wrappers::InterceptingHost {
   using InterceptingHost::InterceptingHost;
-  enum Kind { kVolumes, kFolders, kNames } kind = kVolumes;
+  enum Kind { kVolumes, kFolders, kNames, kLongNames, kUnended } kind = kVolumes;
   int calls = 0;
   Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
   Status FirstVolume(char16_t* name, std::uint32_t chars, platform::FindHandle& search) noexcept override {
     return search = 1, NextVolume(search, name, chars);
   }
-  Status NextVolume(platform::FindHandle, char16_t* name, std::uint32_t) noexcept override {
+  Status NextVolume(platform::FindHandle, char16_t* name, std::uint32_t chars) noexcept override {
     if (++calls > 1 && kind == kFolders) return Status::Failure(18);
+    if (kind == kUnended) std::fill_n(name, chars, u'V');
     return name[0] = u'V', Status::Success();
   }
   Status CloseVolumeSearch(platform::FindHandle) noexcept override { return Status::Success(); }
@@ -143,7 +173,9 @@ struct EndlessVolumes final : platform::wrappers::InterceptingHost {
     if (kind == kFolders) return Status::Failure(1);
     required = kind == kNames ? 1U << 20 : chars;
     if (required > chars) return Status::Failure(platform::kERROR_MORE_DATA);
-    for (std::uint32_t i = 0; i < required; ++i) names[i] = i % 4 != 3 && i + 4 < required ? u'x' : u'\0';
+    std::fill_n(names, required, u'\0');
+    std::fill_n(names, required - 4, u'x');
+    for (std::uint32_t i = 3; kind != kLongNames && i < required; i += 4) names[i] = u'\0';
     return Status::Success();
   }
   std::uint32_t DriveType(const char16_t*) noexcept override { return platform::kDRIVE_FIXED; }
@@ -173,6 +205,13 @@ TEST(VolumeTable, ListsWithoutEndAreLeft) {
     EXPECT_LE(endless.calls, 200'002) << kind;
     EXPECT_LE(table.Paths.size(), 200'000u);
     EXPECT_GT(table.Paths.size(), 100'000u);
+  }
+  // A name without its zero ends the list at once, and names of 7796 characters end it when there are 16 Mi of them.
+  for (const auto& [kind, volumes] : {std::pair{EndlessVolumes::kUnended, 0u}, {EndlessVolumes::kLongNames, 2151}}) {
+    EndlessVolumes endless(pc);
+    endless.kind = kind;
+    EXPECT_EQ(BuildVolumeTable(endless).Paths.size(), volumes);
+    EXPECT_LE(endless.calls, static_cast<int>(volumes) + 2);
   }
 }
 

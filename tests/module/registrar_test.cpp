@@ -85,7 +85,7 @@ TEST(Registrar, RefusesMalformedScriptsBeforeItWrites) {
       // numbers and bytes
       u"HKCR { A = d '' }", u"HKCR { A = d '&H' }", u"HKCR { A = d 12a }", u"HKCR { A = d -1 }",
       u"HKCR { A = d 4294967296 }", u"HKCR { A = d 99999999999999999999999 }", u"HKCR { A = b '012' }",
-      u"HKCR { A = b '0g' }",
+      u"HKCR { A = b '0g' }", u"HKCR { A = b 'g0' }",
       // names
       u"HKCR { '' }", u"HKCR { ForceRemove '%NONE%' }", u"HKCR { A\\B }", std::u16string(u"HKCR { A\0 }", 11),
       u"HKCR { A = s '%UNKNOWN%' }", u"HKCR { A = s '%NAME' }",

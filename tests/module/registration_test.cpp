@@ -7,6 +7,7 @@
 #include "module/module.h"
 #include "module/scripts.h"
 #include "module/type_library.h"
+#include "platform/system.h"
 #include "platform/wrappers/failing_registry.h"
 #include "simulation/process/module_environment.h"
 #include "simulation/process/type_libraries.h"
@@ -177,9 +178,11 @@ TEST(Registration, FindsTheTypeLibrary) {
   } kCases[] = {
       {"in the module", u"/opt/zk/libM.so", u"/OPT/zk/libm.so", u"", S_OK, "/opt/zk"},
       {"in a file beside it", u"C:\\a.b\\M.DLL", u"C:\\a.b\\M.tlb", u"", S_OK, "C:\\a.b"},
-      {"the module has no extension", u"C:\\a.b\\M", u"C:\\a.b\\M.tlb", u"", S_OK, "C:\\a.b"},
+      {"the module has no extension", u"C:\\a.b.\\M", u"C:\\a.b.\\M.tlb", u"", S_OK, "C:\\a.b."},
+      {"the module has nothing else", u"C:\\d\\.DLL", u"C:\\d\\.tlb", u"", S_OK, "C:\\d"},
       {"neither has one", u"C:\\M.DLL", u"C:\\N.tlb", u"", TYPE_E_CANTLOADLIBRARY, ""},
       {"with a help file", u"C:\\M.DLL", u"C:\\M.DLL", u"D:\\Help\\M.chm", S_OK, "D:\\Help\\"},
+      {"a help file without name", u"C:\\M.DLL", u"C:\\M.DLL", u"D:\\Help\\", S_OK, "D:\\Help\\"},
       {"a help file without directory", u"C:\\d\\M.DLL", u"C:\\d\\M.DLL", u"M.chm", S_OK, "C:\\d"},
       {"259 characters", deep + u".DLL", deep + u".DLL", u"", S_OK, "C:\\dir"},
       {"260 characters", deep + u"m.DLL", deep + u"m.DLL", u"", kTooLong, ""},
@@ -242,6 +245,7 @@ struct Recorder final : platform::Registry, platform::TypeLibraries, platform::M
     return attributesResult;
   }
   HRESULT GetHelpFile(Library, char16_t* name, std::uint32_t chars, std::uint32_t& length) noexcept override {
+    EXPECT_EQ(name == nullptr, chars == 0);
     length = 6;
     if (chars > length) std::char_traits<char16_t>::copy(name, u"D:\\h.x", 7);
     return helpResult;
@@ -256,9 +260,9 @@ struct Recorder final : platform::Registry, platform::TypeLibraries, platform::M
     return registerResult;
   }
   void ReleaseTypeLib(Library) noexcept override { --loaded; }
-  Status ModuleFileName(char16_t* path, std::uint32_t, std::uint32_t& length) noexcept override {
+  Status ModuleFileName(char16_t* path, std::uint32_t chars, std::uint32_t& length) noexcept override {
     std::char_traits<char16_t>::copy(path, u"C:\\m.dll", 9);
-    length = 8;
+    length = pathWithoutEnd ? chars : 8;
     return fileName;
   }
   std::uint32_t ThreadLocale() noexcept override { return locale; }
@@ -273,6 +277,7 @@ struct Recorder final : platform::Registry, platform::TypeLibraries, platform::M
   std::uint32_t locale = 0x411;
   Key open = 0;
   int loaded = 0;
+  bool pathWithoutEnd = false;
   HRESULT attributesResult = S_OK, helpResult = S_OK, registerResult = S_OK;
   Status fileName;
 };
@@ -295,6 +300,7 @@ TEST(Registration, GivesTheCodeOfWhateverFails) {
       {"other successes", with(&Recorder::registerResult, S_FALSE), good, S_OK, S_OK},
       {"the path", with(&Recorder::fileName, platform::Status::Failure(2)), good, HRESULT_FROM_WIN32(2),
        HRESULT_FROM_WIN32(2)},
+      {"a path that never fits", with(&Recorder::pathWithoutEnd, true), good, kTooLong, kTooLong},
       {"the path, for no reason", with(&Recorder::fileName, platform::Status::Failure(0)), good, E_FAIL, E_FAIL},
       {"the module's script", {}, {{}, "HKCR {", {}}, DISP_E_EXCEPTION, DISP_E_EXCEPTION},
       {"a class's script", {}, {{}, "", {&odd, 1}}, DISP_E_EXCEPTION, DISP_E_EXCEPTION},
@@ -309,6 +315,23 @@ TEST(Registration, GivesTheCodeOfWhateverFails) {
     EXPECT_EQ(UnregisterServer(test.server, Common(), {system, system, system}), test.onUnregister);
     EXPECT_TRUE(system.AsBefore());
   }
+}
+
+TEST(Registration, NeedsAllPartsOfTheSystem) {
+  Recorder recorder;
+  CZKUsbMonitorModule module;
+  for (const int missing : {0, 1, 2, 3}) {
+    platform::System system{.registry = &recorder, .typeLibraries = &recorder, .environment = &recorder};
+    if (missing == 1) system.registry = nullptr;
+    if (missing == 2) system.typeLibraries = nullptr;
+    if (missing == 3) system.environment = nullptr;
+    platform::SetCurrentSystem(system);
+    EXPECT_EQ(module.RegisterServer(), missing == 0 ? S_OK : E_UNEXPECTED) << missing;
+    EXPECT_EQ(module.UnregisterServer(), missing == 0 ? S_OK : E_UNEXPECTED) << missing;
+    EXPECT_TRUE(recorder.AsBefore());
+  }
+  module.Unload();
+  platform::SetCurrentSystem({});
 }
 
 TEST(Registration, RunsOutOfMemoryAnywhere) {

@@ -119,7 +119,9 @@ TEST_F(EventNotifier, FiresInOrderWhatSitsOnHubPorts) {
   EXPECT_EQ(Taken(scene.log), "A 0 c1, A 0 c2, B 0 c1, B 0 c2");
   std::vector<ComPtr<IUnknown>> data;
   scene.b.keeps = &data;
+  testing::internal::CaptureStdout();
   EXPECT_EQ(scene.Notify(), S_OK);
+  EXPECT_EQ(testing::internal::GetCapturedStdout(), "") << "an empty place is passed over";
   EXPECT_EQ(Taken(scene.log),
             "A 1 a1, B 1 a1, A 0 c1, B 0 c1, A 0 c2, B 0 c2, A 2 r1, B 2 r1, A 3 m, B 3 m, A 3 m, B 3 m");
   ASSERT_EQ(data.size(), 6u);

@@ -85,6 +85,8 @@ TEST(DescriptorDump, BitsAndLengthsThatLie) {
       {{10, 0x21, 0, 1, 0, 255, 0x22, 5, 0, 0x24},
        "0xFF\r\nbDescriptorType:      0x22\r\nwDescriptorLength:  0x0005\r\n"
        "bDescriptorType:      0x24\r\nEnd ConfigDesc"},
+      // Ends with its count.
+      {{12, 0x21, 0x11, 1, 9, 1, 0x22, 65, 0, 0x23, 7, 1}, "wDescriptorLength:  0x0041\r\nEnd ConfigDesc"},
       {{0, 5}, "bDescriptorType:      0x05\r\nbLength:              0x00\r\nEnd ConfigDesc"},
       {{1, 5, 7}, "bLength:              0x01\r\n01 \r\nEnd ConfigDesc"},
       {{}, "ConfigDesc :::\r\nEnd ConfigDesc"},

@@ -55,7 +55,7 @@ struct LongPaths final : platform::wrappers::InterceptingHost {
                                             platform::SP_DEVINFO_DATA*) noexcept override {
     ++calls;
     *required = needed;
-    if (bytes < needed) return platform::Status::Failure(platform::kERROR_INSUFFICIENT_BUFFER);
+    if (bytes < needed || refuses) return platform::Status::Failure(platform::kERROR_INSUFFICIENT_BUFFER);
     for (std::uint32_t at = platform::kInterfaceDetailPathOffset; at < needed; at += sizeof(char16_t)) {
       const char16_t unit = at + sizeof unit < needed ? u'x' : u'\0';
       std::memcpy(static_cast<char*>(detail) + at, &unit, sizeof unit);
@@ -63,6 +63,7 @@ struct LongPaths final : platform::wrappers::InterceptingHost {
     return platform::Status::Success();
   }
   std::uint32_t needed = 0, calls = 0;
+  bool refuses = false;  // whatever the size
 };
 
 TEST(InterfaceDetail, IsAskedForAgainWhereThePathIsLong) {
@@ -78,6 +79,23 @@ TEST(InterfaceDetail, IsAskedForAgainWhereThePathIsLong) {
     EXPECT_EQ(detail.DevicePath(), std::u16string(told ? needed / 2 - 3 : 0, u'x')) << needed;
     EXPECT_EQ(host.calls, calls) << needed;
     EXPECT_EQ(static_cast<bool>(status), told) << needed;
+  }
+  LongPaths refusing(pc);
+  refusing.needed = 1024;
+  refusing.refuses = true;
+  platform::Status status;
+  EXPECT_FALSE(ReadInterfaceDetail(refusing, 1, {}, nullptr, status));
+  EXPECT_EQ(refusing.calls, 1u) << "it is told no other size";
+  // The shared query asks for nothing without a set, an interface and an element to fill.
+  const platform::SP_DEVICE_INTERFACE_DATA data{};
+  platform::SP_DEVINFO_DATA element;
+  LongPaths host(pc);
+  host.needed = 8;
+  for (const int missing : {1, 2, 3, 0}) {
+    const InterfaceDetail detail = GetInterfaceDetail(host, host, missing == 1 ? 0 : 1, missing == 2 ? nullptr : &data,
+                                                      missing == 3 ? nullptr : &element);
+    EXPECT_EQ(detail.DevicePath(), missing == 0 ? u"x" : u"") << missing;
+    EXPECT_EQ(host.calls, missing == 0 ? 1u : 0u) << missing;
   }
 }
 

@@ -67,5 +67,22 @@ TEST(PortDevice, AFullDeviceIsDumpedByteForByte) {
   EXPECT_EQ(DumpOf(*device, u"> "), Golden("port-device"));
 }
 
+// The first configuration tells it, wherever it stands and as far as it was received.
+TEST(PortDevice, NumberOfInterfaces) {
+  using Bytes = std::vector<std::uint8_t>;
+  const std::pair<Bytes, int> cases[] = {{{9, 2, 9, 0, 3, 1, 0, 0, 0}, 3},
+                                         {{9, 2, 5, 0, 3}, 3},
+                                         {{9, 2, 4, 0, 3}, 0},
+                                         {{7, 5, 0x81, 2, 9, 2, 0, 9, 2, 18, 0, 3, 1, 0, 0, 0, 9, 2, 9, 0, 4}, 3},
+                                         {{7, 5, 0x81, 2, 9, 2, 0}, 0}};
+  for (const auto& [bytes, number] : cases) {
+    auto request = std::make_unique<DescriptorRequest>();
+    request->Data = bytes;
+    request->Data.shrink_to_fit();  // where a sanitizer sees a read behind them
+    const CZKUMPortDeviceImpl device(0, nullptr, std::move(request), nullptr, u"", u"", u"");
+    EXPECT_EQ(device.NumberInterfaces(), number) << testing::PrintToString(bytes);
+  }
+}
+
 }  // namespace
 }  // namespace KelvoUHW

@@ -19,6 +19,8 @@ TEST(Node, BaseLinesAppearOnlyWithTheirValues) {
   const std::tuple<const char*, void (*)(CZKUMUsbTreeNodeImpl&), const char*> cases[] = {
       {"nothing", [](auto&) {}, ""},
       {"one id known", [](auto& n) { n.m_nVendorId = 0x1234; }, "> VendorId; productId: 0x1234; 0xFFFFFFFF\r\n"},
+      {"a vendor alone", [](auto& n) { n.m_strVendor = u"8086"; }, "> Vendor; product: 8086;\r\n"},
+      {"a product alone", [](auto& n) { n.m_strProduct = u"CRUZER"; }, "> Vendor; product: ;CRUZER\r\n"},
       {"names", [](auto& n) { n.m_strVendor = u"SANDISK", n.m_strProduct = u"CRUZER"; },
        "> Vendor; product: SANDISK;CRUZER\r\n"},
       {"handles", [](auto& n) { n.m_devInstHandle = 7, n.m_devInstHandleParent = kUnknownId; },
@@ -88,6 +90,32 @@ TEST(Node, ParentLinksOfADyingRecordGoToNull) {
   EXPECT_EQ(moved->m_pParent, other.Get());
 }
 
+// Whoever holds a node of its own takes it from its parent, whose list keeps an empty place.
+TEST(Node, ChildrenThatWereDestroyedLeaveEmptyPlaces) {
+  const auto destroy = [](const NodePtr& node) { NodePtr::InARingOfItsOwn(node.Get()).Reset(); };
+  const auto first = Node(u"1"), second = Node(u"2"), third = Node(u"1");
+  const auto device = MakeRecord<CZKUMPortDeviceImpl>(1u, nullptr, nullptr, nullptr, u"", u"", u"");
+  {
+    const auto parent = MakeRecord<CZKUMUsbTreeNodeImpl>();
+    const auto port = MakeRecord<CZKUMHubPortImpl>(1u);
+    device->m_infoDevice = Node(u"info");
+    for (const NodePtr& child : {first, second}) AddChild(child, parent.Get());
+    for (const NodePtr& child : {first, NodePtr(device)}) AddChild(child, port.Get());
+    destroy(first);
+    AddChild(third, parent.Get());  // compared with those that are there
+    second->m_strDriverKeyName = u"key";
+    EXPECT_TRUE(parent->HasChildWithDriverKey(u"KEY"));
+    const std::string rest = kNoChildren;
+    EXPECT_EQ(DumpOf(*parent, u""),
+              "childvector size0\r\nchild 0\r\nchild 1\r\n- DevInstId            : 2\r\n- driverKeyName : key\r\n" +
+                  rest + "child 2\r\n- DevInstId            : 1\r\n" + rest + "ChildsToString End\r\n");
+    EXPECT_EQ(FindByInstanceId(parent, u"1"), third);
+    device->m_infoDevice->m_pParent = port.Get();
+  }
+  EXPECT_EQ(second->m_pParent, nullptr);
+  EXPECT_EQ(device->m_infoDevice->m_pParent, nullptr);
+}
+
 CZKUMUsbTreeNodeImpl* HangChainBelow(CZKUMUsbTreeNodeImpl* last, int depth) {
   for (int i = 1; i < depth; ++i) {
     const auto next = Node(platform::Decimal(i).c_str());
@@ -149,6 +177,7 @@ TEST(Records, HubNamesAndTheRecordThatIsKept) {
   // A hub never frees its connection record.
   EXPECT_EQ(ConnectionRecord::LiveCount() - live, std::size(cases));
   EXPECT_EQ(ConnectionRecord::KeptCount() - kept, std::size(cases));
+  EXPECT_EQ(ConnectionRecord::LiveCount(), ConnectionRecord::KeptCount());
 }
 
 }  // namespace

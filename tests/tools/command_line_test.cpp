@@ -11,42 +11,24 @@ TEST(CommandLine, RefusesWrongUsageAndBadFilesInOneLine) {
   const TemporaryFile unknownMember(R"({"devices": [{"id": "A\\B\\1", "colour": "red"}]})");
   const TemporaryFile noSteps("{}");
   const TemporaryFile badStep(R"({"steps": [{"at": 5, "unplug": "USB\\NO\\1"}]})");
-  const std::string usage, bogus = unknownMember.Path();
-  const std::tuple<Args, std::string, std::string> cases[] = {
-      {{}, usage, "a command is needed"},
-      {{"list"}, usage, "there is no command \"list\""},
-      {{"tree", "D:"}, usage, "not expected: D:"},
-      {{"D", "--json"}, usage, "there is no command \"D\""},
-      {{"tree", "--width", "-1"}, usage, "--width"},
-      {{"tree", "dump"}, usage, "dump"},
-      {{"tree", "--bogus"}, usage, "--bogus"},
-      {{"tree", "a\nb\x1b[2J"}, usage, "a\\x0Ab\\x1B[2J"},
-      {{"tree", "--machine", "a", "--machine", "b"}, usage, "--machine"},
-      {{"--json=no", "tree"}, usage, "json"},
-      {{"tree", "--vendor", "1"}, usage, "--vendor"},
-      {{"find"}, usage, "find needs a TERM"},
-      {{"find", ""}, usage, "TERM: is empty"},
-      {{"find", "--vendor", ""}, usage, "hexadecimal"},
-      {{"find", "--vendor", "0x"}, usage, "\"0x\" is not a number of one to four hexadecimal digits"},
-      {{"find", "--vendor", "0x00781"}, usage, "hexadecimal"},
-      {{"find", "--vendor", "-1"}, usage, "hexadecimal"},
-      {{"find", "--vendor", "0x0x1"}, usage, "hexadecimal"},
-      {{"find", "--vendor", "781", "--product", "zz"}, usage, "--product: \"zz\""},
-      {{"watch", "--for", "-1"}, usage, "--for"},
-      {{"watch", "--for", "nan"}, usage, "nan is not a number"},
-      {{"watch", "--for", "-NAN"}, usage, "-NAN is not a number"},
-      {{"watch", "--for", "inf"}, usage, "--for"},
-      {{"watch", "--for", "86401"}, usage, "--for"},
-      {{"page"}, usage, "OUTPUT"},
+  std::vector<std::tuple<Args, std::string, std::string>> cases = {
+      {{}, "", "a command is needed"},
+      {{"tree", "a\nb\x1b[2J"}, "", "a\\x0Ab\\x1B[2J"},
       {{"tree", "--machine", "/no/such/file"}, "/no/such/file: ", "cannot be read"},
       {{"tree", "--machine", noJson.Path()}, noJson.Path() + ": ", "line 1, column 16"},
-      {{"watch", "--machine", bogus, "--script", noSteps.Path()},
-       bogus + ": ",
+      {{"watch", "--machine", unknownMember.Path(), "--script", noSteps.Path()},
+       unknownMember.Path() + ": ",
        "devices[0]: unknown member \"colour\""},
       {{"tree", "--script", "/no/such/file"}, "/no/such/file: ", "cannot be read"},
       {{"dump", "--script", noSteps.Path()}, noSteps.Path() + ": ", "steps: is missing"},
       {{"--script", badStep.Path(), "watch"}, badStep.Path() + ": ", "steps[0]: "},
   };
+  // The arguments with a bar behind each, a tab, the reason.
+  std::ifstream usage(ZKUSB_SOURCE_DIR "/tests/tools/refused-usage.tsv");
+  for (std::string line, reason; std::getline(usage, line, '\t') && std::getline(usage, reason);) {
+    cases.emplace_back(Lines(line, '|'), "", reason);
+  }
+  EXPECT_EQ(cases.size(), 31u);
   for (const auto& [args, file, reason] : ProgramCases(cases)) {
     SCOPED_TRACE(testing::PrintToString(args));
     const ProgramResult result = RunClient(args);

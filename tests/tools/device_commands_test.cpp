@@ -80,34 +80,19 @@ TEST(DeviceCommands, JsonHoldsTheSameFacts) {
 }
 
 TEST(FindCommand, FindsByWhatAPersonKnows) {
-  const std::string stick = "0781:5580", module = "413C:8197", camera = "0C45:643F";
   const TemporaryFile folder(ChangedMachine([](Json& machine) {
     for (Json& volume : machine["volumes"]) {
       if (volume.value("paths", Json::array()) == Json::array({"D:\\"})) volume["paths"].push_back("C:\\Sticks\\One\\");
     }
   }));
-  const std::tuple<Args, std::vector<std::string>> cases[] = {
-      {{"D:"}, {stick}},
-      {{"d:\\"}, {stick}},
-      {{"find", "D:", "--vendor", "781"}, {stick}},
-      {{"find", "D:", "--vendor", "782"}, {}},
-      {{"find", "sandisk"}, {stick}},             // by the name of the vendor
-      {{"find", "SANDISK", "extreme"}, {stick}},  // by the name of the disk
-      {{"find", "sandisk", "dell"}, {}},
-      {{"find", "aa0106"}, {stick}},  // by its serial number
-      {{"find", "2-1.4"}, {module}},
-      {{"find", "2-1"}, {}},  // a hub
-      {{"find", "0c45:643f"}, {camera}},
-      {{"find", "0c45"}, {}},
-      {{"find", "c:\\sticks\\one"}, {stick}},
-      {{"find", "C:\\Sticks\\One\\"}, {stick}},
-      {{"find", "C:\\Sticks"}, {}},
-      {{"find", "e"}, {camera, module, stick}},
-      {{"find", "--product", "8197"}, {module}},
-  };
-  for (const auto& [args, ids] : ProgramCases(cases)) {
-    SCOPED_TRACE(testing::PrintToString(args));
-    Args all = args;
+  // The arguments, a tab, the devices that are found; a bar between them.
+  std::ifstream file(ZKUSB_SOURCE_DIR "/tests/tools/found.tsv");
+  std::size_t cases = 0;
+  for (std::string line, devices; std::getline(file, line, '\t') && std::getline(file, devices); ++cases) {
+    if (!TakesCase(cases)) continue;
+    SCOPED_TRACE(line);
+    const Args ids = Lines(devices, '|');
+    Args all = Lines(line, '|');
     all.insert(all.end(), {"--json", "--machine", folder.Path()});
     const ProgramResult result = RunClient(all);
     EXPECT_EQ(result.code, ids.empty() ? kNothingFound : kDone);
@@ -116,6 +101,7 @@ TEST(FindCommand, FindsByWhatAPersonKnows) {
     for (const Json& device : json.at("devices")) found.push_back(IdOf(device));
     EXPECT_THAT(found, testing::UnorderedElementsAreArray(ids));
   }
+  EXPECT_EQ(cases, 17u);
 }
 
 }  // namespace

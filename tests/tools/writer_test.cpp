@@ -22,6 +22,8 @@ TEST(Writer, EscapesWhatATerminalWouldObey) {
       {std::u16string(u"a\0b", 3), "a\\x00b\n"},
       {u"\x7F\x80\x9F\xA0", "\\x7F\\x80\\x9F\u00A0\n"},
       {u"\u202Egnp.exe\u2069\u2028\u200F", "\\u202Egnp.exe\\u2069\\u2028\\u200F\n"},
+      {u"\x1F \x7E\x061B\x061C\x061D\x200D\x200E\x2010\x2027\x202F\x2065\x2066\x206A",
+       "\\x1F \x7E\u061B\\u061C\u061D\u200D\\u200E\u2010\u2027\u202F\u2065\\u2066\u206A\n"},
       {u"Gerät \U0001F5B4", "Gerät \U0001F5B4\n"},
       {std::u16string(1, char16_t{0xD83D}) + u"!", "\uFFFD!\n"},
   };
@@ -56,6 +58,27 @@ TEST(Writer, FitsALineIntoItsColumns) {
     const std::string written =
         Written([&, h = head, m = middle, t = tail](Writer& out) { out.SetColumns(80), out.FittedLine(h, m, t); });
     EXPECT_TRUE(line.empty() ? written.find("…") == written.npos : written == line) << written;
+  }
+  // Halves of pairs are columns of their own.
+  const std::pair<std::u16string, std::size_t> counted[] = {{u"\xD800\xDC00\xDBFF\xDFFF", 2},
+                                                            {u"\xD83Dx", 2},
+                                                            {u"\xDC00\xDC00", 2},
+                                                            {u"\xD800\xE000", 2},
+                                                            {u"\xD800\xDBFF", 2},
+                                                            {u"x\xD83D", 2},
+                                                            {u"\xE000\xDC00", 2},
+                                                            {u"\xD7FF\xDC00", 2}};
+  for (const auto& [text, columns] : counted) {
+    const auto fitted = [&, t = text](std::size_t into) {
+      return Written([&](Writer& out) { out.SetColumns(into), out.FittedLine(t, u"", u""); });
+    };
+    EXPECT_EQ(fitted(columns).find("…"), std::string::npos) << testing::PrintToString(text);
+    EXPECT_NE(fitted(columns - 1).find("…"), std::string::npos) << testing::PrintToString(text);
+  }
+  // In parts, and never within a pair.
+  for (const std::size_t before : {65534u, 65535u, 65536u}) {
+    EXPECT_EQ(Written([&](Writer& out) { out.Verbatim(times(before, u'x') + u"\U0001F5B4y"); }),
+              std::string(before, 'x') + "\U0001F5B4y");
   }
   EXPECT_EQ(Tidied(u"  USB   SanDisk 3.2Gen1  "), u"USB SanDisk 3.2Gen1");
   EXPECT_EQ(Tidied(u"    "), u"");

@@ -69,12 +69,35 @@ TEST(DeviceRecords, WhichDevicesAreRead) {
     c.change(machine.devices[1]);
     SimulatedPc pc(machine);
     const std::uint64_t call = c.fails ? 1 : platform::wrappers::FailurePlan::kNever;
-    FailingHost host(pc, {.call = call, .onwards = true, .operation = c.fails});
+    const Operation counted = c.fails.value_or(Operation::EnumDeviceInfo);
+    FailingHost host(pc, {.call = call, .onwards = true, .operation = counted});
     std::string names;
     for (const DeviceNodeRecord& record : ReadAll(host)) names += platform::ToUtf8(record.Name) + " ";
     EXPECT_EQ(names, c.names) << c.what;
     EXPECT_EQ(host.Failures() != 0, c.fails.has_value()) << c.what;
+    EXPECT_LE(host.Calls(), machine.devices.size() + 1) << c.what;
     EXPECT_TRUE(pc.Open() == OpenCounts{.sets = c.setsLeftOpen} && pc.Misuses().empty()) << c.what;
+  }
+}
+
+// As one whose description cannot be read.
+TEST(DeviceRecords, AClassWhoseDescriptionHasNoEndIsNotShown) {
+  struct Endless final : platform::wrappers::InterceptingHost {
+    using InterceptingHost::InterceptingHost;
+    platform::Status BeforeCall(const platform::wrappers::HostCall&) noexcept override { return {}; }
+    platform::Status GetClassDescription(const platform::Guid&, char16_t* text, std::uint32_t chars,
+                                         std::uint32_t*) noexcept override {
+      std::fill_n(text, chars, u'x');
+      if (ended) text[chars - 1] = u'\0';
+      return platform::Status::Success();
+    }
+    bool ended = false;
+  };
+  SimulatedPc pc(ThreeDevices());
+  Endless host(pc);
+  for (const bool ended : {false, true}) {
+    host.ended = ended;
+    EXPECT_EQ(ReadAll(host).size(), ended ? 3u : 0u);
   }
 }
 

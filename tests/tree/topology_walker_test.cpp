@@ -5,8 +5,11 @@
 #include <algorithm>
 
 #include "bench/small_pcs.h"
+#include "devinfo/disk_letters.h"
+#include "devinfo/info_device_cache.h"
 #include "platform/wrappers/counting_host.h"
 #include "platform/wrappers/logging_host.h"
+#include "records/device_set.h"
 #include "simulation/pc/simulated_pc.h"
 #include "tests/support/outline.h"
 #include "tests/support/scripted_driver.h"
@@ -70,6 +73,8 @@ TEST(Walk, EveryPortThatAnswersIsInTheTree) {
   CZKUMTopologyWalker walker(pc);
   walker.StartWalk();
   EXPECT_EQ(OutlineOf(walker.m_building), kBusyOutline);
+  const auto nodeless = [](const auto& node) { return node.m_nType == KUDTPortDevice && node.m_devInstHandle == 0; };
+  EXPECT_EQ(Count(walker.m_building, nodeless), 3u);
   EXPECT_EQ(std::pair(walker.m_nConnectedDevices, walker.m_nConnectedHubs), std::pair(4u, 1u));
   EXPECT_EQ(pc.Open(), OpenCounts{});
   walker.Commit();
@@ -191,6 +196,30 @@ TEST(Walk, SourcesAndIdentityOfControllers) {
     const auto interfaces = static_cast<std::ptrdiff_t>(machine.interfaces.size());
     EXPECT_EQ(count(u"GetDeviceInterfaceDetail"), interfaces) << what;
     EXPECT_EQ(count(u"OpenDevice \\\\?\\"), interfaces) << what;
+    EXPECT_EQ(count(u"OpenDevice \\\\.\\ "), 0) << what << ": a root hub without name";
+  }
+}
+
+TEST(Walk, AControllerIsAddedOnce) {
+  Machine machine = OneController(1);
+  AddHcd1(machine, u"{usb}\\0077");
+  SimulatedPc pc(machine);
+  DeviceFile first(pc), second(pc);
+  EXPECT_TRUE(first.Open(u"\\\\.\\HCD0", platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE));
+  EXPECT_TRUE(second.Open(u"\\\\.\\HCD1", platform::kGENERIC_WRITE, platform::kFILE_SHARE_WRITE));
+  CZKUMTopologyWalker walker(pc);
+  const auto add = [&](const DeviceFile& file) { return walker.AddHostController(file.Get(), u"name"); };
+  EXPECT_FALSE(add(first)) << "no walk has begun";
+  walker.m_building = MakeRecord<CZKUMUsbTreeRootImpl>();
+  EXPECT_TRUE(add(first));
+  EXPECT_FALSE(add(first));
+  second.Close();
+  EXPECT_FALSE(add(second)) << "it has no key";
+  EXPECT_EQ(walker.m_building->m_childs.size(), 1u);
+  const auto controller = MakeRecord<CZKUMHostControllerImpl>();
+  for (const auto& [key, known] : {std::pair{u"{usb}\\0000", true}, {u"{usb}\\0077", false}}) {
+    controller->m_strDriverKeyName = key;
+    EXPECT_EQ(walker.AddRootHub(controller, first.Get()), known);
   }
 }
 
@@ -287,6 +316,39 @@ struct EndlessHubs final : ScriptedDriver {
   platform::FileHandle hubs = 0, closed = 0;
   std::int32_t names = 0;
 };
+
+// Every set has an element more, of which nothing can be read.
+struct EndlessSets final : platform::wrappers::InterceptingHost {
+  using InterceptingHost::InterceptingHost;
+  platform::Status BeforeCall(const platform::wrappers::HostCall& call) noexcept override {
+    const bool reads =
+        call.operation == Operation::GetDeviceRegistryProperty || call.operation == Operation::GetDeviceInterfaceDetail;
+    return reads ? platform::Status::Failure(platform::kERROR_INVALID_DATA) : platform::Status::Success();
+  }
+  platform::Status EnumDeviceInfo(platform::DeviceSetHandle, std::uint32_t index,
+                                  platform::SP_DEVINFO_DATA& data) noexcept override {
+    return data.DevInst = 1'000 + index, ++devices, platform::Status::Success();
+  }
+  platform::Status EnumDeviceInterfaces(platform::DeviceSetHandle, const platform::Guid&, std::uint32_t,
+                                        platform::SP_DEVICE_INTERFACE_DATA&) noexcept override {
+    return ++interfaces, platform::Status::Success();
+  }
+  std::pair<std::uint32_t, std::uint32_t> Taken() { return {std::exchange(devices, 0), std::exchange(interfaces, 0)}; }
+  std::uint32_t devices = 0, interfaces = 0;
+};
+
+TEST(Walk, SetsWithoutEndAreLeft) {
+  SimulatedPc pc(OneController(0));
+  EndlessSets endless(pc);
+  CZKUMTopologyWalker walker(endless);
+  walker.StartWalk();
+  EXPECT_EQ(endless.Taken(), std::pair(kMostElements, kMostElements));
+  EXPECT_EQ(InfoDeviceCache(endless, walker.Answers()).EnumerateDeviceNodes({}), 0u);
+  EXPECT_EQ(endless.Taken(), std::pair(kMostElements, 0u));
+  EXPECT_EQ(DiskLetterFinder(endless).FindStorageDevInstByDeviceNumber(1, platform::kDRIVE_FIXED, u""), 0u);
+  EXPECT_EQ(endless.Taken(), std::pair(0u, kMostElements));
+  EXPECT_EQ(pc.Open(), OpenCounts{});
+}
 
 TEST(Walk, HubsWithoutEndAreLeft) {
   SimulatedPc pc(OneController(0));

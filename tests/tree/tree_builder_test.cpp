@@ -23,6 +23,12 @@ Change NodeOnly(const Text& serial, const Text& parent = kRootHubId) {
   AddNode(plug, UsbId(serial), parent, u"HIDClass", u"HidUsb");
   return plug;
 }
+// The device manager has the hub below another device, whatever port it sits on.
+Change HubBelow(const Text& serial, std::uint32_t port, const Text& parent) {
+  Plug plug = ExternalHub(serial, port, kNewHubService);
+  plug.fragment.devices[0].parent = parent;
+  return plug;
+}
 Change PortOnly(const Text& serial, std::uint32_t port) {
   Plug plug;
   AddPort(plug, UsbId(serial), kRootHubId, port);
@@ -110,6 +116,11 @@ TEST(Builds, WhatComesAndGoes) {
        {ExternalHub(u"HUB", 1, kNewHubService), Gadget(u"K1", 1, hub), Stick(u"S3", 2, u'E', hub)},
        "K1 S3 | K1 S3 | - | -",
        kNewHubService},
+      // Told once, and not where it is attached itself.
+      {"hubs that belong to another device",
+       {{{HubBelow(u"H2", 3, UsbId(u"A")), HubBelow(u"H3", 4, UsbId(u"A"))}, "A | - | - | A"}, {{}, "same"}},
+       {Gadget(u"A", 1), HubBelow(u"H1", 2, UsbId(u"A"))},
+       "A | A | - | -"},
       // What the caches do not see is in the next tree that something else brings about, and leaves
       // as what was in the last tree and is not in the new one.
       {"excluded and not admitted",
@@ -171,6 +182,21 @@ TEST(Builds, ARemovedReaderShowsTheCardThatLeft) {
   EXPECT_THAT(DumpOf(*removed), HasSubstr("devMountPoint   : F:\\\r\n"));
   EXPECT_EQ(removed.StaticCast<CZKUMPortDeviceImpl>()->m_infoDevice->m_pParent,
             static_cast<CZKUMUsbTreeNodeImpl*>(removed->m_pParent));
+}
+
+// Its node gets another, in a place of its own.
+TEST(Builds, ARecordThatAClientDestroyedLeavesNoEmptyPlace) {
+  BuildDesk desk(BarePc(), {Stick(u"S1", 1, u'E')});
+  EXPECT_EQ(desk.Build(), "S1 | S1 | - | -");
+  const auto stick = desk.builder.GetDeviceList(kConnectedList)->at(0).StaticCast<CZKUMPortDeviceImpl>();
+  const DeviceList& children = stick->m_infoDevice->m_childs;
+  NodePtr::InARingOfItsOwn(children.at(0).Get()).Reset();
+  EXPECT_EQ(children, DeviceList(1));
+  desk.Do({Gadget(u"M1", 2)});
+  EXPECT_EQ(desk.Build(), "S1 M1 | M1 | - | S1");
+  ASSERT_EQ(children.size(), 1u);
+  ASSERT_TRUE(children[0]);
+  EXPECT_EQ(children[0]->m_strDevInstId, DiskId(u"S1"));
 }
 
 // Unplugs devices while the driver keys are read: each as soon as its own key was asked for.

@@ -163,8 +163,9 @@ TEST_F(DeviceIoTest, NodeInformation) {
   for (const auto& [path, ports, busPowered] : kCases) {
     const Reply reply = Ask(Open(path), kIOCTL_USB_GET_NODE_INFORMATION, {}, 80);
     const auto node = reply.As<USB_NODE_INFORMATION>();
-    EXPECT_EQ(std::tuple(reply.returned, +node.HubDescriptor.bNumberOfPorts, +node.HubIsBusPowered),
-              std::tuple(76u, ports, busPowered));
+    const auto& hub = node.HubDescriptor;
+    EXPECT_EQ(std::tuple(reply.returned, +hub.bDescriptorLength, +hub.bNumberOfPorts, +node.HubIsBusPowered),
+              std::tuple(76u, 9, ports, busPowered));
   }
 }
 
