@@ -348,7 +348,7 @@ TEST(InfoDeviceSet, AnswersAsALinearSearchDoes) {
 TEST(InfoDeviceSet, FindsNothingOfErasedAndDestroyedRecords) {
   InfoDeviceSet set;
   std::vector<InfoDevicePtr> records;
-  for (const platform::DevInst handle : {1, 2, 3, 4}) {
+  for (const platform::DevInst handle : {1u, 2u, 3u, 4u}) {
     records.push_back(Record(handle, std::u16string(1, static_cast<char16_t>(u'A' + handle)), u"P"));
     set.Insert(records.back());
   }

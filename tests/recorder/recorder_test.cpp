@@ -98,7 +98,7 @@ TEST(Recorder, LeavesOutWhatACallWouldHaveTold) {
     EXPECT_EQ(WriteMachine(ReadBack(recorded)), WriteMachine(recorded));
   }
   for (const std::uint32_t code :
-       {0x220408, 0x22040C, 0x220414, 0x220420, 0x220424, 0x220448, 0x2D0C10, 0x2D1080, 0x2D1400}) {
+       {0x220408u, 0x22040Cu, 0x220414u, 0x220420u, 0x220424u, 0x220448u, 0x2D0C10u, 0x2D1080u, 0x2D1400u}) {
     host.SetPlan({.call = 1, .onwards = true, .code = code});
     found += platform::ToUtf8(platform::Hex(code)) + Outline(RecordMachine(host)) + "\n";
   }
@@ -132,7 +132,7 @@ TEST(Recorder, WritesDownWhatAFileCanSay) {
   machine.volumes[0].folderMounts.push_back({u"\\x\\", u""});
   machine.volumes[0].folderMounts.push_back({u"a:b\\", u""});
   machine.volumes[5].serial = machine.volumes[6].serial = 7;
-  for (const std::size_t i : {5, 6, 7}) expected.volumes.push_back(machine.volumes[i]);
+  for (const std::size_t i : {5u, 6u, 7u}) expected.volumes.push_back(machine.volumes[i]);
   expected.volumes[3].driveType = 6;
   expected.volumes[4].folderMounts[0].volume = u"\\\\?\\Volume{7}\\";
   const std::u16string noId = u"A device whose id cannot be read or written down is left out.";
